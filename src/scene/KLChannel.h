@@ -1,0 +1,43 @@
+#pragma once
+
+#include <vector>
+
+#include "toolkit/CueTime.h"
+
+// A scalar animation channel of the 3D preview: keyed storage of (time, value) keys evaluated
+// with linear interpolation between keys and held before the first and after the last, or a
+// static value while the channel is marked static.
+class KLChannel {
+public:
+    virtual ~KLChannel() = default;
+
+    void SetStorageKeyed() { keyed_ = true; }
+    bool StorageKeyed() const { return keyed_; }
+    void ClearAnimation() { keys_.clear(); }
+    // Adds or replaces the key at `t`.
+    void AddKey(CueTime t, float value);
+    int KeyCount() const { return int(keys_.size()); }
+
+    // Static mode: the channel gives `value` whatever the time.
+    void SetStatic(bool on) { static_ = on; }
+    bool IsStatic() const { return static_; }
+    void SetValue(CueTime t, float value);
+
+    virtual float Evaluate(CueTime t) const;
+
+protected:
+    struct Key {
+        CueTime time;
+        float value;
+    };
+    std::vector<Key> keys_;  // in time order
+    bool keyed_ = false;
+    bool static_ = false;
+    float staticValue_ = 0.0f;
+};
+
+// A channel whose keys are joined by a smooth (Catmull-Rom) curve.
+class KLSplineChannel : public KLChannel {
+public:
+    float Evaluate(CueTime t) const override;
+};

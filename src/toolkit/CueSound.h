@@ -1,0 +1,56 @@
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+// A sound held in memory: 32-bit float samples per channel, in -1..1 for integer formats.
+// Reads AIFF, AIFF-C, WAV and the other formats audiofile reads. A file that cannot be read
+// leaves an empty sound (no channels, no frames) and says why in ErrorText().
+class CueSound {
+public:
+    CueSound() = default;
+    // Reads the sound file `path`; check Valid() afterwards.
+    explicit CueSound(const char* path);
+
+    // Reads a whole sound file image from memory; `name` is only used in messages.
+    static std::unique_ptr<CueSound> FromMemory(const void* data, size_t size, const char* name);
+    // A sound made of the given channels (all of one length) at `rate` frames per second.
+    static std::unique_ptr<CueSound> FromSamples(std::vector<std::vector<float>> channels, double rate);
+
+    bool Valid() const { return !channels_.empty() && rate_ > 0; }
+    // Why the file could not be read, or why it was read only in part; empty when all is well.
+    const std::string& ErrorText() const { return error_; }
+    const std::string& FileName() const { return fileName_; }
+
+    double Rate() const { return rate_; }
+    int ChannelCount() const { return int(channels_.size()); }
+    long FrameCount() const { return channels_.empty() ? 0 : long(channels_[0].size()); }
+    // Length in seconds: frame count / rate as floats.
+    float Length() const;
+
+    // The lowest and highest sample over all channels, as computed by ComputeMinMax (both
+    // zero for an empty sound).
+    void ComputeMinMax();
+    float Min() const { return min_; }
+    float Max() const { return max_; }
+
+    // Samples of one channel; `channel` -1 gives the mix (mean) of all channels. An
+    // out-of-range channel gives an empty vector.
+    std::vector<float> ChannelData(int channel) const;
+    const std::vector<float>& Channel(int channel) const { return channels_.at(size_t(channel)); }
+
+    std::unique_ptr<CueSound> Copy() const;
+    // Keeps only the frames of [startSeconds, endSeconds) (clamped to the sound).
+    void Trim(double startSeconds, double endSeconds);
+    // The mix of all channels resampled to `rate` frames per second (16 kHz for recognizers).
+    std::vector<float> Resampled(double rate) const;
+
+private:
+    std::vector<std::vector<float>> channels_;
+    double rate_ = 0.0;
+    float min_ = 0.0f;
+    float max_ = 0.0f;
+    std::string error_;
+    std::string fileName_;
+};

@@ -1,0 +1,7 @@
+#pragma once
+
+// Installs `handler` for `signal`: when the signal arrives, handler(signal, data) runs. When
+// the handler returns, the signal's default action is restored and the signal raised again,
+// so that a fatal signal still ends the program after the handler had its say.
+using KLSignalHandler = void (*)(int signal, void* data);
+bool OnSignal(int signal, KLSignalHandler handler, void* data);
