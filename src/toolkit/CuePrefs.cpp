@@ -20,7 +20,8 @@ Dirs& dirs() {
         d.known = true;
         const char* project = CuePrefs::Variable("TESSEL_PROJECT");
         d.project = project ? project : "";
-        while (d.project.size() > 1 && d.project.back() == '/') d.project.pop_back();
+        while (d.project.size() > 1 && d.project.back() == '/')
+            d.project.pop_back();
         if (!d.project.empty()) {
             const char* misc = CuePrefs::Variable("TESSEL_MISC_DIR");
             d.misc = d.project + "/" + (misc ? misc : "misc_data");
@@ -42,17 +43,33 @@ Dirs& dirs() {
     return d;
 }
 
-const char* or_null(const std::string& s) { return s.empty() ? nullptr : s.c_str(); }
+const char* or_null(const std::string& s) {
+    return s.empty() ? nullptr : s.c_str();
+}
 
 }  // namespace
 
-const char* CuePrefs::Project() { return or_null(dirs().project); }
-const char* CuePrefs::WorkEnv() { return or_null(dirs().project); }
-const char* CuePrefs::MiscDir() { return or_null(dirs().misc); }
-const char* CuePrefs::WireDir() { return or_null(dirs().wire); }
-const char* CuePrefs::PixDir() { return or_null(dirs().pix); }
-const char* CuePrefs::HelpDir() { return or_null(dirs().help); }
-const char* CuePrefs::Location() { return or_null(dirs().location); }
+const char* CuePrefs::Project() {
+    return or_null(dirs().project);
+}
+const char* CuePrefs::WorkEnv() {
+    return or_null(dirs().project);
+}
+const char* CuePrefs::MiscDir() {
+    return or_null(dirs().misc);
+}
+const char* CuePrefs::WireDir() {
+    return or_null(dirs().wire);
+}
+const char* CuePrefs::PixDir() {
+    return or_null(dirs().pix);
+}
+const char* CuePrefs::HelpDir() {
+    return or_null(dirs().help);
+}
+const char* CuePrefs::Location() {
+    return or_null(dirs().location);
+}
 
 void CuePrefs::SetProject(const char* dir) {
     if (dir && *dir)
@@ -67,4 +84,6 @@ const char* CuePrefs::Variable(const char* name) {
     return (v && *v) ? v : nullptr;
 }
 
-void CuePrefs::Refresh() { dirs().known = false; }
+void CuePrefs::Refresh() {
+    dirs().known = false;
+}

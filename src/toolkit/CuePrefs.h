@@ -6,16 +6,16 @@
 // SetProject or, failing that, the environment variable TESSEL_PROJECT:
 //
 //   WorkEnv()   the project directory itself (the error log "errlog.vx" goes there)
-//   MiscDir()   data: keyset descriptions, tracks, sounds   <project>/<TESSEL_MISC_DIR or misc_data>
-//   WireDir()   scene ("wire") files                          <project>/wire
-//   PixDir()    pictures: key-shape and reference images      <project>/pix
+//   MiscDir()   data: keyset descriptions, tracks, sounds   <project>/<TESSEL_MISC_DIR or
+//   misc_data> WireDir()   scene ("wire") files                          <project>/wire PixDir()
+//   pictures: key-shape and reference images      <project>/pix
 //
 // With no project all four are null, and relative names are used as they stand, that is
 // relative to the current directory. HelpDir() is <Location()>/share/chirrup/help, where
 // Location() is the directory above the one that holds the running program.
 // The strings returned stay valid until the next SetProject or Refresh.
 class CuePrefs {
-public:
+  public:
     static const char* WorkEnv();
     static const char* MiscDir();
     static const char* WireDir();

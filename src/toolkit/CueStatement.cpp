@@ -5,7 +5,8 @@
 bool CueStatement::Read(std::istream& in) {
     line_.clear();
     Clear();
-    if (!in.good()) return false;
+    if (!in.good())
+        return false;
     bool any = false;
     std::streambuf* buf = in.rdbuf();
     for (;;) {
@@ -19,8 +20,10 @@ bool CueStatement::Read(std::istream& in) {
             break;
         }
         any = true;
-        if (c == '\n') break;
-        if (line_.size() < kMaxLine) line_.push_back(char(c));
+        if (c == '\n')
+            break;
+        if (line_.size() < kMaxLine)
+            line_.push_back(char(c));
     }
     ++lineNumber_;
     Split(line_);

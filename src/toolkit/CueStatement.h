@@ -10,7 +10,7 @@
 // cut there (the rest of the line is read and dropped) so no file can make a statement grow
 // without bound.
 class CueStatement : public CueTokenList {
-public:
+  public:
     static constexpr size_t kMaxLine = 1 << 20;
 
     // Reads the next line of `in` into this statement. False at the end of the stream (or
@@ -22,7 +22,7 @@ public:
     // Number of lines read by this statement so far (the line number of the last one).
     int LineNumber() const { return lineNumber_; }
 
-private:
+  private:
     std::string line_;
     int lineNumber_ = 0;
 };

@@ -10,7 +10,7 @@
 // zero. Times built from frames or seconds round to the nearest tick and saturate at the
 // 32-bit range (about 99 hours either side of zero), so no input can overflow.
 class CueTime {
-public:
+  public:
     static constexpr int32_t kTicksPerSecond = 6000;
     static int default_fps;  // the workspace frame rate, 30 unless Imp::SetFps changes it
     static int binaryIO;     // nonzero: Write/Read use the binary form
@@ -66,7 +66,7 @@ public:
     // NaN gives zero.
     static int32_t ClampTicks(double ticks);
 
-private:
+  private:
     struct Tag {};
     constexpr CueTime(int32_t ticks, Tag) : ticks_(ticks) {}
     static CueTime Saturated(int64_t ticks);

@@ -10,11 +10,14 @@
 void CueTokenList::Split(const std::string& line) {
     tokens_.clear();
     size_t n = line.size();
-    if (n > 0 && line[n - 1] == '\r') --n;
+    if (n > 0 && line[n - 1] == '\r')
+        --n;
     size_t i = 0;
     while (i < n) {
-        while (i < n && (line[i] == ' ' || line[i] == '\t')) ++i;
-        if (i >= n) break;
+        while (i < n && (line[i] == ' ' || line[i] == '\t'))
+            ++i;
+        if (i >= n)
+            break;
         std::string token;
         while (i < n && line[i] != ' ' && line[i] != '\t') {
             if (line[i] == '"') {
@@ -40,24 +43,30 @@ const char* CueTokenList::ArgText(int i) const {
 
 int CueTokenList::ArgInt(int i) const {
     const char* s = ArgText(i);
-    if (!s) return 0;
+    if (!s)
+        return 0;
     errno = 0;
     const long long v = std::strtoll(s, nullptr, 10);
-    if (v > INT_MAX) return INT_MAX;
-    if (v < INT_MIN) return INT_MIN;
+    if (v > INT_MAX)
+        return INT_MAX;
+    if (v < INT_MIN)
+        return INT_MIN;
     return int(v);
 }
 
 double CueTokenList::ArgDouble(int i) const {
     const char* s = ArgText(i);
-    if (!s) return 0.0;
+    if (!s)
+        return 0.0;
     const double v = std::strtod(s, nullptr);
     return std::isfinite(v) ? v : 0.0;
 }
 
 float CueTokenList::ArgFloat(int i) const {
     const double v = ArgDouble(i);
-    if (v > FLT_MAX) return FLT_MAX;
-    if (v < -FLT_MAX) return -FLT_MAX;
+    if (v > FLT_MAX)
+        return FLT_MAX;
+    if (v < -FLT_MAX)
+        return -FLT_MAX;
     return float(v);
 }

@@ -9,7 +9,7 @@
 // token. Quoted and unquoted stretches that touch form one token ("a"b is ab), and "" alone
 // is an empty token. Any other byte, NUL and control characters included, is kept as it is.
 class CueTokenList {
-public:
+  public:
     CueTokenList() = default;
     explicit CueTokenList(const std::string& line) { Split(line); }
 
@@ -31,6 +31,6 @@ public:
     double ArgDouble(int i) const;
     const std::vector<std::string>& Tokens() const { return tokens_; }
 
-private:
+  private:
     std::vector<std::string> tokens_;
 };

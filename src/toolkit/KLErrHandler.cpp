@@ -22,11 +22,13 @@ KLErrHandler::KLErrHandler(int install) {
 }
 
 KLErrHandler::~KLErrHandler() {
-    if (installed_ && current_ == this) current_ = previous_;
+    if (installed_ && current_ == this)
+        current_ = previous_;
 }
 
 void KLErrHandler::Handle(KLErr* e) {
-    if (e->Level() < outputLevel) return;
+    if (e->Level() < outputLevel)
+        return;
     std::cerr << e->Message();
     std::cerr.flush();
 }
@@ -37,7 +39,8 @@ void KLErrHandler::SetStatusHook(StatusHook hook, void* data) {
 }
 
 void KLErrHandler::Report(int level, const std::string& message) {
-    if (level == KLErr::kStatus && status_hook) status_hook(message.c_str(), status_hook_data);
+    if (level == KLErr::kStatus && status_hook)
+        status_hook(message.c_str(), status_hook_data);
     KLErr e(level, message);
     if (current_)
         current_->Handle(&e);
@@ -45,14 +48,22 @@ void KLErrHandler::Report(int level, const std::string& message) {
         std::cerr << message << std::flush;
 }
 
-#define KL_REPORT(level)                            \
-    va_list args;                                   \
-    va_start(args, format);                         \
-    std::string message = KLVFmt(format, args);     \
-    va_end(args);                                   \
+#define KL_REPORT(level)                        \
+    va_list args;                               \
+    va_start(args, format);                     \
+    std::string message = KLVFmt(format, args); \
+    va_end(args);                               \
     KLErrHandler::Report(level, message)
 
-void KLStatus(const char* format, ...) { KL_REPORT(KLErr::kStatus); }
-void KLInform(const char* format, ...) { KL_REPORT(KLErr::kInformation); }
-void KLWarning(const char* format, ...) { KL_REPORT(KLErr::kWarning); }
-void KLError(const char* format, ...) { KL_REPORT(KLErr::kError); }
+void KLStatus(const char* format, ...) {
+    KL_REPORT(KLErr::kStatus);
+}
+void KLInform(const char* format, ...) {
+    KL_REPORT(KLErr::kInformation);
+}
+void KLWarning(const char* format, ...) {
+    KL_REPORT(KLErr::kWarning);
+}
+void KLError(const char* format, ...) {
+    KL_REPORT(KLErr::kError);
+}

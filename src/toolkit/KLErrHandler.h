@@ -5,7 +5,7 @@
 // One report of the toolkit's reporting functions: a level and a text (the text keeps its
 // own end of line, if any).
 class KLErr {
-public:
+  public:
     // Levels, least to most serious. A report reaches the handler's output only when its
     // level is at least KLErrHandler::outputLevel: the default shows warnings and errors,
     // "-v" (level 2) shows everything.
@@ -15,7 +15,7 @@ public:
     int Level() const { return level_; }
     const char* Message() const { return message_.c_str(); }
 
-private:
+  private:
     int level_;
     std::string message_;
 };
@@ -24,7 +24,7 @@ private:
 // with `install` 0 makes it the current one (the previous one is restored when it is
 // destroyed); without a handler, reports at or above the output level go to the error stream.
 class KLErrHandler {
-public:
+  public:
     static constexpr int kDefaultOutputLevel = KLErr::kWarning;
     static int outputLevel;
 
@@ -46,7 +46,7 @@ public:
     using StatusHook = void (*)(const char* message, void* data);
     static void SetStatusHook(StatusHook hook, void* data);
 
-private:
+  private:
     static KLErrHandler* current_;
     KLErrHandler* previous_ = nullptr;
     bool installed_ = false;

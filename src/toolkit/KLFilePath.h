@@ -4,7 +4,7 @@
 
 // File-name services. Paths are plain strings; nothing here touches a file's contents.
 class KLFilePath {
-public:
+  public:
     static bool Exists(const char* path);
     static bool IsReadable(const char* path);
     static bool IsWritable(const char* path);

@@ -9,7 +9,7 @@
 // DeleteAll or after Remove. Lookups are logarithmic.
 template <class T>
 class KLSkipList {
-public:
+  public:
     using Compare = int (*)(const void*, const void*);
 
     explicit KLSkipList(Compare compare) : set_(Less{compare}) { assert(compare); }
@@ -20,7 +20,8 @@ public:
     // Removes the element that compares equal to `probe` and returns it, or null.
     T* Remove(const T* probe) {
         auto it = set_.find(const_cast<T*>(probe));
-        if (it == set_.end()) return nullptr;
+        if (it == set_.end())
+            return nullptr;
         T* e = *it;
         set_.erase(it);
         return e;
@@ -56,7 +57,8 @@ public:
     void Clear() { set_.clear(); }
     // Deletes every element and empties the list.
     void DeleteAll() {
-        for (T* e : set_) delete e;
+        for (T* e : set_)
+            delete e;
         set_.clear();
     }
 
@@ -64,7 +66,7 @@ public:
     auto begin() const { return set_.begin(); }
     auto end() const { return set_.end(); }
 
-private:
+  private:
     struct Less {
         Compare compare;
         bool operator()(const T* a, const T* b) const { return compare(a, b) < 0; }

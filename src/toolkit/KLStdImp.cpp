@@ -19,21 +19,33 @@ KLStdImp& fallback() {
 }
 }  // namespace
 
-KLStdImp& KLStdImp::Workspace() { return theImp ? *theImp : fallback(); }
+KLStdImp& KLStdImp::Workspace() {
+    return theImp ? *theImp : fallback();
+}
 
 KLStdImp::KLStdImp() {
-    if (!theImp) theImp = this;
+    if (!theImp)
+        theImp = this;
 }
 
 KLStdImp::~KLStdImp() {
-    if (theImp == this) theImp = nullptr;
+    if (theImp == this)
+        theImp = nullptr;
 }
 
-const char* KLStdImp::GetPixDirectory() { return CuePrefs::PixDir(); }
-const char* KLStdImp::GetWireDirectory() { return CuePrefs::WireDir(); }
-const char* KLStdImp::GetDataDirectory() { return CuePrefs::MiscDir(); }
+const char* KLStdImp::GetPixDirectory() {
+    return CuePrefs::PixDir();
+}
+const char* KLStdImp::GetWireDirectory() {
+    return CuePrefs::WireDir();
+}
+const char* KLStdImp::GetDataDirectory() {
+    return CuePrefs::MiscDir();
+}
 
-void KLStdImp::Inform(const char* message, const char* /*button*/) { std::cerr << message << std::endl; }
+void KLStdImp::Inform(const char* message, const char* /*button*/) {
+    std::cerr << message << std::endl;
+}
 
 int KLStdImp::Confirm(const char* message, const char* /*yes*/, const char* /*no*/) {
     std::cerr << message << std::endl << "Assuming OK" << std::endl;

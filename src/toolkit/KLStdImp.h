@@ -5,7 +5,7 @@
 // no workspace or window headers. Every operation has a plain default for programs and
 // tests that run without a workspace.
 class KLStdImp {
-public:
+  public:
     static KLStdImp* theImp;  // the workspace; set by the first KLStdImp constructed
     // theImp, or a plain stand-in with the default behaviour while there is none.
     static KLStdImp& Workspace();

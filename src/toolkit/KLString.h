@@ -15,4 +15,6 @@ std::string KLVFmt(const char* format, va_list args);
 // stands. An empty string is quoted too, so that it stays a token when read back. Null gives
 // an empty quoted token.
 std::string KLQuote(const char* s, char open = '"', char close = '"', const char* force = " \t");
-inline std::string KLQuote(const std::string& s) { return KLQuote(s.c_str()); }
+inline std::string KLQuote(const std::string& s) {
+    return KLQuote(s.c_str());
+}

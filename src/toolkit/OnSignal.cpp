@@ -9,7 +9,8 @@ KLSignalHandler handlers[kMaxSignal];
 void* handler_data[kMaxSignal];
 
 void trampoline(int sig) {
-    if (sig > 0 && sig < kMaxSignal && handlers[sig]) handlers[sig](sig, handler_data[sig]);
+    if (sig > 0 && sig < kMaxSignal && handlers[sig])
+        handlers[sig](sig, handler_data[sig]);
     std::signal(sig, SIG_DFL);
     std::raise(sig);
 }
@@ -17,7 +18,8 @@ void trampoline(int sig) {
 }  // namespace
 
 bool OnSignal(int sig, KLSignalHandler handler, void* data) {
-    if (sig <= 0 || sig >= kMaxSignal) return false;
+    if (sig <= 0 || sig >= kMaxSignal)
+        return false;
     handlers[sig] = handler;
     handler_data[sig] = data;
     struct sigaction action = {};
