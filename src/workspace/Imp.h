@@ -88,6 +88,8 @@ public:
 
     // --- reference and playblast sequences
     int LoadReference(const char* name);
+    // The playblast sequence: the same name rules and dialog as LoadReference.
+    int LoadPlayblast(const char* name);
     void DeleteReference();
     void DeletePlayblast();
     CueTime ReferenceEnd();
