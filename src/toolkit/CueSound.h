@@ -1,14 +1,16 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <vector>
 
 // A sound held in memory: 32-bit float samples per channel, in -1..1 for integer formats.
-// Reads AIFF, AIFF-C, WAV and the other formats audiofile reads. A file that cannot be read
-// leaves an empty sound (no channels, no frames) and says why in ErrorText().
+// Reads AIFF and AIFF-C (8/16/24/32-bit integer, float, mu-law and A-law), WAV and NeXT/Sun
+// sound files through audiofile. A file that cannot be read leaves an empty sound (no
+// channels, no frames) and says why in ErrorText().
 class CueSound {
-public:
+  public:
     CueSound() = default;
     // Reads the sound file `path`; check Valid() afterwards.
     explicit CueSound(const char* path);
@@ -16,7 +18,8 @@ public:
     // Reads a whole sound file image from memory; `name` is only used in messages.
     static std::unique_ptr<CueSound> FromMemory(const void* data, size_t size, const char* name);
     // A sound made of the given channels (all of one length) at `rate` frames per second.
-    static std::unique_ptr<CueSound> FromSamples(std::vector<std::vector<float>> channels, double rate);
+    static std::unique_ptr<CueSound> FromSamples(std::vector<std::vector<float>> channels,
+                                                 double rate);
 
     bool Valid() const { return !channels_.empty() && rate_ > 0; }
     // Why the file could not be read, or why it was read only in part; empty when all is well.
@@ -46,7 +49,12 @@ public:
     // The mix of all channels resampled to `rate` frames per second (16 kHz for recognizers).
     std::vector<float> Resampled(double rate) const;
 
-private:
+  private:
+    // Decodes a whole sound file image; `bytes` has its size fields repaired in place.
+    void load(std::vector<uint8_t>& bytes);
+    // Empties the sound and keeps "Could not open sound file [name]: reason" as the error.
+    void fail(const std::string& reason);
+
     std::vector<std::vector<float>> channels_;
     double rate_ = 0.0;
     float min_ = 0.0f;

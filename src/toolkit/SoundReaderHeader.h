@@ -1,0 +1,30 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <vector>
+
+// Checks and repairs the container of a sound file image held in memory before the sound
+// library parses it. The library trusts the size fields it reads: a FORM or RIFF size larger
+// than the file makes it walk zero-filled "chunks" for a very long time, and a data chunk that
+// claims more bytes than there are makes it promise frames it cannot deliver. This class
+// rewrites such fields, in place, to what the bytes really hold, and refuses containers and
+// encodings that this program does not read (compressed ADPCM codecs and formats other than
+// AIFF, AIFF-C, WAV and NeXT/Sun).
+class SoundReaderHeader {
+  public:
+    enum Kind { kUnknown, kAiff, kAiffC, kWave, kNext };
+
+    // Clamps the size fields of `bytes` to its real size. Returns false, with the reason in
+    // *reason, when the image is not a sound this program reads.
+    static bool Sanitize(std::vector<uint8_t>& bytes, std::string* reason, Kind* kind = nullptr);
+
+    // The container kind named by the first bytes, without checking the rest.
+    static Kind Identify(const uint8_t* data, size_t size);
+
+  private:
+    static bool sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc, std::string* reason);
+    static bool sanitize_wave(std::vector<uint8_t>& bytes, std::string* reason);
+    static bool sanitize_next(std::vector<uint8_t>& bytes, std::string* reason);
+};
