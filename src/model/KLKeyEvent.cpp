@@ -1,0 +1,38 @@
+#include "model/KLKeyEvent.h"
+
+#include <cstring>
+
+int SmoothFromString(const char* name) {
+    if (!name)
+        return KLKeyEvent::kEase;
+    for (const char* s : {"Linear", "LINEAR", "linear"}) {
+        if (std::strcmp(name, s) == 0)
+            return KLKeyEvent::kLinear;
+    }
+    for (const char* s : {"Smooth", "SMOOTH", "smooth"}) {
+        if (std::strcmp(name, s) == 0)
+            return KLKeyEvent::kSmooth;
+    }
+    return KLKeyEvent::kEase;
+}
+
+const char* KLKeyEvent::GetSmoothName() const {
+    switch (smoothing) {
+        case kLinear:
+            return "Linear";
+        case kEase:
+            return "Ease";
+        case kSmooth:
+            return "Smooth";
+        default:
+            return "Unknown";
+    }
+}
+
+int KLKeyEvent::CompareByTimestamp(const void* a, const void* b) {
+    const CueTime ta = static_cast<const KLKeyEvent*>(a)->time;
+    const CueTime tb = static_cast<const KLKeyEvent*>(b)->time;
+    if (ta == tb)
+        return 0;
+    return ta < tb ? -1 : 1;
+}

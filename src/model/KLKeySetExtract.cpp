@@ -1,0 +1,60 @@
+// Key-shape extraction: the key channels of a kind-1 keyset sampled from its scene.
+#include <memory>
+
+#include "model/KLKeySet.h"
+#include "scene/KLWire.h"
+#include "scene/OrDagNode.h"
+#include "toolkit/KLErrHandler.h"
+
+void KLKeySet::extract_dag(CueTime t, int index, OrDagNode* node) {
+    if (!node)
+        return;
+    const double frame = t.Frames();
+    const char* nodeName = KLWire::NodeName(node);
+    for (int c = KLKeyChannel::kTX; c <= KLKeyChannel::kSZ; ++c) {
+        OrChannel* channel = KLWire::FindChannel(node, c);
+        if (!channel)
+            continue;
+        const double value = channel->eval(frame);
+        KLKeyChannel* kc = GetKeyChannel(nodeName, c);
+        if (!kc) {
+            kc = new KLKeyChannel(nodeName, c, keyShapeCount);
+            AddKeyChannel(kc);
+        }
+        kc->Set(index, float(value));
+    }
+    if (node->asGroupNodePtr()) {
+        for (std::unique_ptr<OrDagNode> child(node->childNode()); child;
+             child.reset(child->nextNode())) {
+            extract_dag(t, index, child.get());
+        }
+    }
+}
+
+// Samples every top-level node (and all below it) at each key shape's frame, then drops the
+// channels that do not change between key shapes. Channels are shared by (node name,
+// channel), so two nodes of one name set the same slots twice and their channel is dropped
+// as incompletely filled: only uniquely named nodes are extracted.
+void KLKeySet::ExtractKeys(OrDagNode* scene) {
+    if (!scene)
+        return;
+    for (int i = 0; i < keyShapeCount; ++i) {
+        const KLKey* key = keyShapes[i].get();
+        const CueTime t(double(key->frame), 0);
+        std::unique_ptr<OrDagNode> node(scene->isRoot()
+                                            ? scene->childNode()
+                                            : new OrDagNode(scene->documentPtr(), scene->index()));
+        for (; node; node.reset(node->nextNode()))
+            extract_dag(t, key->index, node.get());
+    }
+    for (auto it = keyChannels.begin(); it != keyChannels.end();) {
+        KLKeyChannel* kc = *it;
+        if (kc->Constant()) {
+            delete kc;
+            it = keyChannels.erase(it);
+        } else {
+            KLInform("Key Channel [%s.%s].\n", kc->Name() ? kc->Name() : "", kc->GetChannelName());
+            ++it;
+        }
+    }
+}

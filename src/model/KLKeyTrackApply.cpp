@@ -1,0 +1,208 @@
+// Apply of a key track to a scene, and the 3D preview's key frames.
+#include <cstring>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "model/KLKey.h"
+#include "model/KLKeyChannel.h"
+#include "model/KLKeySet.h"
+#include "model/KLKeyTrack.h"
+#include "scene/KLChannel.h"
+#include "scene/KLKeyFrameList.h"
+#include "scene/KLWire.h"
+#include "scene/KLWireSource.h"
+#include "scene/OrDagNode.h"
+#include "toolkit/KLErrHandler.h"
+#include "toolkit/KLStdImp.h"
+#include "toolkit/KLString.h"
+
+namespace {
+using NodeHandle = std::unique_ptr<OrDagNode>;
+
+// The scene's tangent code for a key set with this smoothing.
+int tangent_code(int smoothing) {
+    switch (smoothing) {
+        case KLKeyEvent::kLinear:
+            return KLWire::kLinear;
+        case KLKeyEvent::kSmooth:
+            return KLWire::kSmooth;
+        default:
+            return KLWire::kFlat;
+    }
+}
+
+// The base node of an apply: the first top-level node named `dagName`, else the node of that
+// name anywhere below the root; null when there is none.
+NodeHandle find_base(KLWireSource* wire, const char* dagName) {
+    if (!wire || !dagName)
+        return nullptr;
+    NodeHandle root(wire->RootNode());
+    if (!root)
+        return nullptr;
+    for (NodeHandle node(root->childNode()); node; node.reset(node->nextNode())) {
+        const char* name = KLWire::NodeName(node.get());
+        if (name && std::strcmp(name, dagName) == 0)
+            return node;
+    }
+    return NodeHandle(KLWire::FetchDagNode(root.get(), dagName));
+}
+
+// The keys of one curve, one per event inside the range. Arrays hold one spare entry: the
+// out-tangent of key k is written at k + 1.
+struct Curve {
+    explicit Curve(size_t events)
+        : times(events + 1), values(events + 1), in(events + 1), out(events + 1) {}
+    std::vector<CueTime> times;
+    std::vector<float> values;
+    std::vector<int> in;
+    std::vector<int> out;
+    int count = 0;
+
+    // Adds a key; each key leaves in the manner in which the key before it was set, the
+    // first one flat.
+    void Add(CueTime t, float value, int smoothing) {
+        if (count == 0)
+            out[0] = KLWire::kFlat;
+        times[count] = t;
+        values[count] = value;
+        in[count] = tangent_code(smoothing);
+        out[count + 1] = tangent_code(smoothing);
+        ++count;
+    }
+    void Store(OrDagNode* node, int channel) const {
+        if (count == 0)
+            return;
+        KLWire::alwaysClearChannel = 1;
+        KLWire::StoreChannel(node, channel, count, times.data(), values.data(), in.data(), nullptr,
+                             out.data(), nullptr);
+    }
+};
+
+// The node that a kind-1 key channel names, below `base`. A name that is not found whole is
+// cut at its first "#" and, when exactly one node bears the cut name, looked up again with
+// name demangling on. Sets *ambiguous when the cut name is not unique (or not there at all).
+NodeHandle find_channel_node(OrDagNode* base, const char* name, bool* ambiguous) {
+    *ambiguous = false;
+    NodeHandle node(KLWire::FetchDagNode(base, name));
+    if (node)
+        return node;
+    std::string cut(name);
+    const size_t hash = cut.find('#');
+    if (hash != std::string::npos)
+        cut.erase(hash);
+    if (KLWire::UniqueDagName(base, cut.c_str())) {
+        KLWire::DemangleNames(1);
+        node.reset(KLWire::FetchDagNode(base, cut.c_str()));
+        KLWire::DemangleNames(0);
+    } else {
+        *ambiguous = true;
+    }
+    return node;
+}
+}  // namespace
+
+// For each animated parameter of the keyset, one key per event with start <= time <= end (in
+// ticks, both ends inclusive) at time + offset, replacing the parameter's animation in the
+// scene. Kind 1 blends each parameter from the rest pose (value 0) to the event's key shape
+// (value 1) and beyond: d + value * (s - d). Kind 2 writes the values as they stand onto the
+// keyset's node and channel.
+int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, CueTime end,
+                      CueTime offset) {
+    KLStdImp& imp = KLStdImp::Workspace();
+    NodeHandle base = find_base(wire, dagName);
+    if (!base) {
+        imp.Inform(KLFmt("Cannot find base dag [%s] for apply ...", dagName ? dagName : "").c_str(),
+                   "Dismiss");
+        return 0;
+    }
+    if (!keySet)
+        return 1;
+    const size_t eventCount = size_t(events.Count());
+
+    if (keySet->kind == 1) {
+        for (KLKeyChannel* kc : keySet->keyChannels) {
+            const char* name = kc->Name() ? kc->Name() : "";
+            if (!kc->Constant())
+                KLInform("Apply [%s.%s]...\n", name, kc->GetChannelName());
+            bool ambiguous = false;
+            NodeHandle node = find_channel_node(base.get(), name, &ambiguous);
+            if (!node) {
+                const std::string message =
+                    ambiguous ? KLFmt("Dag name [%s] isn't unique, ignored.", name)
+                              : KLFmt("Could not locate apply dag [%s].", name);
+                if (!imp.Confirm(message.c_str(), "Continue", "Cancel"))
+                    return 0;
+                continue;
+            }
+            const float rest = kc->Get(keySet->defaultIndex);
+            Curve curve(eventCount);
+            for (const KLKeyEvent* event : events) {
+                if (event->time < start || event->time > end)
+                    continue;
+                const int shape = event->key ? event->key->index : event->shapeIndex;
+                const float full = kc->Get(shape);
+                curve.Add(event->time + offset, rest + event->value * (full - rest),
+                          event->smoothing);
+            }
+            curve.Store(node.get(), kc->channel);
+        }
+    } else if (keySet->kind == 2) {
+        const char* name = keySet->nodeName ? keySet->nodeName->c_str() : "";
+        KLWire::DemangleNames(1);
+        NodeHandle node(KLWire::FetchDagNode(base.get(), name));
+        KLWire::DemangleNames(0);
+        if (!node) {
+            return imp.Confirm(KLFmt("Could not locate apply dag [%s].", name).c_str(), "Continue",
+                               "Cancel")
+                       ? 1
+                       : 0;
+        }
+        Curve curve(eventCount);
+        for (const KLKeyEvent* event : events) {
+            if (event->time < start || event->time > end)
+                continue;
+            curve.Add(event->time + offset, event->value, event->smoothing);
+        }
+        curve.Store(node.get(), keySet->channelIndex);
+    }
+    return 1;
+}
+
+// Kind 1: one key per event on the key-shape channel (the key shape's shapeValue) and on the
+// value channel (the event's value), making and registering both channels with the key frame
+// list on first use. Only while the workspace prepares key frames. Kind 2: refills the value
+// channel, when there is one, with the events' values.
+void KLKeyTrack::PrepareKeyFrames(KLKeyFrameList* list) {
+    if (!keySet)
+        return;
+    if (keySet->kind == 1) {
+        if (!list)
+            list = keySet->keyFrameList;
+        if (!list || !KLStdImp::Workspace().KeyFramePreparation())
+            return;
+        if (!shapeChannel || !weightChannel) {
+            release_channels();
+            ownShape_ = std::make_unique<KLSplineChannel>();
+            ownWeight_ = std::make_unique<KLSplineChannel>();
+            ownShape_->SetStorageKeyed();
+            ownWeight_->SetStorageKeyed();
+            shapeChannel = ownShape_.get();
+            weightChannel = ownWeight_.get();
+            list->AddKeyChannel(shapeChannel, weightChannel);
+        } else {
+            shapeChannel->ClearAnimation();
+            weightChannel->ClearAnimation();
+        }
+        for (const KLKeyEvent* event : events) {
+            const KLKey* key = event->key ? event->key : keySet->GetKeyShape(event->shapeIndex);
+            if (key)
+                shapeChannel->AddKey(event->time, float(key->shapeValue));
+            weightChannel->AddKey(event->time, event->value);
+        }
+    } else if (keySet->kind == 2 && weightChannel) {
+        weightChannel->ClearAnimation();
+        for (const KLKeyEvent* event : events)
+            weightChannel->AddKey(event->time, event->value);
+    }
+}
