@@ -3,10 +3,10 @@
 #include <memory>
 #include <string>
 
+#include "toolkit/CueRecognizerCatalog.h"
 #include "toolkit/CueTime.h"
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLStdImp.h"
-#include "toolkit/CueRecognizerCatalog.h"
 
 class CueRecognizer;
 class CueSound;
@@ -25,13 +25,13 @@ class KLWireSource;
 // catalogue) and performs every load, save and apply. It reaches the user only through
 // theGhost.
 class Imp : public KLStdImp {
-public:
+  public:
     static constexpr int kMaxKeysets = 10;
 
     // The error log: a file that collects the toolkit's reports, opened and closed for every
     // message so that it is complete on disk at every moment.
     class KLErrorLog : public KLErrHandler {
-    public:
+      public:
         explicit KLErrorLog(const char* name);
         ~KLErrorLog() override;
         void Handle(KLErr* e) override;
@@ -144,8 +144,10 @@ public:
     std::unique_ptr<KLEdlEvent> applyEvent;
     int feedback = 2;
     int tessU = 0, tessV = 0;
+    // Set in batch mode when a keyset load found no usable scene file: the batch run ends.
+    int batchStop = 0;
 
-private:
+  private:
     // Keyset description parsing.
     void parse_keyset_file(std::istream& in);
     void parse_keyset(CueStatement& s, std::istream& in);
