@@ -1,0 +1,13 @@
+// A plug-in built for another version of the plug-in interface: it must be refused before
+// its create function is ever called.
+#include <cstdlib>
+
+#include "toolkit/CuePlugin.h"
+
+CHIRRUP_PLUGIN_EXPORT int chirrup_plugin_abi_version(void) {
+    return CHIRRUP_PLUGIN_ABI_VERSION + 41;
+}
+
+CHIRRUP_PLUGIN_EXPORT CueRecognizer* chirrup_plugin_create(void) {
+    std::abort();
+}
