@@ -8,7 +8,7 @@
 // with linear interpolation between keys and held before the first and after the last, or a
 // static value while the channel is marked static.
 class KLChannel {
-public:
+  public:
     virtual ~KLChannel() = default;
 
     void SetStorageKeyed() { keyed_ = true; }
@@ -25,7 +25,7 @@ public:
 
     virtual float Evaluate(CueTime t) const;
 
-protected:
+  protected:
     struct Key {
         CueTime time;
         float value;
@@ -38,6 +38,6 @@ protected:
 
 // A channel whose keys are joined by a smooth (Catmull-Rom) curve.
 class KLSplineChannel : public KLChannel {
-public:
+  public:
     float Evaluate(CueTime t) const override;
 };

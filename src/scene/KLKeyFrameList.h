@@ -9,7 +9,7 @@ class KLChannel;
 // order, plus one extra frame (the rest pose), and the key-shape and value channels that the
 // preview's key tracks register with it. The channels are borrowed.
 class KLKeyFrameList {
-public:
+  public:
     KLKeyFrameList(std::vector<int> frames, int extraFrame)
         : frames_(std::move(frames)), extraFrame_(extraFrame) {}
 
@@ -21,7 +21,7 @@ public:
     void RemoveKeyChannel(KLChannel* channel);
     const std::vector<std::pair<KLChannel*, KLChannel*>>& KeyChannels() const { return channels_; }
 
-private:
+  private:
     std::vector<int> frames_;
     int extraFrame_;
     std::vector<std::pair<KLChannel*, KLChannel*>> channels_;

@@ -10,7 +10,7 @@ class KLWireSource;
 // The scene shown in the 3D views: the geometry loaded from the keyset's scene file and the
 // display settings. Holds no GL state itself.
 class KLScene {
-public:
+  public:
     KLScene();
     ~KLScene();
 
@@ -34,7 +34,7 @@ public:
     bool EvaluatesDags() const { return evaluateDags_; }
     KLWireSource* Source() const { return source_; }
 
-private:
+  private:
     bool evaluateDags_ = false;
     bool deltaShape_ = false;
     bool transparency_ = true;

@@ -17,7 +17,7 @@ struct KLDagList {
 // nodes they hand out. Channels 0..8 are TX TY TZ RX RY RZ SX SY SZ of a node's local
 // transform; rotations in degrees.
 class KLWire {
-public:
+  public:
     enum Tangent { kSmooth = 0, kLinear = 1, kFlat = 2 };
 
     static int alwaysClearChannel;  // set to 1 before StoreChannel: old keys are cleared first
@@ -56,7 +56,7 @@ public:
 // One animated channel of a node: a key curve (times in seconds) evaluated at frames of the
 // workspace frame rate.
 class OrChannel {
-public:
+  public:
     virtual ~OrChannel() = default;
     virtual double eval(double frame) const = 0;
 };

@@ -9,7 +9,7 @@ class SceneDocument;
 // An open scene file. The constructor reads the file; Valid() says whether that worked and
 // ErrorText() why not (the message names the file).
 class KLWireSource {
-public:
+  public:
     explicit KLWireSource(const char* path);
     ~KLWireSource();
 
@@ -31,7 +31,7 @@ public:
 
     SceneDocument* document() const { return doc_.get(); }
 
-private:
+  private:
     std::shared_ptr<SceneDocument> doc_;
     std::string path_;
     std::string error_;

@@ -8,8 +8,9 @@ class SceneDocument;
 // children are the scene's root nodes). Handles are small objects handed out by the scene
 // layer; whoever receives one deletes it when done. A handle must not outlive its scene.
 class OrDagNode {
-public:
-    OrDagNode(std::shared_ptr<SceneDocument> doc, int index) : doc_(std::move(doc)), index_(index) {}
+  public:
+    OrDagNode(std::shared_ptr<SceneDocument> doc, int index)
+        : doc_(std::move(doc)), index_(index) {}
 
     // This node when it is a group (a node with children, or the root), else null. The
     // result is this very handle, not a new one.
@@ -26,7 +27,7 @@ public:
     int index() const { return index_; }
     bool isRoot() const { return index_ < 0; }
 
-private:
+  private:
     std::shared_ptr<SceneDocument> doc_;
     int index_;
 };

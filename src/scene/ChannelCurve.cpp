@@ -1,0 +1,124 @@
+#include "scene/ChannelCurve.h"
+
+#include <algorithm>
+#include <cmath>
+
+#include "toolkit/CueTime.h"
+
+namespace {
+constexpr double kSameTime = 0.5e-6;  // seconds: keys closer than this are at one time
+}
+
+double ChannelCurve::segmentSlope(size_t i) const {
+    const Key& a = keys_[i];
+    const Key& b = keys_[i + 1];
+    double dt = b.time - a.time;
+    return dt > 0 ? (b.value - a.value) / dt : 0.0;
+}
+
+double ChannelCurve::smoothSlope(size_t i) const {
+    size_t n = keys_.size();
+    if (n < 2) {
+        return 0.0;
+    }
+    size_t lo = i == 0 ? 0 : i - 1;
+    size_t hi = i + 1 < n ? i + 1 : n - 1;
+    double dt = keys_[hi].time - keys_[lo].time;
+    return dt > 0 ? (keys_[hi].value - keys_[lo].value) / dt : 0.0;
+}
+
+double ChannelCurve::OutSlope(size_t i) const {
+    const Key& k = keys_[i];
+    switch (k.out) {
+        case kSmooth:
+            return smoothSlope(i);
+        case kLinear:
+            return i + 1 < keys_.size() ? segmentSlope(i) : 0.0;
+        case kExplicit:
+            return k.outSlope;
+        case kFlat:
+        case kStep:
+            break;
+    }
+    return 0.0;
+}
+
+double ChannelCurve::InSlope(size_t i) const {
+    const Key& k = keys_[i];
+    switch (k.in) {
+        case kSmooth:
+            return smoothSlope(i);
+        case kLinear:
+            return i > 0 ? segmentSlope(i - 1) : 0.0;
+        case kExplicit:
+            return k.inSlope;
+        case kFlat:
+        case kStep:
+            break;
+    }
+    return 0.0;
+}
+
+double ChannelCurve::Evaluate(double seconds) const {
+    if (keys_.empty()) {
+        return 0.0;
+    }
+    if (!(seconds > keys_.front().time)) {  // also NaN
+        return keys_.front().value;
+    }
+    if (seconds >= keys_.back().time) {
+        return keys_.back().value;
+    }
+    // First key strictly after `seconds`; the segment runs from the key before it.
+    auto it = std::upper_bound(keys_.begin(), keys_.end(), seconds,
+                               [](double s, const Key& k) { return s < k.time; });
+    size_t i = size_t(it - keys_.begin()) - 1;
+    const Key& a = keys_[i];
+    const Key& b = keys_[i + 1];
+    if (a.out == kStep) {
+        return a.value;
+    }
+    double dt = b.time - a.time;
+    double u = (seconds - a.time) / dt;
+    if (a.out == kLinear && b.in == kLinear) {
+        return a.value + (b.value - a.value) * u;  // exact straight line
+    }
+    double m0 = OutSlope(i) * dt;
+    double m1 = InSlope(i + 1) * dt;
+    double u2 = u * u, u3 = u2 * u;
+    return (2 * u3 - 3 * u2 + 1) * a.value + (u3 - 2 * u2 + u) * m0 + (-2 * u3 + 3 * u2) * b.value +
+           (u3 - u2) * m1;
+}
+
+double ChannelCurve::eval(double frame) const {
+    int fps = CueTime::default_fps > 0 ? CueTime::default_fps : 30;
+    return Evaluate(frame / fps);
+}
+
+bool ChannelCurve::AllLinear() const {
+    for (size_t i = 0; i + 1 < keys_.size(); ++i) {
+        if (keys_[i].out != kLinear || keys_[i + 1].in != kLinear) {
+            return false;
+        }
+    }
+    return true;
+}
+
+bool ChannelCurve::AllStep() const {
+    for (size_t i = 0; i + 1 < keys_.size(); ++i) {
+        if (keys_[i].out != kStep) {
+            return false;
+        }
+    }
+    return true;
+}
+
+void ChannelCurve::Merge(const Key& key) {
+    auto it = std::lower_bound(keys_.begin(), keys_.end(), key.time - kSameTime,
+                               [](const Key& k, double t) { return k.time < t; });
+    if (it != keys_.end() && std::fabs(it->time - key.time) <= kSameTime) {
+        *it = key;
+    } else {
+        keys_.insert(it, key);
+    }
+}

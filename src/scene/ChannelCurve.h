@@ -1,0 +1,57 @@
+#pragma once
+
+#include <vector>
+
+#include "scene/KLWire.h"
+
+// The key curve of one transform channel of a scene node: keys at times in seconds (strictly
+// increasing), each with a value and the kind of its incoming and outgoing tangent. Between two
+// keys the curve is a cubic Hermite segment whose end slopes follow from the tangent kinds
+// (a step holds the left key's value); before the first key and after the last the curve holds.
+class ChannelCurve : public OrChannel {
+  public:
+    enum Kind {
+        kSmooth = 0,    // Catmull-Rom slope through the neighbouring keys
+        kLinear = 1,    // slope of the straight line to the neighbour on that side
+        kFlat = 2,      // zero slope
+        kStep = 3,      // (out side only) hold the value until the next key
+        kExplicit = 4,  // slope given in inSlope/outSlope (units per second)
+    };
+    struct Key {
+        double time = 0;  // seconds
+        double value = 0;
+        Kind in = kLinear;
+        Kind out = kLinear;
+        double inSlope = 0;  // for kExplicit, units per second
+        double outSlope = 0;
+    };
+
+    ChannelCurve() = default;
+    explicit ChannelCurve(std::vector<Key> keys) : keys_(std::move(keys)) {}
+
+    const std::vector<Key>& keys() const { return keys_; }
+    std::vector<Key>& keys() { return keys_; }
+    bool empty() const { return keys_.empty(); }
+
+    // Value at `seconds`.
+    double Evaluate(double seconds) const;
+    // Value at `frame` frames of CueTime::default_fps.
+    double eval(double frame) const override;
+
+    // The slope (units per second) with which the curve leaves key `i` (out) or arrives at it
+    // (in), resolved from the tangent kinds; a step leaves with slope 0.
+    double OutSlope(size_t i) const;
+    double InSlope(size_t i) const;
+    // True when every segment is a straight line (both ends linear) or every one a step.
+    bool AllLinear() const;
+    bool AllStep() const;
+
+    // Inserts the key or replaces the one at the same time (within half a microsecond).
+    void Merge(const Key& key);
+
+  private:
+    double smoothSlope(size_t i) const;
+    double segmentSlope(size_t i) const;  // of the straight line from key i to key i + 1
+
+    std::vector<Key> keys_;
+};

@@ -1,0 +1,165 @@
+#include "scene/KLWire.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+#include <fstream>
+#include <functional>
+
+#include "scene/OrDagNode.h"
+#include "scene/SceneDocument.h"
+
+int KLWire::alwaysClearChannel = 0;
+
+namespace {
+bool demangle = false;
+
+// Calls `visit` on `index` and every node below it, depth first, parents before children;
+// stops as soon as `visit` returns true and then returns that node (else -2).
+int walk(const SceneDocument& doc, int index, const std::function<bool(int)>& visit) {
+    if (visit(index)) {
+        return index;
+    }
+    for (int c = doc.FirstChild(index); c >= 0; c = doc.NextSibling(c)) {
+        int found = walk(doc, c, visit);
+        if (found != -2) {
+            return found;
+        }
+    }
+    return -2;
+}
+
+// The name up to its first "#" (the instance suffix removed).
+std::string base_name(const std::string& name) {
+    return name.substr(0, name.find('#'));
+}
+
+ChannelCurve::Kind tangent_kind(int code) {
+    switch (code) {
+        case KLWire::kSmooth:
+            return ChannelCurve::kSmooth;
+        case KLWire::kFlat:
+            return ChannelCurve::kFlat;
+        default:
+            return ChannelCurve::kLinear;
+    }
+}
+}  // namespace
+
+KLDagList::~KLDagList() {
+    for (OrDagNode* n : nodes) {
+        delete n;
+    }
+}
+
+void KLWire::Initialize() {
+    demangle = false;
+    alwaysClearChannel = 0;
+}
+
+int KLWire::IsWireFile(const char* path) {
+    if (!path) {
+        return 0;
+    }
+    std::string error;
+    return SceneDocument::Load(path, &error) ? 1 : 0;
+}
+
+const char* KLWire::NodeName(OrDagNode* node) {
+    return node ? node->name() : "";
+}
+
+OrDagNode* KLWire::FetchDagNode(OrDagNode* below, const char* name) {
+    if (!below || !name) {
+        return nullptr;
+    }
+    const SceneDocument& doc = *below->document();
+    std::string wanted = name;
+    int found = walk(doc, below->index(), [&](int i) { return doc.NodeName(i) == wanted; });
+    if (found == -2 && demangle && wanted.find('#') == std::string::npos) {
+        std::string prefix = wanted + "#";
+        found = walk(doc, below->index(),
+                     [&](int i) { return doc.NodeName(i).compare(0, prefix.size(), prefix) == 0; });
+    }
+    return found == -2 ? nullptr : new OrDagNode(below->documentPtr(), found);
+}
+
+int KLWire::UniqueDagName(OrDagNode* below, const char* name) {
+    if (!below || !name) {
+        return 0;
+    }
+    const SceneDocument& doc = *below->document();
+    std::string wanted = name;
+    int count = 0;
+    walk(doc, below->index(), [&](int i) {
+        count += base_name(doc.NodeName(i)) == wanted;
+        return count > 1;
+    });
+    return count == 1;
+}
+
+void KLWire::DemangleNames(int on) {
+    demangle = on != 0;
+}
+
+OrChannel* KLWire::FindChannel(OrDagNode* node, int channel) {
+    if (!node || node->isRoot()) {
+        return nullptr;
+    }
+    return node->document()->Curve(node->index(), channel);
+}
+
+int KLWire::StoreChannel(OrDagNode* node, int channel, int count, const CueTime* times,
+                         const float* values, const int* inTangents, const void* /*inDetail*/,
+                         const int* outTangents, const void* /*outDetail*/) {
+    if (!node || node->isRoot() || channel < 0 || channel >= SceneDocument::kChannels ||
+        count < 0 || (count > 0 && (!times || !values))) {
+        return 0;
+    }
+    std::vector<ChannelCurve::Key> keys;
+    keys.reserve(size_t(count));
+    for (int i = 0; i < count; ++i) {
+        if (!std::isfinite(values[i])) {
+            return 0;
+        }
+        ChannelCurve::Key k;
+        k.time = times[i].Seconds();
+        k.value = values[i];
+        k.in = tangent_kind(inTangents ? inTangents[i] : kLinear);
+        k.out = tangent_kind(outTangents ? outTangents[i] : kLinear);
+        keys.push_back(k);
+    }
+    // Keys in time order; of two at one time the later given wins (Merge replaces).
+    std::stable_sort(
+        keys.begin(), keys.end(),
+        [](const ChannelCurve::Key& a, const ChannelCurve::Key& b) { return a.time < b.time; });
+    node->document()->SetCurve(node->index(), channel, keys, alwaysClearChannel != 0);
+    return 1;
+}
+
+KLDagList* KLWire::BuildDagList(OrDagNode* root, int withRoot) {
+    auto* list = new KLDagList;
+    if (!root) {
+        return list;
+    }
+    const SceneDocument& doc = *root->document();
+    walk(doc, root->index(), [&](int i) {
+        if (i != root->index() || withRoot) {
+            list->nodes.push_back(new OrDagNode(root->documentPtr(), i));
+        }
+        return false;
+    });
+    return list;
+}
+
+void KLWire::DeleteDagList(KLDagList* list) {
+    delete list;
+}
+
+void KLWire::NukeBlendSurfaces(OrDagNode* /*root*/) {}
+
+void KLWire::EmptyDumpster() {}
+
+void KLWire::ClearAll() {
+    demangle = false;
+}
