@@ -222,7 +222,8 @@ void CueSound::fail(const std::string& reason) {
 
 void CueSound::load(std::vector<uint8_t>& bytes) {
     std::string reason;
-    if (!SoundReaderHeader::Sanitize(bytes, &reason)) {
+    SoundReaderHeader::Result header;
+    if (!SoundReaderHeader::Sanitize(bytes, &reason, &header)) {
         fail(reason);
         return;
     }
@@ -304,9 +305,12 @@ void CueSound::load(std::vector<uint8_t>& bytes) {
         fail(messages.Text().empty() ? "no sample frames could be read" : messages.Text());
         return;
     }
-    if (total < frames) {
+    // A cut file has had its header shortened to the frames present; the frame count it
+    // first claimed is what the user should hear about.
+    const long long claimed = std::max(frames, header.claimedFrames);
+    if (total < claimed) {
         error_ = KLFmt("Sound file [%s] is short: read %lld of %lld sample frames",
-                       fileName_.c_str(), total, frames);
+                       fileName_.c_str(), total, claimed);
         if (!messages.Text().empty())
             error_ += " (" + messages.Text() + ")";
         KLWarning("%s\n", error_.c_str());

@@ -12,6 +12,9 @@ uint32_t get_be32(const uint8_t* p) {
 uint32_t get_le32(const uint8_t* p) {
     return uint32_t(p[3]) << 24 | uint32_t(p[2]) << 16 | uint32_t(p[1]) << 8 | uint32_t(p[0]);
 }
+uint16_t get_be16(const uint8_t* p) {
+    return uint16_t(p[0] << 8 | p[1]);
+}
 uint16_t get_le16(const uint8_t* p) {
     return uint16_t(p[1] << 8 | p[0]);
 }
@@ -74,19 +77,21 @@ SoundReaderHeader::Kind SoundReaderHeader::Identify(const uint8_t* data, size_t 
     return kUnknown;
 }
 
-bool SoundReaderHeader::Sanitize(std::vector<uint8_t>& bytes, std::string* reason, Kind* kind) {
-    Kind k = bytes.empty() ? kUnknown : Identify(bytes.data(), bytes.size());
-    if (kind)
-        *kind = k;
-    switch (k) {
+bool SoundReaderHeader::Sanitize(std::vector<uint8_t>& bytes, std::string* reason, Result* result) {
+    Result local;
+    if (!result)
+        result = &local;
+    *result = Result();
+    result->kind = bytes.empty() ? kUnknown : Identify(bytes.data(), bytes.size());
+    switch (result->kind) {
         case kAiff:
-            return sanitize_aiff(bytes, false, reason);
+            return sanitize_aiff(bytes, false, reason, result);
         case kAiffC:
-            return sanitize_aiff(bytes, true, reason);
+            return sanitize_aiff(bytes, true, reason, result);
         case kWave:
-            return sanitize_wave(bytes, reason);
+            return sanitize_wave(bytes, reason, result);
         case kNext:
-            return sanitize_next(bytes, reason);
+            return sanitize_next(bytes, reason, result);
         case kUnknown:
             break;
     }
@@ -96,8 +101,8 @@ bool SoundReaderHeader::Sanitize(std::vector<uint8_t>& bytes, std::string* reaso
 }
 
 // FORM <size> AIFF|AIFC, then chunks of <id> <big-endian size> <data> padded to even length.
-bool SoundReaderHeader::sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc,
-                                      std::string* reason) {
+bool SoundReaderHeader::sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc, std::string* reason,
+                                      Result* result) {
     uint8_t* d = bytes.data();
     const uint64_t real = bytes.size() - 8;  // bytes after the FORM header's id and size
     uint64_t form = get_be32(d + 4);
@@ -106,7 +111,8 @@ bool SoundReaderHeader::sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc,
         put_be32(d + 4, uint32_t(form));
     }
     const uint64_t end = 8 + form;
-    bool comm = false;
+    uint8_t* comm = nullptr;  // data of the COMM chunk
+    uint64_t soundBytes = 0;  // sample bytes in the SSND chunk after its offset
     bool ssnd = false;
     uint64_t pos = 12;
     while (pos + 8 <= end) {
@@ -127,7 +133,7 @@ bool SoundReaderHeader::sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc,
                            "unsupported AIFF-C compression '" + fourcc_text(chunk + 8 + 18) + "'");
                 return false;
             }
-            comm = true;
+            comm = chunk + 8;
         } else if (std::memcmp(chunk, "SSND", 4) == 0) {
             if (size < 8) {
                 set_reason(reason, "SSND chunk too short");
@@ -136,6 +142,7 @@ bool SoundReaderHeader::sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc,
             // The offset to the first sample frame must stay inside the chunk.
             if (get_be32(chunk + 8) > size - 8)
                 put_be32(chunk + 8, uint32_t(size - 8));
+            soundBytes = size - 8 - get_be32(chunk + 8);
             ssnd = true;
         }
         pos += 8 + size + (size & 1);
@@ -148,12 +155,37 @@ bool SoundReaderHeader::sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc,
         set_reason(reason, "no SSND chunk (sound data) in the file");
         return false;
     }
+
+    // The frame count comes from COMM; the library would try to read all of it and, on a cut
+    // file, lose the frames of the last partial block. Promise only the frames present.
+    const uint64_t channels = get_be16(comm);
+    uint64_t sampleBytes = (get_be16(comm + 6) + 7u) / 8u;
+    if (aiffc) {
+        const uint8_t* type = comm + 18;
+        if (std::memcmp(type, "fl32", 4) == 0 || std::memcmp(type, "FL32", 4) == 0)
+            sampleBytes = 4;
+        else if (std::memcmp(type, "fl64", 4) == 0 || std::memcmp(type, "FL64", 4) == 0)
+            sampleBytes = 8;
+        else if (std::memcmp(type, "ulaw", 4) == 0 || std::memcmp(type, "ULAW", 4) == 0 ||
+                 std::memcmp(type, "alaw", 4) == 0 || std::memcmp(type, "ALAW", 4) == 0)
+            sampleBytes = 1;
+    }
+    const uint64_t frameBytes = channels * sampleBytes;
+    if (frameBytes > 0) {
+        const uint64_t present = soundBytes / frameBytes;
+        const uint64_t claimed = get_be32(comm + 2);
+        if (claimed > present) {
+            put_be32(comm + 2, uint32_t(present));
+            result->claimedFrames = (long long)claimed;
+        }
+    }
     return true;
 }
 
 // RIFF <little-endian size> WAVE, then chunks of <id> <little-endian size> <data> padded to
 // even length.
-bool SoundReaderHeader::sanitize_wave(std::vector<uint8_t>& bytes, std::string* reason) {
+bool SoundReaderHeader::sanitize_wave(std::vector<uint8_t>& bytes, std::string* reason,
+                                      Result* result) {
     uint8_t* d = bytes.data();
     const uint64_t real = bytes.size() - 8;
     uint64_t riff = get_le32(d + 4);
@@ -162,14 +194,19 @@ bool SoundReaderHeader::sanitize_wave(std::vector<uint8_t>& bytes, std::string* 
         put_le32(d + 4, uint32_t(riff));
     }
     const uint64_t end = 8 + riff;
+    uint64_t blockAlign = 0;  // bytes per frame, from the fmt chunk
     bool fmt = false;
     bool data = false;
+    uint64_t claimedBytes = 0;  // data size as written, when larger than what is present
     uint64_t pos = 12;
     while (pos + 8 <= end) {
         uint8_t* chunk = d + pos;
         uint64_t size = get_le32(chunk + 4);
         const uint64_t avail = end - pos - 8;
         if (size > avail) {
+            // 0xFFFFFFFF (and 0) are what streaming writers leave when the length is unknown.
+            if (std::memcmp(chunk, "data", 4) == 0 && size != 0xFFFFFFFFu)
+                claimedBytes = size;
             size = avail;
             put_le32(chunk + 4, uint32_t(size));
         }
@@ -191,6 +228,7 @@ bool SoundReaderHeader::sanitize_wave(std::vector<uint8_t>& bytes, std::string* 
                 set_reason(reason, KLFmt("unsupported WAV encoding 0x%04x", unsigned(tag)));
                 return false;
             }
+            blockAlign = get_le16(chunk + 8 + 12);
             fmt = true;
         } else if (std::memcmp(chunk, "data", 4) == 0) {
             data = true;
@@ -205,11 +243,14 @@ bool SoundReaderHeader::sanitize_wave(std::vector<uint8_t>& bytes, std::string* 
         set_reason(reason, "no data chunk in the file");
         return false;
     }
+    if (claimedBytes > 0 && blockAlign > 0)
+        result->claimedFrames = (long long)(claimedBytes / blockAlign);
     return true;
 }
 
 // ".snd" <data offset> <data size> <encoding> <rate> <channels>, all big-endian 32-bit.
-bool SoundReaderHeader::sanitize_next(std::vector<uint8_t>& bytes, std::string* reason) {
+bool SoundReaderHeader::sanitize_next(std::vector<uint8_t>& bytes, std::string* reason,
+                                      Result* result) {
     if (bytes.size() < 24) {
         set_reason(reason, "NeXT/Sun header too short");
         return false;
@@ -220,14 +261,21 @@ bool SoundReaderHeader::sanitize_next(std::vector<uint8_t>& bytes, std::string* 
         set_reason(reason, KLFmt("bad NeXT/Sun data offset %llu", (unsigned long long)offset));
         return false;
     }
-    const uint64_t avail = bytes.size() - offset;
-    if (get_be32(d + 8) > avail)
-        put_be32(d + 8, uint32_t(avail));
     const uint32_t encoding = get_be32(d + 12);
-    // mu-law, 8/16/24/32-bit linear, float, double, A-law.
-    if (!((encoding >= 1 && encoding <= 7) || encoding == 27)) {
+    // Bytes per sample of mu-law, 8/16/24/32-bit linear, float, double; A-law is 27.
+    static const int kSampleBytes[] = {0, 1, 1, 2, 3, 4, 4, 8};
+    const uint64_t sampleBytes = encoding < 8 ? kSampleBytes[encoding] : encoding == 27 ? 1 : 0;
+    if (sampleBytes == 0) {
         set_reason(reason, KLFmt("unsupported NeXT/Sun encoding %u", unsigned(encoding)));
         return false;
+    }
+    const uint64_t avail = bytes.size() - offset;
+    const uint64_t size = get_be32(d + 8);
+    if (size > avail) {
+        put_be32(d + 8, uint32_t(avail));
+        const uint64_t frameBytes = sampleBytes * get_be32(d + 20);
+        if (size != 0xFFFFFFFFu && frameBytes > 0)
+            result->claimedFrames = (long long)(size / frameBytes);
     }
     return true;
 }

@@ -16,15 +16,26 @@ class SoundReaderHeader {
   public:
     enum Kind { kUnknown, kAiff, kAiffC, kWave, kNext };
 
+    // What Sanitize found besides the repairs.
+    struct Result {
+        Kind kind = kUnknown;
+        // The sample frames the header promised when the data was cut short (the header now
+        // promises only the frames present); -1 when nothing is missing or the count is not
+        // known.
+        long long claimedFrames = -1;
+    };
+
     // Clamps the size fields of `bytes` to its real size. Returns false, with the reason in
     // *reason, when the image is not a sound this program reads.
-    static bool Sanitize(std::vector<uint8_t>& bytes, std::string* reason, Kind* kind = nullptr);
+    static bool Sanitize(std::vector<uint8_t>& bytes, std::string* reason,
+                         Result* result = nullptr);
 
     // The container kind named by the first bytes, without checking the rest.
     static Kind Identify(const uint8_t* data, size_t size);
 
   private:
-    static bool sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc, std::string* reason);
-    static bool sanitize_wave(std::vector<uint8_t>& bytes, std::string* reason);
-    static bool sanitize_next(std::vector<uint8_t>& bytes, std::string* reason);
+    static bool sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc, std::string* reason,
+                              Result* result);
+    static bool sanitize_wave(std::vector<uint8_t>& bytes, std::string* reason, Result* result);
+    static bool sanitize_next(std::vector<uint8_t>& bytes, std::string* reason, Result* result);
 };
