@@ -63,16 +63,21 @@ double ChannelCurve::Evaluate(double seconds) const {
     if (keys_.empty()) {
         return 0.0;
     }
-    if (!(seconds > keys_.front().time)) {  // also NaN
+    if (std::isnan(seconds)) {
         return keys_.front().value;
     }
-    if (seconds >= keys_.back().time) {
-        return keys_.back().value;
-    }
-    // First key strictly after `seconds`; the segment runs from the key before it.
-    auto it = std::upper_bound(keys_.begin(), keys_.end(), seconds,
+    // Key times read from files are floats: a time within float rounding of a key is at the
+    // key, so that evaluating at a key's frame gives the key's own value.
+    double eps = 1e-9 + std::fabs(seconds) * 1.2e-7;
+    auto it = std::upper_bound(keys_.begin(), keys_.end(), seconds + eps,
                                [](double s, const Key& k) { return s < k.time; });
-    size_t i = size_t(it - keys_.begin()) - 1;
+    if (it == keys_.begin()) {
+        return keys_.front().value;
+    }
+    size_t i = size_t(it - keys_.begin()) - 1;  // the last key at or before `seconds`
+    if (i + 1 == keys_.size() || std::fabs(seconds - keys_[i].time) <= eps) {
+        return keys_[i].value;
+    }
     const Key& a = keys_[i];
     const Key& b = keys_[i + 1];
     if (a.out == kStep) {

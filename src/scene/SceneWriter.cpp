@@ -104,6 +104,22 @@ SceneWriter::SceneWriter(SceneDocument& doc) : doc_(doc), m_(doc.model()) {}
 
 bool SceneWriter::Write(const std::string& path, std::string* error) {
     rewriteAnimation();
+    // The serialiser writes an object with no properties as null, which no reader accepts:
+    // such a node gets its (default) translation written out.
+    for (tinygltf::Node& n : m_.nodes) {
+        if (n.name.empty() && n.children.empty() && n.translation.empty() && n.rotation.empty() &&
+            n.scale.empty() && n.matrix.empty() && n.weights.empty() && n.mesh == -1 &&
+            n.skin == -1 && n.camera == -1 && n.extras.Type() == tinygltf::NULL_TYPE &&
+            n.extensions.empty()) {
+            n.translation = {0, 0, 0};
+        }
+    }
+    for (tinygltf::Scene& scene : m_.scenes) {
+        if (scene.name.empty() && scene.nodes.empty() && scene.extensions.empty() &&
+            scene.extras.Type() == tinygltf::NULL_TYPE) {
+            scene.name = "root";
+        }
+    }
     bool binary = ends_with(path, ".glb");
     if (binary && !m_.buffers.empty()) {
         m_.buffers[0].uri.clear();  // buffer 0 travels in the binary chunk
