@@ -375,8 +375,7 @@ TEST_F(LoudnessPlugin, MapsRmsLevelToClosedHalfOpen) {
     EXPECT_EQ(r->targets[1].name, "half");
     EXPECT_EQ(r->targets[2].name, "open");
     // Square waves: the RMS equals the amplitude. -40 dB, -30 dB, -20 dB, 0 dB and silence
-    // against the default levels -36 and -24. At 1000 Hz one step of 1/30 s is 33 samples,
-    // so each 100-sample stretch gives about three results.
+    // against the default levels -36 and -24, one 0.1 s step (100 samples) each.
     r->step = CueTime::FromSeconds(0.1);
     ASSERT_TRUE(r->GuardedRecognize(*steps_of({0.01f, 0.0316f, 0.1f, 1.0f, 0.0f})));
     EXPECT_THAT(target_indices(*r), ElementsAre(0, 1, 2, 2, 0));
