@@ -5,6 +5,7 @@
 #include <iostream>
 #include <limits>
 
+#include "model/FloatText.h"
 #include "toolkit/CueRecognizer.h"
 #include "toolkit/CueStatement.h"
 #include "toolkit/KLFilePath.h"
@@ -213,7 +214,7 @@ void KLKeySet::Write(std::ostream& out) {
         KLKey* key = keyShapes[i].get();
         const std::string path = (keepNames && key->ImageFile()) ? std::string(key->ImageFile())
                                                                  : picture_path(i, pixDir);
-        out << "    key " << KLQuote(key->Name()) << " " << key->frame << " "
+        out << "    key " << KLQuote(key->Name()) << " " << FloatText(key->frame) << " "
             << KLQuote(KLFilePath::TrimHead(path.c_str(), pixDir)) << std::endl;
         if (!keepNames) {
             KLImageSGI* picture = key->GetImage();

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <iostream>
 
+#include "model/FloatText.h"
 #include "model/KLKey.h"
 #include "model/KLKeySet.h"
 #include "scene/KLChannel.h"
@@ -247,14 +248,17 @@ void KLKeyTrack::Read(std::istream& in, KLKeySet* set) {
 }
 
 // One line per event: four blanks, "event", the time in frames, the key shape's name and the
-// smoothing name (each quoted when it holds a blank or a tab) and the value.
+// smoothing name (each quoted when it holds a blank or a tab) and the value. Times and values
+// are written as "%g" writes them unless that loses the exact tick or float; then with the
+// few more digits needed.
 void KLKeyTrack::Write(std::ostream& out) const {
     for (const KLKeyEvent* event : events) {
         const KLKey* key = event->key;
         if (!key && keySet)
             key = keySet->GetKeyShape(event->shapeIndex);
         const char* shapeName = key ? key->Name() : nullptr;
-        out << "    event " << event->time.Frames() << " " << KLQuote(shapeName ? shapeName : "")
-            << " " << KLQuote(event->GetSmoothName()) << " " << event->value << std::endl;
+        out << "    event " << event->time.Text() << " " << KLQuote(shapeName ? shapeName : "")
+            << " " << KLQuote(event->GetSmoothName()) << " " << FloatText(event->value)
+            << std::endl;
     }
 }

@@ -62,9 +62,10 @@ void KLMarkTrack::Read(std::istream& in) {
 }
 
 // One line per mark: four blanks, "mark", the time in frames, a tab and the label in double
-// quotes. A label that is itself a double quote is written as it is and does not read back.
+// quotes. The time is written as "%g" writes it unless that loses the exact tick. A label that is
+// itself a double quote is written as it is and does not read back.
 void KLMarkTrack::Write(std::ostream& out) const {
     for (const KLMarkEvent* mark : marks) {
-        out << "    mark " << mark->time.Frames() << "\t\"" << mark->label << "\"" << std::endl;
+        out << "    mark " << mark->time.Text() << "\t\"" << mark->label << "\"" << std::endl;
     }
 }
