@@ -11,6 +11,8 @@
 #include <memory>
 #include <sstream>
 
+#include "WorkspaceTestUtil.h"
+#include "model/KLKeySet.h"
 #include "toolkit/CuePrefs.h"
 #include "toolkit/CueRecognizer.h"
 #include "toolkit/CueRecognizerCatalog.h"
@@ -514,4 +516,75 @@ TEST_F(SettingsFile, PluginSettingsComeFromTheConfigFile) {
     EXPECT_EQ(level->ConfigFileName(), (dir / "misc_data" / "Level.config").string());
     EXPECT_EQ(theImp.ConfigureRecognizer(level.get(), level->ConfigFileName().c_str()), 1);
     EXPECT_THAT(written(*level), HasSubstr("    threshold 0.125 0.625\n"));
+}
+
+// --- recognizers in keyset files
+
+class KeysetRecognizers : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        wstest::ResetWorkspace();
+        theImp.recognizers.ScanDirectory(kGoodPlugins.c_str());  // once per process is enough
+        wstest::WriteFile(dir / "face.gltf", wstest::FaceSceneJson());
+        wstest::WriteFile(dir / "face.keyset", "wire " + (dir / "face.gltf") +
+                                                   " 0\n"
+                                                   "begin keyset mouth\n"
+                                                   "key rest 0\n"
+                                                   "key open 10\n"
+                                                   "key wide 20\n"
+                                                   "end\n"
+                                                   "begin recognizer Level mouth\n"
+                                                   "    threshold 0.2 0.7\n"
+                                                   "    step 6\n"
+                                                   "    target loud picture \"loud face.sgi\"\n"
+                                                   "end\n"
+                                                   "begin recognizer-links Level mouth\n"
+                                                   "    link silent to rest\n"
+                                                   "    link loud to wide\n"
+                                                   "end\n");
+    }
+    void TearDown() override { wstest::ResetWorkspace(); }
+
+    // The "Level" recognizer of keyset "mouth" after loading `file`.
+    CueRecognizer* load(const std::string& file) {
+        EXPECT_EQ(theImp.LoadKeyset(file.c_str()), 1);
+        KLKeySet* set = theImp.GetKeySet("mouth");
+        return set ? set->GetRecognizer("Level") : nullptr;
+    }
+
+    wstest::TempDir dir;
+    wstest::RecordingGhost ghost;
+    wstest::GhostScope scope{&ghost};
+};
+
+TEST_F(KeysetRecognizers, SettingsAndLinksRoundTripThroughKeysetFiles) {
+    CueRecognizer* r = load(dir / "face.keyset");
+    ASSERT_TRUE(r);
+    EXPECT_EQ(r->FindTarget("silent")->keyShapeIndex, 0);
+    EXPECT_EQ(r->FindTarget("quiet")->keyShapeIndex, -1);
+    EXPECT_EQ(r->FindTarget("loud")->keyShapeIndex, 2);
+    const std::string settings = written(*r);
+    EXPECT_EQ(settings,
+              "    step 6\n"
+              "    target silent\n"
+              "    target quiet\n"
+              "    target loud picture \"loud face.sgi\"\n"
+              "    threshold 0.2 0.7\n");
+
+    ASSERT_EQ(theImp.SaveKeyset((dir / "saved.keyset").c_str()), 1);
+    const std::string text = wstest::ReadFile(dir / "saved.keyset");
+    EXPECT_THAT(text, HasSubstr("begin recognizer Level mouth\n" + settings + "end\n"));
+    EXPECT_THAT(text, HasSubstr("begin recognizer-links Level mouth\n"
+                                "    link silent to rest\n"
+                                "    link loud to wide\n"
+                                "end\n"));
+
+    wstest::ResetWorkspace();
+    r = load(dir / "saved.keyset");
+    ASSERT_TRUE(r);
+    EXPECT_EQ(written(*r), settings);
+    EXPECT_EQ(r->FindTarget("silent")->keyShapeIndex, 0);
+    EXPECT_EQ(r->FindTarget("quiet")->keyShapeIndex, -1);
+    EXPECT_EQ(r->FindTarget("loud")->keyShapeIndex, 2);
+    EXPECT_EQ(theImp.GetKeySet("mouth")->recognizers.size(), 1u);
 }
