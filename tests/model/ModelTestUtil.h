@@ -71,3 +71,36 @@ class TempDir {
 
 // Writes `text` to `path`; false on failure.
 bool WriteTextFile(const std::string& path, const std::string& text);
+
+// A small glTF scene put together in a test: named nodes in a hierarchy and LINEAR
+// translation, rotation (Euler degrees about X) and scale animations, written as .gltf with
+// embedded buffers through tinygltf's writer.
+class SceneBuilder {
+  public:
+    SceneBuilder();
+    ~SceneBuilder();
+    // Adds a node under `parent` (-1: a top-level node) and returns its index.
+    int AddNode(const std::string& name, int parent = -1);
+    // Keys at `seconds`; `xyz` holds three values per key.
+    void Translate(int node, const std::vector<float>& seconds, const std::vector<float>& xyz);
+    void Scale(int node, const std::vector<float>& seconds, const std::vector<float>& xyz);
+    // Rotation about X by `degrees` at each key.
+    void RotateX(int node, const std::vector<float>& seconds, const std::vector<float>& degrees);
+    bool Write(const std::string& path) const;
+
+  private:
+    struct Impl;
+    Impl* impl_;
+};
+
+// Records every report of the toolkit's reporting functions while it lives.
+class ReportLog;
+class ReportCapture {
+  public:
+    ReportCapture();
+    ~ReportCapture();
+    const std::vector<std::string>& Messages() const;
+
+  private:
+    ReportLog* log_;
+};
