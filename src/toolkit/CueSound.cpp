@@ -20,9 +20,9 @@
 namespace {
 
 // Limits beyond which a header is taken to be damaged rather than describing a real sound.
-constexpr double kMaxRate = 1536000.0;          // frames per second
-constexpr int kMaxChannels = 64;                // channels in one file
-constexpr long long kMaxFrames = 1LL << 40;     // sample frames claimed by a header
+constexpr double kMaxRate = SoundReaderHeader::kMaxRate;       // frames per second
+constexpr int kMaxChannels = SoundReaderHeader::kMaxChannels;  // channels in one file
+constexpr long long kMaxFrames = 1LL << 40;                    // sample frames claimed by a header
 constexpr long long kMaxFileBytes = 1LL << 31;  // bytes of a sound file read into memory
 constexpr int kReadChunk = 8192;                // frames decoded per call
 

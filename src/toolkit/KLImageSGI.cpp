@@ -22,6 +22,17 @@ std::string oiio_message(std::string text, const char* fallback) {
     return text.empty() ? fallback : text;
 }
 
+// True when the file begins with the SGI image magic number 474 (big-endian).
+bool has_sgi_magic(const std::string& path) {
+    unsigned char magic[2] = {0, 0};
+    FILE* f = std::fopen(path.c_str(), "rb");
+    if (!f)
+        return false;
+    const size_t n = std::fread(magic, 1, 2, f);
+    std::fclose(f);
+    return n == 2 && magic[0] == 0x01 && magic[1] == 0xDA;
+}
+
 void set_error(std::string* error, const std::string& text) {
     if (error)
         *error = text;
@@ -46,8 +57,21 @@ std::unique_ptr<KLImageSGI> KLImageSGI::Load(const char* path, std::string* erro
     config.attribute("oiio:UnassociatedAlpha", 1);
     auto in = OIIO::ImageInput::open(name, &config);
     if (!in) {
-        set_error(error, prefix + oiio_message(OIIO::geterror(), "not an image file"));
-        return nullptr;
+        std::string why = oiio_message(OIIO::geterror(), "not an image file");
+        // OpenImageIO picks its reader by extension; frames of a sequence ("face.0012") have
+        // none, so SGI files are also recognised by their magic number.
+        if (has_sgi_magic(name)) {
+            in = OIIO::ImageInput::create("sgi");
+            OIIO::ImageSpec opened;
+            if (in && !in->open(name, opened, config)) {
+                why = oiio_message(in->geterror(), "not an SGI image");
+                in.reset();
+            }
+        }
+        if (!in) {
+            set_error(error, prefix + why);
+            return nullptr;
+        }
     }
     const OIIO::ImageSpec& spec = in->spec();
     const long long pixels = (long long)spec.width * spec.height;

@@ -1,5 +1,6 @@
 #include "toolkit/SoundReaderHeader.h"
 
+#include <cmath>
 #include <cstring>
 
 #include "toolkit/KLString.h"
@@ -56,12 +57,37 @@ bool aiffc_compression_ok(const uint8_t* p) {
     return false;
 }
 
+// An 80-bit IEEE extended float, as AIFF stores its sample rate.
+double get_extended(const uint8_t* p) {
+    const int exponent = (p[0] & 0x7f) << 8 | p[1];
+    uint64_t mantissa = 0;
+    for (int i = 2; i < 10; ++i)
+        mantissa = mantissa << 8 | p[i];
+    if (exponent == 0x7fff)
+        return std::nan("");
+    const double value = std::ldexp(double(mantissa), exponent - 16383 - 63);
+    return (p[0] & 0x80) ? -value : value;
+}
+
 // WAV format tags: PCM, IEEE float, A-law, mu-law.
 bool wave_format_ok(uint16_t tag) {
     return tag == 1 || tag == 3 || tag == 6 || tag == 7;
 }
 
 }  // namespace
+
+bool SoundReaderHeader::check_layout(long long channels, double rate, std::string* reason) {
+    if (channels < 1 || channels > kMaxChannels) {
+        set_reason(reason, KLFmt("bad channel count %lld", channels));
+        return false;
+    }
+    // Written so that NaN fails.
+    if (!(rate >= 1.0 && rate <= kMaxRate)) {
+        set_reason(reason, KLFmt("bad sample rate %g", rate));
+        return false;
+    }
+    return true;
+}
 
 SoundReaderHeader::Kind SoundReaderHeader::Identify(const uint8_t* data, size_t size) {
     if (size >= 12 && std::memcmp(data, "FORM", 4) == 0) {
@@ -134,6 +160,13 @@ bool SoundReaderHeader::sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc, s
                 return false;
             }
             comm = chunk + 8;
+            if (!check_layout(get_be16(comm), get_extended(comm + 8), reason))
+                return false;
+            const int bits = get_be16(comm + 6);
+            if (bits < 1 || bits > 64) {
+                set_reason(reason, KLFmt("bad sample size %d bits", bits));
+                return false;
+            }
         } else if (std::memcmp(chunk, "SSND", 4) == 0) {
             if (size < 8) {
                 set_reason(reason, "SSND chunk too short");
@@ -228,6 +261,13 @@ bool SoundReaderHeader::sanitize_wave(std::vector<uint8_t>& bytes, std::string* 
                 set_reason(reason, KLFmt("unsupported WAV encoding 0x%04x", unsigned(tag)));
                 return false;
             }
+            if (!check_layout(get_le16(chunk + 8 + 2), get_le32(chunk + 8 + 4), reason))
+                return false;
+            const int bits = get_le16(chunk + 8 + 14);
+            if (bits < 1 || bits > 64) {
+                set_reason(reason, KLFmt("bad sample size %d bits", bits));
+                return false;
+            }
             blockAlign = get_le16(chunk + 8 + 12);
             fmt = true;
         } else if (std::memcmp(chunk, "data", 4) == 0) {
@@ -269,6 +309,8 @@ bool SoundReaderHeader::sanitize_next(std::vector<uint8_t>& bytes, std::string* 
         set_reason(reason, KLFmt("unsupported NeXT/Sun encoding %u", unsigned(encoding)));
         return false;
     }
+    if (!check_layout(get_be32(d + 20), get_be32(d + 16), reason))
+        return false;
     const uint64_t avail = bytes.size() - offset;
     const uint64_t size = get_be32(d + 8);
     if (size > avail) {

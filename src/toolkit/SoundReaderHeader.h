@@ -16,6 +16,10 @@ class SoundReaderHeader {
   public:
     enum Kind { kUnknown, kAiff, kAiffC, kWave, kNext };
 
+    // Limits beyond which a header is taken to be damaged rather than describing a sound.
+    static constexpr double kMaxRate = 1536000.0;  // frames per second
+    static constexpr int kMaxChannels = 64;
+
     // What Sanitize found besides the repairs.
     struct Result {
         Kind kind = kUnknown;
@@ -34,6 +38,8 @@ class SoundReaderHeader {
     static Kind Identify(const uint8_t* data, size_t size);
 
   private:
+    // False, with the reason, for a channel count or rate outside the limits (NaN included).
+    static bool check_layout(long long channels, double rate, std::string* reason);
     static bool sanitize_aiff(std::vector<uint8_t>& bytes, bool aiffc, std::string* reason,
                               Result* result);
     static bool sanitize_wave(std::vector<uint8_t>& bytes, std::string* reason, Result* result);
