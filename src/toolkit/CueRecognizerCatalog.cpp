@@ -64,6 +64,7 @@ KLPlugCatalog::~KLPlugCatalog() {
 int KLPlugCatalog::ScanDirectory(const char* path) {
     if (!path)
         return 0;
+    scanned_ = true;
     const int before = Count();
     const std::string all = path;
     size_t start = 0;
@@ -146,6 +147,11 @@ const char* KLPlugCatalog::NextKey(const char* key) const {
 CueRecognizer* CueRecognizerCatalog::FetchRecognizer(const char* name) const {
     if (!name)
         return nullptr;
+    if (!scanned_) {
+        // Loading plug-ins does not change what the catalogue stands for: the recognizers
+        // on the search path were always its contents.
+        const_cast<CueRecognizerCatalog*>(this)->ScanDirectory(SearchPath().c_str());
+    }
     const auto it = prototypes_.find(name);
     if (it == prototypes_.end())
         return nullptr;

@@ -32,11 +32,14 @@ protected:
     std::vector<std::string> order_;
     std::map<std::string, std::unique_ptr<CueRecognizer>> prototypes_;
     std::vector<void*> handles_;
+    bool scanned_ = false;  // ScanDirectory has run at least once
 };
 
 class CueRecognizerCatalog : public KLPlugCatalog {
 public:
     // A new recognizer of that name with default settings (the caller owns it), or null.
+    // When no directory has been scanned yet, the default search path is scanned first, so
+    // that keyset files name plug-ins in batch mode too.
     CueRecognizer* FetchRecognizer(const char* name) const;
     // Adds a recognizer kind directly (built into the program, or for tests); takes
     // ownership of the prototype.

@@ -251,6 +251,19 @@ TEST_F(PluginCatalog, LoadsPluginFromTesselPluginPath) {
     EXPECT_EQ(catalog.FetchRecognizer(nullptr), nullptr);
 }
 
+TEST_F(PluginCatalog, FetchScansTheSearchPathWhenNothingWasScanned) {
+    ScopedEnv path("TESSEL_PLUGIN_PATH", kGoodPlugins.c_str());
+    CueRecognizerCatalog lazy;
+    std::unique_ptr<CueRecognizer> r(lazy.FetchRecognizer("Level"));
+    EXPECT_TRUE(r);
+    EXPECT_EQ(lazy.Count(), 1);
+
+    CueRecognizerCatalog scanned;
+    EXPECT_EQ(scanned.ScanDirectory(dir.c_str()), 0);
+    EXPECT_EQ(scanned.FetchRecognizer("Level"), nullptr);
+    EXPECT_EQ(scanned.Count(), 0);
+}
+
 TEST_F(PluginCatalog, SearchPathPrefersTesselThenKlThenDefault) {
     ScopedEnv tessel("TESSEL_PLUGIN_PATH", nullptr);
     ScopedEnv kl("KL_PLUGIN_PATH", nullptr);
