@@ -1,8 +1,8 @@
 #!/usr/bin/env node
 // Checks glTF files (.gltf with embedded or side-car buffers, or .glb) with the Khronos
 // validator. Usage: node tools/validate-gltf.mjs [--json] FILE...
-// Prints one summary line per file (errors, warnings, infos, hints) and the messages of every
-// error and warning; exits with 1 when any file has errors or cannot be read, 2 on bad usage.
+// Prints one summary line per file (errors, warnings, infos, hints) and the messages of the
+// first 20 errors and warnings; exits with 1 when any file has errors or cannot be read, 2 on bad usage.
 import { createRequire } from 'node:module';
 import { readFile } from 'node:fs/promises';
 import path from 'node:path';
@@ -44,8 +44,12 @@ for (const file of files) {
         }
         console.log(`${file}: ${i.numErrors} errors, ${i.numWarnings} warnings, ` +
                     `${i.numInfos} infos, ${i.numHints} hints`);
-        for (const m of i.messages) {
-            if (m.severity <= 1) {
+        const shown = i.messages.filter((m) => m.severity <= 1);
+        if (shown.length > 20) {
+            console.log(`  (the first 20 of ${shown.length} errors and warnings)`);
+        }
+        for (const m of shown.slice(0, 20)) {
+            {
                 const kind = m.severity === 0 ? 'error' : 'warning';
                 console.log(`  ${kind} ${m.code} at ${m.pointer ?? m.offset ?? ''}: ${m.message}`);
             }
