@@ -338,6 +338,9 @@ INSTANTIATE_TEST_SUITE_P(
                       b[find_chunk(b, "COMM") + kCommData + 1] = 0;
                   },
                   "channel"},
+        BadHeader{"HugeChannels",
+                  [](std::vector<uint8_t>& b) { b[find_chunk(b, "COMM") + kCommData] = 0x69; },
+                  "bad channel count 26881"},
         BadHeader{
             "ZeroFrames",
             [](std::vector<uint8_t>& b) { put_be32(b, find_chunk(b, "COMM") + kCommData + 2, 0); },
@@ -376,6 +379,48 @@ TEST_F(SoundTest, CompressedEncodingsOutsideTheSafeSetAreRefused) {
     EXPECT_FALSE(sound->Valid());
     EXPECT_EQ(sound->ErrorText(),
               "Could not open sound file [adpcm.aifc]: unsupported AIFF-C compression 'ima4'");
+}
+
+TEST_F(SoundTest, NextHeaderWithAbsurdLayoutIsRefusedBeforeDecoding) {
+    // .snd, data at 44, 80 bytes, 16-bit linear, 8000 Hz, 6881280 channels: the sound
+    // library would spend seconds setting up that many channels.
+    std::vector<uint8_t> b = {'.', 's', 'n', 'd', 0, 0, 0,    44,   0, 0,    0, 80,
+                              0,   0,   0,   3,   0, 0, 0x1f, 0x40, 0, 0x69, 0, 0};
+    b.resize(124, 0);
+    auto sound = CueSound::FromMemory(b.data(), b.size(), "wide.au");
+    EXPECT_EQ(sound->ErrorText(), "Could not open sound file [wide.au]: bad channel count 6881280");
+    b[21] = 0;
+    b[23] = 1;          // one channel
+    b[18] = b[19] = 0;  // 0 Hz
+    sound = CueSound::FromMemory(b.data(), b.size(), "still.au");
+    EXPECT_EQ(sound->ErrorText(), "Could not open sound file [still.au]: bad sample rate 0");
+    b[18] = 0x1f;
+    sound = CueSound::FromMemory(b.data(), b.size(), "ok.au");
+    EXPECT_TRUE(sound->Valid()) << sound->ErrorText();
+    EXPECT_EQ(sound->FrameCount(), 40);
+}
+
+// The demo's recording was written by sox, not by audiofile: it must read as espeak-ng made
+// it, silent in the pause its phoneme list gives between the two sentences.
+TEST_F(SoundTest, ReadsTheDemoDialogue) {
+    const std::string path = std::string(CHIRRUP_SOURCE_DIR) + "/resources/demo/dialogue.aiff";
+    CueSound sound(path.c_str());
+    ASSERT_TRUE(sound.Valid()) << sound.ErrorText();
+    EXPECT_EQ(sound.ChannelCount(), 1);
+    EXPECT_EQ(sound.Rate(), 22050.0);
+    EXPECT_EQ(sound.FrameCount(), 84134);
+    sound.ComputeMinMax();
+    EXPECT_GT(sound.Max(), 0.2f);
+    EXPECT_LT(sound.Min(), -0.2f);
+    auto pause = sound.Copy();
+    pause->Trim(0.90, 1.20);
+    pause->ComputeMinMax();
+    EXPECT_EQ(pause->Min(), 0.0f);
+    EXPECT_EQ(pause->Max(), 0.0f);
+    auto would = sound.Copy();
+    would->Trim(1.23, 1.43);
+    would->ComputeMinMax();
+    EXPECT_GT(would->Max() - would->Min(), 0.1f);
 }
 
 // ---- Operations on a sound in memory ----
