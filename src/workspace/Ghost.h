@@ -29,6 +29,8 @@ public:
     virtual void SetViewStatus() = 0;
     virtual void MakeKeysetImages() = 0;
     // The reference-load dialog: may change every argument; 0 when the user cancelled.
+    // *prefix and *ext are new[] strings (KLNewString; *ext is "" for no extension): to
+    // change one, delete[] it and store a new KLNewString. The caller frees both.
     virtual int AdjustRelLoad(char** prefix, char** ext, int* start, int* end, int* by,
                               int* zoom) = 0;
     virtual void DisplayDuration(CueTime duration) = 0;

@@ -2,10 +2,7 @@
 // settings files read by the workspace.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <unistd.h>
 
-#include <cmath>
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <memory>
@@ -61,31 +58,6 @@ class ReportCollector : public KLErrHandler {
   public:
     void Handle(KLErr* e) override { text += e->Message(); }
     std::string text;
-};
-
-// Sets an environment variable for the life of the object and restores it afterwards.
-class ScopedEnv {
-  public:
-    ScopedEnv(const char* name, const char* value) : name_(name) {
-        if (const char* old = std::getenv(name))
-            old_ = std::make_unique<std::string>(old);
-        if (value)
-            setenv(name, value, 1);
-        else
-            unsetenv(name);
-        CuePrefs::Refresh();
-    }
-    ~ScopedEnv() {
-        if (old_)
-            setenv(name_.c_str(), old_->c_str(), 1);
-        else
-            unsetenv(name_.c_str());
-        CuePrefs::Refresh();
-    }
-
-  private:
-    std::string name_;
-    std::unique_ptr<std::string> old_;
 };
 
 std::string written(const CueRecognizer& r) {
@@ -191,27 +163,14 @@ TEST(RecognizerSettings, ResetRestoresDefaultsAndKeepsLinks) {
     EXPECT_EQ(r.FindTarget("a")->pictureFile, "");
 }
 
-TEST(RecognizerSettings, TargetsAndConfigured) {
-    VowelRecognizer r;
-    EXPECT_EQ(r.AddTarget("e"), 1);  // already there
-    EXPECT_EQ(r.TargetIndex("e"), 1);
-    EXPECT_EQ(r.TargetIndex("o"), -1);
-    EXPECT_EQ(r.FindTarget(nullptr), nullptr);
-    EXPECT_FALSE(r.Configured());
-    r.FindTarget("a")->keyShapeIndex = 0;
-    EXPECT_FALSE(r.Configured());
-    r.FindTarget("e")->keyShapeIndex = 4;
-    EXPECT_TRUE(r.Configured());
-}
-
 TEST(RecognizerSettings, ConfigFileLiesInTheDataDirectoryOrTheCurrentOne) {
     VowelRecognizer r;
     {
-        ScopedEnv project("TESSEL_PROJECT", "/projects/fox");
-        ScopedEnv misc("TESSEL_MISC_DIR", nullptr);
+        wstest::ScopedEnv project("TESSEL_PROJECT", "/projects/fox");
+        wstest::ScopedEnv misc("TESSEL_MISC_DIR", nullptr);
         EXPECT_EQ(r.ConfigFileName(), "/projects/fox/misc_data/Vowel.config");
     }
-    ScopedEnv project("TESSEL_PROJECT", nullptr);
+    wstest::ScopedEnv project("TESSEL_PROJECT", nullptr);
     EXPECT_EQ(r.ConfigFileName(), "./Vowel.config");
 }
 
@@ -219,21 +178,13 @@ TEST(RecognizerSettings, ConfigFileLiesInTheDataDirectoryOrTheCurrentOne) {
 
 class PluginCatalog : public ::testing::Test {
   protected:
-    void SetUp() override {
-        dir = fs::temp_directory_path() /
-              ("chirrup-plugins-" + std::to_string(getpid()) + "-" +
-               ::testing::UnitTest::GetInstance()->current_test_info()->name());
-        fs::remove_all(dir);
-        fs::create_directories(dir);
-    }
-    void TearDown() override { fs::remove_all(dir); }
-
-    fs::path dir;
+    wstest::TempDir tmp;
+    const fs::path dir{tmp.path()};
     ReportCollector reports;
 };
 
 TEST_F(PluginCatalog, LoadsPluginFromTesselPluginPath) {
-    ScopedEnv path("TESSEL_PLUGIN_PATH", (dir.string() + ":" + kGoodPlugins).c_str());
+    wstest::ScopedEnv path("TESSEL_PLUGIN_PATH", (dir.string() + ":" + kGoodPlugins).c_str());
     CueRecognizerCatalog catalog;
     EXPECT_EQ(catalog.ScanDirectory(CueRecognizerCatalog::SearchPath().c_str()), 1);
     ASSERT_STREQ(catalog.HeadKey(), "Level");
@@ -252,7 +203,7 @@ TEST_F(PluginCatalog, LoadsPluginFromTesselPluginPath) {
 }
 
 TEST_F(PluginCatalog, FetchScansTheSearchPathWhenNothingWasScanned) {
-    ScopedEnv path("TESSEL_PLUGIN_PATH", kGoodPlugins.c_str());
+    wstest::ScopedEnv path("TESSEL_PLUGIN_PATH", kGoodPlugins.c_str());
     CueRecognizerCatalog lazy;
     std::unique_ptr<CueRecognizer> r(lazy.FetchRecognizer("Level"));
     EXPECT_TRUE(r);
@@ -265,13 +216,13 @@ TEST_F(PluginCatalog, FetchScansTheSearchPathWhenNothingWasScanned) {
 }
 
 TEST_F(PluginCatalog, SearchPathPrefersTesselThenKlThenDefault) {
-    ScopedEnv tessel("TESSEL_PLUGIN_PATH", nullptr);
-    ScopedEnv kl("KL_PLUGIN_PATH", nullptr);
+    wstest::ScopedEnv tessel("TESSEL_PLUGIN_PATH", nullptr);
+    wstest::ScopedEnv kl("KL_PLUGIN_PATH", nullptr);
     EXPECT_EQ(CueRecognizerCatalog::SearchPath(),
               "./plugins:/usr/tesselbeta/plugins:/usr/tessel/plugins");
-    ScopedEnv kl2("KL_PLUGIN_PATH", "/kl");
+    wstest::ScopedEnv kl2("KL_PLUGIN_PATH", "/kl");
     EXPECT_EQ(CueRecognizerCatalog::SearchPath(), "/kl");
-    ScopedEnv tessel2("TESSEL_PLUGIN_PATH", "/t1:/t2");
+    wstest::ScopedEnv tessel2("TESSEL_PLUGIN_PATH", "/t1:/t2");
     EXPECT_EQ(CueRecognizerCatalog::SearchPath(), "/t1:/t2");
 }
 
@@ -375,7 +326,6 @@ TEST_F(PluginCatalog, RecognizersOutliveTheirCatalogue) {
 class LoudnessPlugin : public PluginCatalog {
   protected:
     void SetUp() override {
-        PluginCatalog::SetUp();
         ASSERT_TRUE(catalog.LoadPlugin((kShippedPlugins + "/Loudness.so").c_str())) << reports.text;
         r.reset(catalog.FetchRecognizer("Loudness"));
         ASSERT_TRUE(r);
@@ -417,62 +367,16 @@ TEST_F(LoudnessPlugin, LevelsSettingRoundTripsAndRefusesAnInvertedPair) {
 
 // --- recognizer settings files
 
-namespace {
-
-// Records what the workspace asks of the window.
-class RecordingGhost : public Ghost {
-  public:
-    int GetActiveKeyset() override { return 0; }
-    void SetActiveKeyset(int) override {}
-    void InitSound(CueSound*) override {}
-    void InitMarkTrack(KLMarkTrack*) override {}
-    void CenterKeyView() override {}
-    void CenterMixView() override {}
-    void ClearViews() override {}
-    void ClearKeyTracks() override {}
-    void ClearKeysets(int) override {}
-    void InitKeyset(int) override {}
-    void ClearKeysetMenu() override {}
-    void DressKeysetMenu() override {}
-    void ShowRecognizerGui(CueRecognizer* r) override { shown.push_back(r); }
-    void SetMenuStatus() override {}
-    void SetViewStatus() override {}
-    void MakeKeysetImages() override {}
-    int AdjustRelLoad(char**, char**, int*, int*, int*, int*) override { return 0; }
-    void DisplayDuration(CueTime) override {}
-    void DisplayReferenceOffset(CueTime) override {}
-    void Inform(const char* message, const char*) override { informed.push_back(message); }
-    int Confirm(const char*, const char*, const char*) override { return 1; }
-    void UpdateApplyDialog(KLEdlEvent*) override {}
-    void ResetFileManagers() override {}
-    void ShowErrorFlag() override {}
-    void ClearErrorFlag() override {}
-
-    std::vector<CueRecognizer*> shown;
-    std::vector<std::string> informed;
-};
-
-}  // namespace
-
 class SettingsFile : public PluginCatalog {
   protected:
-    void SetUp() override {
-        PluginCatalog::SetUp();
-        previous = theGhost;
-        theGhost = &ghost;
-    }
-    void TearDown() override {
-        theGhost = previous;
-        PluginCatalog::TearDown();
-    }
     std::string write(const std::string& text) {
         const fs::path file = dir / "Vowel.config";
         std::ofstream(file) << text;
         return file.string();
     }
 
-    RecordingGhost ghost;
-    Ghost* previous = nullptr;
+    wstest::RecordingGhost ghost;
+    wstest::GhostScope scope{&ghost};
     VowelRecognizer r;
 };
 
@@ -496,8 +400,7 @@ TEST_F(SettingsFile, ReadsOnlyItsOwnBlockAfterAReset) {
     EXPECT_EQ(r.gain, 0.25f);
     EXPECT_EQ(r.step, r.defaultStep);  // reset, and not set by the file
     EXPECT_EQ(r.FindTarget("e")->pictureFile, "e.sgi");
-    EXPECT_THAT(ghost.shown, ElementsAre(&r));
-    EXPECT_THAT(ghost.informed, IsEmpty());
+    EXPECT_THAT(ghost.calls, ElementsAre("ShowRecognizerGui()"));
 }
 
 TEST_F(SettingsFile, WithoutItsBlockTheSettingsStayAndThePanelShows) {
@@ -505,7 +408,7 @@ TEST_F(SettingsFile, WithoutItsBlockTheSettingsStayAndThePanelShows) {
     const std::string file = write("begin recognizer Other\n    gain 12\nend\n");
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, file.c_str()), 1);
     EXPECT_EQ(r.gain, 5.0f);
-    EXPECT_THAT(ghost.shown, ElementsAre(&r));
+    EXPECT_THAT(ghost.calls, ElementsAre("ShowRecognizerGui()"));
 }
 
 TEST_F(SettingsFile, UnreadableFileReturnsZeroSilently) {
@@ -513,13 +416,12 @@ TEST_F(SettingsFile, UnreadableFileReturnsZeroSilently) {
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, dir.c_str()), 0);
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, nullptr), 0);
     EXPECT_EQ(theImp.ConfigureRecognizer(nullptr, write("").c_str()), 0);
-    EXPECT_THAT(ghost.shown, IsEmpty());
-    EXPECT_THAT(ghost.informed, IsEmpty());
+    EXPECT_THAT(ghost.calls, IsEmpty());
     EXPECT_THAT(reports.text, IsEmpty());
 }
 
 TEST_F(SettingsFile, PluginSettingsComeFromTheConfigFile) {
-    ScopedEnv project("TESSEL_PROJECT", dir.c_str());
+    wstest::ScopedEnv project("TESSEL_PROJECT", dir.c_str());
     fs::create_directories(dir / "misc_data");
     theImp.recognizers.ScanDirectory(kGoodPlugins.c_str());  // once per process is enough
     std::unique_ptr<CueRecognizer> level(theImp.recognizers.FetchRecognizer("Level"));

@@ -3,13 +3,11 @@
 // directory: frame N is filled with the grey level N so that each slot can be checked.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <unistd.h>
 
 #include <OpenImageIO/imageio.h>
-#include <cstdlib>
 #include <filesystem>
-#include <fstream>
 
+#include "WorkspaceTestUtil.h"
 #include "toolkit/CuePrefs.h"
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLImageSGI.h"
@@ -23,40 +21,20 @@ using ::testing::IsEmpty;
 
 namespace {
 
-// Records the dialog's arguments and answers it as told; records the other calls that
-// matter here.
-class DialogGhost : public Ghost {
+// Records the dialog's arguments and answers it as told.
+class DialogGhost : public wstest::RecordingGhost {
   public:
-    int GetActiveKeyset() override { return 0; }
-    void SetActiveKeyset(int) override {}
-    void InitSound(CueSound*) override {}
-    void InitMarkTrack(KLMarkTrack*) override {}
-    void CenterKeyView() override {}
-    void CenterMixView() override {}
-    void ClearViews() override {}
-    void ClearKeyTracks() override {}
-    void ClearKeysets(int) override {}
-    void InitKeyset(int) override {}
-    void ClearKeysetMenu() override {}
-    void DressKeysetMenu() override {}
-    void ShowRecognizerGui(CueRecognizer*) override {}
-    void SetMenuStatus() override {}
-    void SetViewStatus() override {}
-    void MakeKeysetImages() override {}
     int AdjustRelLoad(char** prefix, char** ext, int* start, int* end, int* by,
                       int* zoom) override {
         ++dialogs;
         shownPrefix = *prefix;
         shownExt = *ext;
         shownStart = *start, shownEnd = *end, shownBy = *by, shownZoom = *zoom;
-        if (!newPrefix.empty()) {
-            delete[] * prefix;
-            *prefix = KLNewString(newPrefix.c_str());
-        }
-        if (!newExt.empty()) {
-            delete[] * ext;
-            *ext = KLNewString(newExt == "-" ? "" : newExt.c_str());
-        }
+        // The strings are new[] arrays that the dialog may replace.
+        if (!newPrefix.empty())
+            replace(prefix, newPrefix);
+        if (!newExt.empty())
+            replace(ext, newExt == "-" ? "" : newExt);
         if (newStart >= -100)
             *start = newStart;
         if (newEnd >= -100)
@@ -65,17 +43,6 @@ class DialogGhost : public Ghost {
             *zoom = newZoom;
         return answer;
     }
-    void DisplayDuration(CueTime) override {}
-    void DisplayReferenceOffset(CueTime t) override { offsets.push_back(t); }
-    void Inform(const char* message, const char* button) override {
-        informed.push_back(std::string(message) + " / " + button);
-    }
-    int Confirm(const char*, const char*, const char*) override { return 1; }
-    void UpdateApplyDialog(KLEdlEvent*) override {}
-    void ResetFileManagers() override {}
-    void ShowErrorFlag() override {}
-    void ClearErrorFlag() override {}
-
     // What the dialog does: its answer and the values it puts back (-1000: leave as shown;
     // "-" as the extension: clear it).
     int answer = 1;
@@ -85,8 +52,13 @@ class DialogGhost : public Ghost {
     int dialogs = 0;
     std::string shownPrefix, shownExt;
     int shownStart = 0, shownEnd = 0, shownBy = 0, shownZoom = 0;
-    std::vector<CueTime> offsets;
-    std::vector<std::string> informed;
+
+  private:
+    static void replace(char** text, const std::string& value) {
+        char* old = *text;
+        delete[] old;
+        *text = KLNewString(value.c_str());
+    }
 };
 
 void collect_status(const char* message, void* data) {
@@ -98,25 +70,14 @@ void collect_status(const char* message, void* data) {
 class ReferenceTest : public ::testing::Test {
   protected:
     void SetUp() override {
-        dir = fs::temp_directory_path() /
-              ("chirrup-reference-" + std::to_string(getpid()) + "-" +
-               ::testing::UnitTest::GetInstance()->current_test_info()->name());
-        fs::remove_all(dir);
-        fs::create_directories(dir);
-        previous = theGhost;
-        theGhost = &ghost;
-        unsetenv("TESSEL_PROJECT");
-        CuePrefs::Refresh();
         reset_workspace();
-        ghost.offsets.clear();
+        ghost.calls.clear();
         KLErrHandler::SetStatusHook(collect_status, &status);
     }
     void TearDown() override {
         KLErrHandler::SetStatusHook(nullptr, nullptr);
         reset_workspace();
-        theGhost = previous;
         CueTime::default_fps = 30;
-        fs::remove_all(dir);
     }
     static void reset_workspace() {
         theImp.DeleteReference();
@@ -155,9 +116,11 @@ class ReferenceTest : public ::testing::Test {
         return out;
     }
 
-    fs::path dir;
+    wstest::ScopedEnv noProject{"TESSEL_PROJECT", nullptr};
+    wstest::TempDir tmp;
+    const fs::path dir{tmp.path()};
     DialogGhost ghost;
-    Ghost* previous = nullptr;
+    wstest::GhostScope scope{&ghost};
     std::vector<std::string> status;
 };
 
@@ -191,7 +154,7 @@ TEST_P(ReferenceNames, FindsTheRunAndNamesItsParts) {
     for (int i = 0; i < theImp.referenceCount; ++i)
         EXPECT_EQ(grey(theImp.referenceImages[size_t(i)].get()), c.start + i) << "slot " << i;
     EXPECT_EQ(theImp.referenceOffset, CueTime::FromFrames(c.start));
-    EXPECT_THAT(ghost.informed, IsEmpty());
+    EXPECT_THAT(ghost.Calls("Inform("), IsEmpty());
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -260,7 +223,8 @@ TEST_F(ReferenceTest, NoFramesGivesTheFailureDialog) {
     frames("other.%d.png", 0, 2);
     theImp.referenceLoaded = 1;  // a sequence held before is no longer taken as loaded
     EXPECT_EQ(theImp.LoadReference(path("take.0010.png").c_str()), 0);
-    EXPECT_THAT(ghost.informed, ElementsAre("Failed to find any reference frames. / Dismiss"));
+    EXPECT_THAT(ghost.Calls("Inform("),
+                ElementsAre("Inform(Failed to find any reference frames.|Dismiss)"));
     EXPECT_EQ(theImp.referenceLoaded, 0);
     EXPECT_EQ(ghost.dialogs, 0);
 }
@@ -269,7 +233,7 @@ TEST_F(ReferenceTest, EmptyNameDoesNothing) {
     EXPECT_EQ(theImp.LoadReference(""), 0);
     EXPECT_EQ(theImp.LoadReference(nullptr), 0);
     EXPECT_THAT(status, IsEmpty());
-    EXPECT_THAT(ghost.informed, IsEmpty());
+    EXPECT_THAT(ghost.Calls("Inform("), IsEmpty());
 }
 
 TEST_F(ReferenceTest, FrameLimitIsNeverUsed) {
@@ -277,17 +241,17 @@ TEST_F(ReferenceTest, FrameLimitIsNeverUsed) {
     ASSERT_EQ(theImp.LoadReference(path("take.9997").c_str()), 1);
     EXPECT_EQ(ghost.shownEnd, 9998);
     EXPECT_EQ(theImp.LoadReference(path("take.9999").c_str()), 0);
-    EXPECT_THAT(ghost.informed, ElementsAre("Failed to find any reference frames. / Dismiss"));
+    EXPECT_THAT(ghost.Calls("Inform("),
+                ElementsAre("Inform(Failed to find any reference frames.|Dismiss)"));
 }
 
 TEST_F(ReferenceTest, RelativeNameIsTakenUnderThePictureDirectory) {
     fs::create_directories(dir / "pix");
     frames("pix/take.%d.png", 1, 2);
-    setenv("TESSEL_PROJECT", dir.c_str(), 1);
-    CuePrefs::Refresh();
-    EXPECT_EQ(theImp.LoadReference("take.1.png"), 1);
-    unsetenv("TESSEL_PROJECT");
-    CuePrefs::Refresh();
+    {
+        wstest::ScopedEnv project("TESSEL_PROJECT", dir.c_str());
+        EXPECT_EQ(theImp.LoadReference("take.1.png"), 1);
+    }
     EXPECT_EQ(ghost.shownPrefix, path("pix/take"));
     EXPECT_EQ(theImp.referenceCount, 2);
 }
@@ -301,7 +265,7 @@ TEST_F(ReferenceTest, CancelLoadsNothing) {
     EXPECT_EQ(theImp.referenceLoaded, 0);
     EXPECT_EQ(theImp.referenceCount, 0);
     EXPECT_EQ(theImp.referenceZoom, 2);
-    EXPECT_THAT(ghost.offsets, IsEmpty());
+    EXPECT_THAT(ghost.Calls("DisplayReferenceOffset("), IsEmpty());
 }
 
 TEST_F(ReferenceTest, DialogChoosesRangeAndMissingFramesLeaveEmptySlots) {
@@ -310,7 +274,7 @@ TEST_F(ReferenceTest, DialogChoosesRangeAndMissingFramesLeaveEmptySlots) {
     ghost.newEnd = 6;
     ASSERT_EQ(theImp.LoadReference(path("take.001.png").c_str()), 1);
     EXPECT_THAT(reference_greys(), ElementsAre(3, 4, -1, -1));
-    EXPECT_THAT(ghost.offsets, ElementsAre(CueTime::FromFrames(3)));
+    EXPECT_THAT(ghost.Calls("DisplayReferenceOffset("), ElementsAre("DisplayReferenceOffset(600)"));
     EXPECT_EQ(theImp.referenceLoaded, 1);
 }
 
@@ -384,14 +348,6 @@ TEST_F(ReferenceLoaded, FrameIndexIsWholeFramesFromTheOffsetTruncatedTowardZero)
     EXPECT_EQ(theImp.GetPlayblast(CueTime::FromFrames(10)), nullptr);
 }
 
-TEST_F(ReferenceLoaded, MovingTheOffsetMovesTheSequence) {
-    theImp.SetReferenceOffset(CueTime::FromFrames(100));
-    EXPECT_EQ(at(100), 10);
-    EXPECT_EQ(at(103.5), 13);
-    EXPECT_EQ(at(13), -1);
-    EXPECT_EQ(theImp.ReferenceEnd(), CueTime::FromFrames(104));
-}
-
 TEST_F(ReferenceLoaded, LookupFollowsTheWorkspaceRate) {
     CueTime::default_fps = 24;
     const CueTime t = CueTime::FromSeconds(0.5);  // 12 frames at 24 fps after frame 0
@@ -402,9 +358,9 @@ TEST_F(ReferenceLoaded, LookupFollowsTheWorkspaceRate) {
 }
 
 TEST_F(ReferenceLoaded, DeleteResetsOffsetAndForgetsTheImages) {
-    ghost.offsets.clear();
+    ghost.calls.clear();
     theImp.DeleteReference();
-    EXPECT_THAT(ghost.offsets, ElementsAre(CueTime()));
+    EXPECT_THAT(ghost.Calls("DisplayReferenceOffset("), ElementsAre("DisplayReferenceOffset(0)"));
     EXPECT_EQ(theImp.referenceLoaded, 0);
     EXPECT_EQ(theImp.referenceImages, nullptr);
     EXPECT_EQ(at(0), -1);
@@ -424,8 +380,9 @@ TEST_F(ReferenceTest, PlayblastLoadsIntoItsOwnSequence) {
     EXPECT_EQ(theImp.playblastCount, 3);
     EXPECT_EQ(theImp.playblastOffset, CueTime::FromFrames(5));
     EXPECT_EQ(theImp.referenceLoaded, 0);
-    EXPECT_THAT(ghost.offsets, IsEmpty());  // the playblast offset is not displayed
-    EXPECT_EQ(theImp.referenceZoom, 3);     // one zoom level for both sequences
+    EXPECT_THAT(ghost.Calls("DisplayReferenceOffset("),
+                IsEmpty());              // the playblast offset is not displayed
+    EXPECT_EQ(theImp.referenceZoom, 3);  // one zoom level for both sequences
     EXPECT_EQ(grey(theImp.GetPlayblast(CueTime::FromFrames(6.5))), 6);
     EXPECT_EQ(theImp.GetPlayblast(CueTime::FromFrames(8)), nullptr);
     EXPECT_EQ(theImp.GetReference(CueTime::FromFrames(6)), nullptr);
@@ -440,6 +397,7 @@ TEST_F(ReferenceTest, PlayblastLoadsIntoItsOwnSequence) {
 
 TEST_F(ReferenceTest, PlayblastWithoutFramesSaysSo) {
     EXPECT_EQ(theImp.LoadPlayblast(path("blast.1.png").c_str()), 0);
-    EXPECT_THAT(ghost.informed, ElementsAre("Failed to find any playblast frames. / Dismiss"));
+    EXPECT_THAT(ghost.Calls("Inform("),
+                ElementsAre("Inform(Failed to find any playblast frames.|Dismiss)"));
     EXPECT_EQ(theImp.playblastLoaded, 0);
 }
