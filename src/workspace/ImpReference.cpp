@@ -6,8 +6,8 @@
 // offset + i frames up to offset + i + 1 frames at the workspace rate.
 #include <unistd.h>
 
+#include <algorithm>
 #include <cctype>
-#include <cstdlib>
 
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLFilePath.h"
@@ -87,9 +87,9 @@ FrameName split_frame_name(const std::string& name) {
         }
     }
     if (hasNumber) {
-        // More digits than an int holds are past the search limit anyway.
-        const long n = numberText.size() > 9 ? long(kFrameLimit) : std::atol(numberText.c_str());
-        f.number = int(n);
+        // Leading zeros are padding; a value past the search limit finds nothing anyway.
+        for (const char c : numberText)
+            f.number = std::min(f.number * 10 + (c - '0'), kFrameLimit);
         f.width = numberText == "0" ? 0 : int(numberText.size());
     }
     return f;

@@ -198,6 +198,7 @@ INSTANTIATE_TEST_SUITE_P(
                  "png",
                  5,
                  7},
+        NameCase{"LongPadding", {"take.%012d"}, {{1, 2}}, "take.000000000001", "take", "", 1, 2},
         NameCase{"PointsInTheDirectoryDoNotCount",
                  {"shot.2/face.%d"},
                  {{0, 1}},
