@@ -503,3 +503,28 @@ TEST_F(KeysetRecognizers, SettingsAndLinksRoundTripThroughKeysetFiles) {
     EXPECT_EQ(r->FindTarget("loud")->keyShapeIndex, 2);
     EXPECT_EQ(theImp.GetKeySet("mouth")->recognizers.size(), 1u);
 }
+
+// The chirrup program itself loads the shipped plug-in in a batch run (its symbols are
+// exported to plug-ins, and the catalogue is scanned when the keyset file first asks).
+TEST(ProgramPlugins, BatchRunFindsTheShippedLoudnessPlugin) {
+    wstest::TempDir dir;
+    wstest::WriteFile(dir / "face.gltf", wstest::FaceSceneJson());
+    wstest::WriteFile(dir / "t.track", "begin keytrack mouth\n    event 0 rest\nend\n");
+    wstest::WriteFile(dir / "k.kset",
+                      "wire face.gltf\n"
+                      "begin keyset mouth\n    key rest 0\n    key open 10\nend\n"
+                      "begin recognizer Loudness mouth\n    levels -40 -20\nend\n"
+                      "begin recognizer-links Loudness mouth\n    link closed to rest\nend\n");
+    const std::vector<std::string> args{"-B", "t.track", "face.gltf", "VX_ROOT",
+                                        "0",  "o.gltf",  "k.kset"};
+    const wstest::RunResult found =
+        wstest::RunChirrup(args, dir.path(), {{"TESSEL_PLUGIN_PATH", kShippedPlugins}});
+    EXPECT_EQ(found.status, 0);
+    EXPECT_THAT(found.err, HasSubstr("Storing to o.gltf"));
+    EXPECT_THAT(found.err, ::testing::Not(HasSubstr("Loudness")));
+
+    const wstest::RunResult missing =
+        wstest::RunChirrup(args, dir.path(), {{"TESSEL_PLUGIN_PATH", dir.path()}});
+    EXPECT_THAT(missing.err, HasSubstr("Failed to find recognizer plugin [Loudness]."));
+    EXPECT_THAT(missing.err, HasSubstr("Failed to find recognizer [Loudness]."));
+}
