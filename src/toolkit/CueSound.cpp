@@ -290,10 +290,12 @@ void CueSound::load(std::vector<uint8_t>& bytes) {
         const int n = std::min(got, want);
         for (int c = 0; c < channels; ++c) {
             std::vector<float>& out = channels_[size_t(c)];
-            for (int i = 0; i < n; ++i) {
-                const float v = buffer[size_t(i) * size_t(channels) + size_t(c)];
+            const size_t base = out.size();
+            out.resize(base + size_t(n));
+            const float* in = buffer.data() + c;
+            for (int i = 0; i < n; ++i, in += channels) {
                 // Float files may hold NaN or infinities; they would poison every sum.
-                out.push_back(std::isfinite(v) ? v : 0.0f);
+                out[base + size_t(i)] = std::isfinite(*in) ? *in : 0.0f;
             }
         }
         total += n;
@@ -406,7 +408,9 @@ std::vector<float> CueSound::Resampled(double rate) const {
     data.output_frames = long(out.size());
     data.src_ratio = ratio;
     data.end_of_input = 1;
-    if (src_simple(&data, SRC_SINC_MEDIUM_QUALITY, 1) != 0)
+    // The fastest band-limited converter: clean enough for recognizers, and a minute of sound
+    // converts in about a second.
+    if (src_simple(&data, SRC_SINC_FASTEST, 1) != 0)
         return {};
     out.resize(size_t(data.output_frames_gen));
     return out;
