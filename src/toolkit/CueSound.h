@@ -46,7 +46,8 @@ class CueSound {
     std::unique_ptr<CueSound> Copy() const;
     // Keeps only the frames of [startSeconds, endSeconds) (clamped to the sound).
     void Trim(double startSeconds, double endSeconds);
-    // The mix of all channels resampled to `rate` frames per second (16 kHz for recognizers).
+    // The mix of all channels resampled to `rate` frames per second (16 kHz for recognizers);
+    // empty for an empty sound or a rate outside 1/256 to 256 times the sound's own.
     std::vector<float> Resampled(double rate) const;
 
   private:

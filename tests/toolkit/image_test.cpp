@@ -135,16 +135,6 @@ TEST_F(ImageTest, ResizeGivesExactSizesAndKeepsAGradientSmooth) {
     EXPECT_NEAR(image->Pixels()[0], 126, 6);  // the mean of the ramp
 }
 
-TEST_F(ImageTest, CopyIsIndependent) {
-    KLImageSGI image(2, 2);
-    image.Pixels()[0] = 9;
-    auto copy = image.Copy();
-    copy->Pixels()[0] = 1;
-    copy->Resize(4, 4);
-    EXPECT_EQ(image.Pixels()[0], 9);
-    EXPECT_EQ(image.Width(), 2);
-}
-
 TEST_F(ImageTest, StoresSgiThatReloadsEqual) {
     const std::string png = Path("gradient.png");
     Write(png, 64, 32, 3, gradient(64, 32));
