@@ -64,8 +64,7 @@ bool check_glb(const unsigned char* data, size_t size, size_t* used, std::string
     }
     uint64_t rest = length - 20 - uint64_t(jsonLength);
     if (rest != 0) {
-        uint32_t binLength = read_u32(data + 20 + jsonLength);
-        if (rest < 8 || uint64_t(binLength) + 8 > rest) {
+        if (rest < 8 || uint64_t(read_u32(data + 20 + jsonLength)) + 8 > rest) {
             *why = "binary container has inconsistent chunk lengths";
             return false;
         }

@@ -153,4 +153,13 @@ TEST(SceneMalformed, MissingEmptyAndTruncatedFiles) {
     WriteFile(dir + "/big.glb", big);
     EXPECT_FALSE(SceneDocument::Load(dir + "/big.glb", &error));
     EXPECT_NE(error.find("chunk lengths"), std::string::npos) << error;
+    // A few bytes after the JSON chunk: too short for a chunk header.
+    uint32_t jsonLength = 0;
+    std::memcpy(&jsonLength, glb.data() + 12, 4);
+    std::string stub = glb.substr(0, 20 + jsonLength) + "BIN!";
+    uint32_t total = uint32_t(stub.size());
+    std::memcpy(&stub[8], &total, 4);
+    WriteFile(dir + "/stub.glb", stub);
+    EXPECT_FALSE(SceneDocument::Load(dir + "/stub.glb", &error));
+    EXPECT_NE(error.find("chunk lengths"), std::string::npos) << error;
 }
