@@ -78,6 +78,10 @@ double ChannelCurve::Evaluate(double seconds) const {
     if (i + 1 == keys_.size() || std::fabs(seconds - keys_[i].time) <= eps) {
         return keys_[i].value;
     }
+    return segment(i, seconds);
+}
+
+double ChannelCurve::segment(size_t i, double seconds) const {
     const Key& a = keys_[i];
     const Key& b = keys_[i + 1];
     if (a.out == kStep) {
@@ -93,6 +97,31 @@ double ChannelCurve::Evaluate(double seconds) const {
     double u2 = u * u, u3 = u2 * u;
     return (2 * u3 - 3 * u2 + 1) * a.value + (u3 - 2 * u2 + u) * m0 + (-2 * u3 + 3 * u2) * b.value +
            (u3 - u2) * m1;
+}
+
+void ChannelCurve::EvaluateSorted(const std::vector<double>& times,
+                                  std::vector<double>* out) const {
+    out->resize(times.size());
+    size_t n = keys_.size();
+    size_t i = 0;  // keys before i lie at or before the current time (within rounding)
+    for (size_t k = 0; k < times.size(); ++k) {
+        double seconds = times[k];
+        if (n == 0 || std::isnan(seconds)) {
+            (*out)[k] = n == 0 ? 0.0 : keys_.front().value;
+            continue;
+        }
+        double eps = 1e-9 + std::fabs(seconds) * 1.2e-7;
+        while (i < n && keys_[i].time <= seconds + eps) {
+            ++i;
+        }
+        if (i == 0) {
+            (*out)[k] = keys_.front().value;
+        } else if (i == n || std::fabs(seconds - keys_[i - 1].time) <= eps) {
+            (*out)[k] = keys_[i - 1].value;
+        } else {
+            (*out)[k] = segment(i - 1, seconds);
+        }
+    }
 }
 
 double ChannelCurve::eval(double frame) const {

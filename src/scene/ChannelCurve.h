@@ -35,6 +35,9 @@ class ChannelCurve : public OrChannel {
 
     // Value at `seconds`.
     double Evaluate(double seconds) const;
+    // Values at each of `times` (seconds, ascending), into `out`; the same as Evaluate on
+    // each, in one pass over the keys.
+    void EvaluateSorted(const std::vector<double>& times, std::vector<double>* out) const;
     // Value at `frame` frames of CueTime::default_fps.
     double eval(double frame) const override;
 
@@ -50,6 +53,7 @@ class ChannelCurve : public OrChannel {
     void Merge(const Key& key);
 
   private:
+    double segment(size_t i, double seconds) const;  // inside the segment from key i to i + 1
     double smoothSlope(size_t i) const;
     double segmentSlope(size_t i) const;  // of the straight line from key i to key i + 1
 

@@ -1,5 +1,7 @@
 #include "scene/SceneDocument.h"
 
+#include <sys/stat.h>
+
 #include <cmath>
 #include <cstring>
 #include <fstream>
@@ -80,14 +82,22 @@ std::string dir_of(const std::string& path) {
 }  // namespace
 
 std::shared_ptr<SceneDocument> SceneDocument::Load(const std::string& path, std::string* error) {
+    struct stat st;
+    if (::stat(path.c_str(), &st) == 0 && !S_ISREG(st.st_mode)) {
+        *error = "Cannot open scene file [" + path + "]: not a regular file";
+        return nullptr;
+    }
     std::ifstream in(path, std::ios::binary);
     if (!in) {
         *error = "Cannot open scene file [" + path + "]: " + std::strerror(errno);
         return nullptr;
     }
-    std::vector<unsigned char> bytes((std::istreambuf_iterator<char>(in)),
-                                     std::istreambuf_iterator<char>());
-    if (in.bad()) {
+    in.seekg(0, std::ios::end);
+    std::streamoff size = in.tellg();
+    in.seekg(0, std::ios::beg);
+    std::vector<unsigned char> bytes(size > 0 ? size_t(size) : 0);
+    if (size < 0 ||
+        !in.read(reinterpret_cast<char*>(bytes.data()), std::streamsize(bytes.size()))) {
         *error = "Cannot read scene file [" + path + "]";
         return nullptr;
     }

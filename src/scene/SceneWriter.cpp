@@ -8,8 +8,8 @@
 #include <cerrno>
 #include <cmath>
 #include <cstring>
+#include <fstream>
 #include <map>
-#include <sstream>
 
 #include "scene/EulerRotation.h"
 #include "scene/SceneDocument.h"
@@ -64,7 +64,10 @@ bool ends_with(const std::string& s, const char* tail) {
     return true;
 }
 
-bool write_atomically(const std::string& path, const std::string& bytes, std::string* error) {
+// Serialises `model` into a temporary file beside `path`, flushed to disk, then renamed over
+// `path`; on any failure the temporary file is removed and `path` is left as it was.
+bool write_atomically(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binary,
+                      const std::string& path, std::string* error) {
     std::string tmpl = path + ".XXXXXX";
     std::vector<char> name(tmpl.begin(), tmpl.end());
     name.push_back('\0');
@@ -76,27 +79,31 @@ bool write_atomically(const std::string& path, const std::string& bytes, std::st
     mode_t mask = umask(0);
     umask(mask);
     fchmod(fd, 0666 & ~mask);
-    size_t done = 0;
-    bool ok = true;
-    while (ok && done < bytes.size()) {
-        ssize_t n = ::write(fd, bytes.data() + done, bytes.size() - done);
-        if (n < 0 && errno == EINTR) {
-            continue;
-        }
-        ok = n > 0;
-        done += ok ? size_t(n) : 0;
+    bool ok;
+    {
+        std::ofstream out(name.data(), std::ios::binary | std::ios::trunc);
+        ok = out.is_open() && writer->WriteGltfSceneToStream(model, out, !binary, binary);
+        out.flush();
+        ok = ok && out.good();
     }
-    int saved = errno;
-    ok = ok && fsync(fd) == 0;
-    saved = ok ? saved : errno;
-    ok = (::close(fd) == 0) && ok;
-    if (!ok || std::rename(name.data(), path.c_str()) != 0) {
-        saved = errno ? errno : saved;
+    int saved = ok ? 0 : (errno ? errno : EIO);
+    if (ok && fsync(fd) != 0) {
+        ok = false;
+        saved = errno;
+    }
+    if (::close(fd) != 0 && ok) {
+        ok = false;
+        saved = errno;
+    }
+    if (ok && std::rename(name.data(), path.c_str()) != 0) {
+        ok = false;
+        saved = errno;
+    }
+    if (!ok) {
         ::unlink(name.data());
-        *error = "Cannot write scene file [" + path + "]: " + std::strerror(saved);
-        return false;
+        *error = "Cannot write scene file [" + path + "]: " + std::strerror(saved ? saved : EIO);
     }
-    return true;
+    return ok;
 }
 }  // namespace
 
@@ -126,12 +133,7 @@ bool SceneWriter::Write(const std::string& path, std::string* error) {
     }
     tinygltf::TinyGLTF writer;
     writer.SetImageWriter(write_image_bytes, nullptr);
-    std::ostringstream out;
-    if (!writer.WriteGltfSceneToStream(&m_, out, !binary, binary)) {
-        *error = "Cannot write scene file [" + path + "]: the scene could not be serialised";
-        return false;
-    }
-    return write_atomically(path, out.str(), error);
+    return write_atomically(&writer, &m_, binary, path, error);
 }
 
 void SceneWriter::rewriteAnimation() {
@@ -399,28 +401,41 @@ void SceneWriter::makeNodeTrs(int node) {
 }
 
 std::vector<double> SceneWriter::sampleTimes(int node, int first) const {
-    std::vector<double> times;
     double lo = 0, hi = 0;
     bool any = false;
     for (int c = first; c < first + 3; ++c) {
-        const ChannelCurve* curve = doc_.Curve(node, c);
-        if (!curve) {
-            continue;
+        if (const ChannelCurve* curve = doc_.Curve(node, c)) {
+            lo = any ? std::min(lo, curve->keys().front().time) : curve->keys().front().time;
+            hi = any ? std::max(hi, curve->keys().back().time) : curve->keys().back().time;
+            any = true;
         }
-        for (const ChannelCurve::Key& k : curve->keys()) {
-            times.push_back(k.time);
-        }
-        lo = any ? std::min(lo, curve->keys().front().time) : curve->keys().front().time;
-        hi = any ? std::max(hi, curve->keys().back().time) : curve->keys().back().time;
-        any = true;
     }
+    std::vector<double> times, merged;
     int fps = CueTime::default_fps > 0 ? CueTime::default_fps : 30;
     for (double f = std::ceil(lo * fps - 1e-6); any && f <= std::floor(hi * fps + 1e-6); ++f) {
         times.push_back(f / fps);
     }
-    std::sort(times.begin(), times.end());
+    // Key times are in order already: merge them in.
+    for (int c = first; c < first + 3; ++c) {
+        if (const ChannelCurve* curve = doc_.Curve(node, c)) {
+            merged.clear();
+            merged.reserve(times.size() + curve->keys().size());
+            auto key = curve->keys().begin(), end = curve->keys().end();
+            for (double t : times) {
+                for (; key != end && key->time < t; ++key) {
+                    merged.push_back(key->time);
+                }
+                merged.push_back(t);
+            }
+            for (; key != end; ++key) {
+                merged.push_back(key->time);
+            }
+            times.swap(merged);
+        }
+    }
     // Times are stored as floats: keep one sample per distinct float.
     std::vector<double> out;
+    out.reserve(times.size());
     for (double t : times) {
         if (out.empty() || float(t) > float(out.back())) {
             out.push_back(t);
@@ -475,11 +490,19 @@ void SceneWriter::sampleTranslationScale(int node, int first, const char* path) 
             }
         }
     } else {
-        for (double t : sampleTimes(node, first)) {
-            s.times.push_back(float(t));
+        std::vector<double> times = sampleTimes(node, first);
+        std::vector<double> axis[3];
+        for (int a = 0; a < 3; ++a) {
+            if (c[a]) {
+                c[a]->EvaluateSorted(times, &axis[a]);
+            } else {
+                axis[a].assign(times.size(), doc_.RestValue(node, first + a));
+            }
+        }
+        for (size_t k = 0; k < times.size(); ++k) {
+            s.times.push_back(float(times[k]));
             for (int a = 0; a < 3; ++a) {
-                s.values.push_back(
-                    float(c[a] ? c[a]->Evaluate(t) : doc_.RestValue(node, first + a)));
+                s.values.push_back(float(axis[a][k]));
             }
         }
     }
@@ -498,11 +521,20 @@ void SceneWriter::sampleRotation(int node) {
     }
     NewSampler s{node, "rotation", "LINEAR", {}, {}, 4};
     EulerRotation::Quat previous = {0, 0, 0, 1};
-    for (double t : sampleTimes(node, 3)) {
-        EulerRotation::Vec3 e;
-        for (int a = 0; a < 3; ++a) {
-            e[size_t(a)] = c[a] ? c[a]->Evaluate(t) : doc_.RestValue(node, 3 + a);
+    std::vector<double> times = sampleTimes(node, 3);
+    std::vector<double> axis[3];
+    for (int a = 0; a < 3; ++a) {
+        if (c[a]) {
+            c[a]->EvaluateSorted(times, &axis[a]);
+        } else {
+            axis[a].assign(times.size(), doc_.RestValue(node, 3 + a));
         }
+    }
+    s.times.reserve(times.size());
+    s.values.reserve(times.size() * 4);
+    for (size_t k = 0; k < times.size(); ++k) {
+        double t = times[k];
+        EulerRotation::Vec3 e = {axis[0][k], axis[1][k], axis[2][k]};
         EulerRotation::Quat q = EulerRotation::ToQuaternion(e);
         double dot =
             q[0] * previous[0] + q[1] * previous[1] + q[2] * previous[2] + q[3] * previous[3];

@@ -98,6 +98,26 @@ TEST(ChannelCurve, MergeReplacesKeyAtSameTimeAndKeepsOrder) {
     EXPECT_DOUBLE_EQ(c.keys()[1].value, 7);
 }
 
+TEST(ChannelCurve, SortedEvaluationMatchesOneByOne) {
+    // Keys in order, one at a float-rounded time as read from a file.
+    ChannelCurve c({key(0.1, 0, ChannelCurve::kFlat, ChannelCurve::kStep),
+                    key(double(float(1 / 3.0)), 1, ChannelCurve::kLinear, ChannelCurve::kSmooth),
+                    key(0.5, 2, ChannelCurve::kSmooth, ChannelCurve::kFlat),
+                    key(0.9, -1, ChannelCurve::kFlat, ChannelCurve::kLinear)});
+    std::vector<double> times;
+    for (int f = -3; f <= 40; ++f) {
+        times.push_back(f / 30.0);
+    }
+    times.push_back(0.95);
+    std::vector<double> out;
+    c.EvaluateSorted(times, &out);
+    ASSERT_EQ(out.size(), times.size());
+    for (size_t i = 0; i < times.size(); ++i) {
+        EXPECT_DOUBLE_EQ(out[i], c.Evaluate(times[i])) << times[i];
+    }
+    EXPECT_DOUBLE_EQ(out[13], 1);  // frame 10 = 1/3 s lands on the float-rounded key
+}
+
 class EulerRoundTrip : public ::testing::TestWithParam<std::array<double, 3>> {};
 
 TEST_P(EulerRoundTrip, QuaternionGivesBackTheAngles) {

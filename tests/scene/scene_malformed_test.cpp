@@ -132,6 +132,8 @@ TEST(SceneMalformed, MissingEmptyAndTruncatedFiles) {
     std::string error;
     EXPECT_FALSE(SceneDocument::Load(dir + "/none.glb", &error));
     EXPECT_NE(error.find("none.glb"), std::string::npos);
+    EXPECT_FALSE(SceneDocument::Load(dir, &error));
+    EXPECT_NE(error.find("not a regular file"), std::string::npos) << error;
     WriteFile(dir + "/empty.gltf", "");
     EXPECT_FALSE(SceneDocument::Load(dir + "/empty.gltf", &error));
     EXPECT_NE(error.find("empty"), std::string::npos);
