@@ -40,7 +40,14 @@ Imp::Imp() {
         OnSignal(sig, &Imp::save_on_crash, nullptr);
 }
 
-Imp::~Imp() = default;
+Imp::~Imp() {
+    // Keysets own recognizers whose code may live in plug-ins that the catalogue unloads when
+    // it goes: tracks and keysets go first.
+    for (int i = 0; i < kMaxKeysets; ++i) {
+        keyTracks[i].reset();
+        keySets[i].reset();
+    }
+}
 
 std::unique_ptr<KLScene> Imp::make_scene(bool deltaShape) {
     auto made = std::make_unique<KLScene>();

@@ -190,11 +190,18 @@ TEST_P(TrackFps, SetsOrKeepsTheRate) {
     EXPECT_EQ(CueTime::default_fps, GetParam().expected);
 }
 
+std::string FpsCaseName(const ::testing::TestParamInfo<FpsCase>& info) {
+    static const char* const names[] = {"None",       "Zero",       "Negative",
+                                        "TwentyFive", "NotANumber", "ThreeTokens"};
+    return names[info.index];
+}
+
 INSTANTIATE_TEST_SUITE_P(Statements, TrackFps,
                          ::testing::Values(FpsCase{"begin marktrack\nend\n", 24},
                                            FpsCase{"fps 0\n", 30}, FpsCase{"fps -2\n", 30},
                                            FpsCase{"fps 25\n", 25}, FpsCase{"fps twelve\n", 30},
-                                           FpsCase{"fps 25 extra\n", 24}));
+                                           FpsCase{"fps 25 extra\n", 24}),
+                         FpsCaseName);
 
 TEST_F(TrackTest, AnActiveKeysetNotLoadedLeavesTheWindowAlone) {
     ASSERT_EQ(theImp.LoadTrack(Track("active_keyset lips\n").c_str()), 1);
