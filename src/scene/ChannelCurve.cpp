@@ -99,6 +99,41 @@ double ChannelCurve::segment(size_t i, double seconds) const {
            (u3 - u2) * m1;
 }
 
+double ChannelCurve::SlopeAt(double seconds, bool outgoing) const {
+    size_t n = keys_.size();
+    if (n < 2 || std::isnan(seconds)) {
+        return 0.0;
+    }
+    double eps = 1e-9 + std::fabs(seconds) * 1.2e-7;
+    auto it = std::upper_bound(keys_.begin(), keys_.end(), seconds + eps,
+                               [](double s, const Key& k) { return s < k.time; });
+    if (it == keys_.begin()) {
+        return 0.0;  // held before the first key
+    }
+    size_t i = size_t(it - keys_.begin()) - 1;  // the last key at or before `seconds`
+    if (std::fabs(seconds - keys_[i].time) <= eps) {
+        // At key i: the segment leaving it, or the one arriving at it.
+        if (outgoing) {
+            return i + 1 < n && keys_[i].out != kStep ? OutSlope(i) : 0.0;
+        }
+        return i > 0 && keys_[i - 1].out != kStep ? InSlope(i) : 0.0;
+    }
+    if (i + 1 == n || keys_[i].out == kStep) {
+        return 0.0;
+    }
+    const Key& a = keys_[i];
+    const Key& b = keys_[i + 1];
+    double dt = b.time - a.time;
+    if (a.out == kLinear && b.in == kLinear) {
+        return (b.value - a.value) / dt;
+    }
+    double u = (seconds - a.time) / dt;
+    double m0 = OutSlope(i) * dt, m1 = InSlope(i + 1) * dt;
+    return ((6 * u * u - 6 * u) * (a.value - b.value) + (3 * u * u - 4 * u + 1) * m0 +
+            (3 * u * u - 2 * u) * m1) /
+           dt;
+}
+
 void ChannelCurve::EvaluateSorted(const std::vector<double>& times,
                                   std::vector<double>* out) const {
     out->resize(times.size());

@@ -45,6 +45,9 @@ class ChannelCurve : public OrChannel {
     // (in), resolved from the tangent kinds; a step leaves with slope 0.
     double OutSlope(size_t i) const;
     double InSlope(size_t i) const;
+    // The curve's derivative (units per second) at `seconds`, from the right (`outgoing`) or
+    // from the left; zero where the curve holds, and at a step.
+    double SlopeAt(double seconds, bool outgoing) const;
     // True when every segment is a straight line (both ends linear) or every one a step.
     bool AllLinear() const;
     bool AllStep() const;

@@ -400,7 +400,7 @@ void SceneWriter::makeNodeTrs(int node) {
     n.scale.assign(s.begin(), s.end());
 }
 
-std::vector<double> SceneWriter::sampleTimes(int node, int first) const {
+std::vector<double> SceneWriter::sampleTimes(int node, int first, bool frames) const {
     double lo = 0, hi = 0;
     bool any = false;
     for (int c = first; c < first + 3; ++c) {
@@ -412,7 +412,8 @@ std::vector<double> SceneWriter::sampleTimes(int node, int first) const {
     }
     std::vector<double> times, merged;
     int fps = CueTime::default_fps > 0 ? CueTime::default_fps : 30;
-    for (double f = std::ceil(lo * fps - 1e-6); any && f <= std::floor(hi * fps + 1e-6); ++f) {
+    for (double f = std::ceil(lo * fps - 1e-6); frames && any && f <= std::floor(hi * fps + 1e-6);
+         ++f) {
         times.push_back(f / fps);
     }
     // Key times are in order already: merge them in.
@@ -462,8 +463,8 @@ void SceneWriter::sampleTranslationScale(int node, int first, const char* path) 
         }
         const auto& keys = c[a]->keys();
         shared = shared && keys.size() == lead->keys().size();
-        for (size_t k = 0; shared && k < keys.size(); ++k) {
-            shared = float(keys[k].time) == float(lead->keys()[k].time);
+        for (size_t k = 0; k < keys.size(); ++k) {
+            shared = shared && float(keys[k].time) == float(lead->keys()[k].time);
             anyStep = anyStep || (k + 1 < keys.size() && keys[k].out == ChannelCurve::kStep);
         }
         allLinear = allLinear && c[a]->AllLinear();
@@ -489,8 +490,31 @@ void SceneWriter::sampleTranslationScale(int node, int first, const char* path) 
                 }
             }
         }
+    } else if (!anyStep) {
+        // Axes keyed at different times: cut every axis's cubic pieces at the union of the key
+        // times; a piece of a cubic is a cubic, so this is exact too.
+        s.interpolation = "CUBICSPLINE";
+        std::vector<double> times = sampleTimes(node, first, false);
+        std::vector<double> axis[3];
+        for (int a = 0; a < 3; ++a) {
+            if (c[a]) {
+                c[a]->EvaluateSorted(times, &axis[a]);
+            } else {
+                axis[a].assign(times.size(), doc_.RestValue(node, first + a));
+            }
+        }
+        for (size_t k = 0; k < times.size(); ++k) {
+            s.times.push_back(float(times[k]));
+            for (int part = 0; part < 3; ++part) {
+                for (int a = 0; a < 3; ++a) {
+                    double v =
+                        part == 1 ? axis[a][k] : (c[a] ? c[a]->SlopeAt(times[k], part == 2) : 0.0);
+                    s.values.push_back(float(v));
+                }
+            }
+        }
     } else {
-        std::vector<double> times = sampleTimes(node, first);
+        std::vector<double> times = sampleTimes(node, first, true);
         std::vector<double> axis[3];
         for (int a = 0; a < 3; ++a) {
             if (c[a]) {
@@ -521,7 +545,7 @@ void SceneWriter::sampleRotation(int node) {
     }
     NewSampler s{node, "rotation", "LINEAR", {}, {}, 4};
     EulerRotation::Quat previous = {0, 0, 0, 1};
-    std::vector<double> times = sampleTimes(node, 3);
+    std::vector<double> times = sampleTimes(node, 3, true);
     std::vector<double> axis[3];
     for (int a = 0; a < 3; ++a) {
         if (c[a]) {

@@ -35,7 +35,9 @@ class SceneWriter {
     void compactBuffers(const std::set<int>& buffers);
     void sampleTranslationScale(int node, int firstChannel, const char* path);
     void sampleRotation(int node);
-    std::vector<double> sampleTimes(int node, int firstChannel) const;
+    // Every key time of the node's three channels from `firstChannel` and, with `frames`,
+    // every whole frame between the first and last key, ascending, one per distinct float.
+    std::vector<double> sampleTimes(int node, int firstChannel, bool frames) const;
     int appendAccessor(const std::vector<float>& data, int type, size_t count, bool withMinMax);
     void makeNodeTrs(int node);
 

@@ -118,6 +118,26 @@ TEST(ChannelCurve, SortedEvaluationMatchesOneByOne) {
     EXPECT_DOUBLE_EQ(out[13], 1);  // frame 10 = 1/3 s lands on the float-rounded key
 }
 
+TEST(ChannelCurve, SlopeMatchesDifferenceQuotientAndHoldsOutside) {
+    ChannelCurve c({key(0, 0, ChannelCurve::kFlat, ChannelCurve::kSmooth),
+                    key(1, 1, ChannelCurve::kSmooth, ChannelCurve::kLinear),
+                    key(2, 4, ChannelCurve::kLinear, ChannelCurve::kFlat),
+                    key(3, 2, ChannelCurve::kFlat, ChannelCurve::kFlat)});
+    const double h = 1e-6;
+    for (double t : {0.25, 0.5, 1.5, 2.2, 2.9}) {
+        double numeric = (c.Evaluate(t + h) - c.Evaluate(t - h)) / (2 * h);
+        EXPECT_NEAR(c.SlopeAt(t, true), numeric, 1e-5) << t;
+        EXPECT_NEAR(c.SlopeAt(t, false), numeric, 1e-5) << t;
+    }
+    // At a key the two sides may differ: linear into key 2 (slope 3), smooth out of it.
+    EXPECT_NEAR(c.SlopeAt(2, false), 3, 1e-12);
+    EXPECT_NEAR(c.SlopeAt(2, true), c.OutSlope(2), 1e-12);
+    EXPECT_EQ(c.SlopeAt(-1, true), 0);
+    EXPECT_EQ(c.SlopeAt(0, false), 0);
+    EXPECT_EQ(c.SlopeAt(3, true), 0);
+    EXPECT_EQ(c.SlopeAt(5, false), 0);
+}
+
 class EulerRoundTrip : public ::testing::TestWithParam<std::array<double, 3>> {};
 
 TEST_P(EulerRoundTrip, QuaternionGivesBackTheAngles) {
