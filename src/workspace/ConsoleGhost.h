@@ -27,8 +27,8 @@ class ConsoleGhost : public Ghost {
     void SetMenuStatus() override {}
     void SetViewStatus() override {}
     void MakeKeysetImages() override {}
-    // Nothing to adjust without a dialog: the range found is loaded as it stands.
-    int AdjustRelLoad(char**, char**, int*, int*, int*, int*) override { return 1; }
+    // No dialog to ask: the load is cancelled, nothing is loaded.
+    int AdjustRelLoad(char**, char**, int*, int*, int*, int*) override { return 0; }
     void DisplayDuration(CueTime) override {}
     void DisplayReferenceOffset(CueTime) override {}
     // The message on a line of its own on the error stream.

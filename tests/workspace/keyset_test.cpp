@@ -438,3 +438,32 @@ TEST_F(KeysetTest, AFileThatCannotBeCreatedIsRefusedSilently) {
 }
 
 }  // namespace
+
+namespace {
+
+// Damaged descriptions load what they can and never leave a keyset without its track.
+TEST_F(KeysetTest, DamagedDescriptionsLoadWhatTheyCan) {
+    static const char binary[] = "\0\x01\xff\"begin keyset\t\"\n";
+    const std::string junk(binary, sizeof binary - 1);
+    const std::vector<std::pair<std::string, int>> cases = {
+        {"begin keyset unterminated\n key a 0\n key b 10\n", 1},
+        {"begin keyset\n key a 0\nend\n", 0},  // no name: not a keyset statement
+        {"begin keyset \"open quote\n key a 0\nend\n", 1},
+        {"begin shapeset s jaw\nend\n", 0},  // too few tokens
+        {"begin recognizer-links Vowel\n", 0},
+        {junk + std::string(300000, 'k') + "\nbegin keyset late\nend\n", 1},
+        {"end\nend\nbegin keyset m\n key a 1e40\n key b -5\n key c nan\nend\n", 1},
+    };
+    for (const auto& [body, keysets] : cases) {
+        theImp.batchMode = 1;
+        testing::internal::CaptureStderr();
+        EXPECT_EQ(theImp.LoadKeyset(Describe(body).c_str()), 1) << body.substr(0, 40);
+        testing::internal::GetCapturedStderr();
+        EXPECT_EQ(theImp.keysetCount, keysets) << body.substr(0, 40);
+        for (int i = 0; i < theImp.keysetCount; ++i)
+            EXPECT_NE(theImp.GetKeyTrack(i), nullptr);
+        EXPECT_EQ(theImp.SaveKeyset((dir / "misc_data/after.kset").c_str()), 1);
+    }
+}
+
+}  // namespace

@@ -270,3 +270,30 @@ TEST_F(TrackTest, DurationIsTheLongestOfItsCandidatesAndNeverBelowOneSecond) {
 }
 
 }  // namespace
+
+namespace {
+
+TEST_F(TrackTest, DamagedTracksLoadWhatTheyCan) {
+    static const char binary[] = "sound \"unterminated\nfps 99999999999\n\0\xff";
+    const std::vector<std::string> cases = {
+        "begin keytrack mouth\n event 3 open\n",  // no end
+        "begin keytrack mouth\n event\n event x\n event 1e30 open\n event -4 open Ease nan\nend\n",
+        "begin marktrack\n mark\n mark 3\n mark 2 \"\"\n",
+        std::string(binary, sizeof binary - 1),
+        "active_keyset\nactive_keyset a b\nbegin\nbegin keytrack\n",
+    };
+    for (const std::string& text : cases) {
+        theImp.batchMode = 1;
+        testing::internal::CaptureStderr();
+        EXPECT_EQ(theImp.LoadTrack(Track(text).c_str()), 1) << text;
+        testing::internal::GetCapturedStderr();
+        EXPECT_GE(theImp.fps, 1);
+        EXPECT_GE(theImp.duration.Ticks(), 6000);
+        EXPECT_EQ(theImp.SaveTrack((dir / "after.track").c_str()), 1);
+        EXPECT_EQ(theImp.LoadTrack((dir / "after.track").c_str()), 1)
+            << "what was saved reads back";
+    }
+    theImp.SetFps(30);
+}
+
+}  // namespace
