@@ -12,7 +12,8 @@ std::string FloatText(float value) {
     }
     for (int digits = 6; digits <= 9; ++digits) {
         std::snprintf(buf, sizeof buf, "%.*g", digits, double(value));
-        if (std::strtof(buf, nullptr) == value) break;
+        if (std::strtof(buf, nullptr) == value)
+            break;
     }
     return buf;
 }

@@ -111,8 +111,10 @@ const char* KLKeySet::GetKeyShapeName(int i) const {
     return k ? k->Name() : nullptr;
 }
 
+// Callers make sure the keyset has key shapes; an empty one gives null rather than reading
+// past the table.
 KLKey* KLKeySet::GetDefaultKeyShape() const {
-    return keyShapes[defaultIndex].get();
+    return GetKeyShape(defaultIndex);
 }
 
 CueRecognizer* KLKeySet::GetRecognizer(const char* a_name) const {

@@ -46,7 +46,7 @@ class KLKeySet {
     KLImageSGI* GetKeyShapeImage(int i) const;
     KLImageSGI* GetKeyShapeIcon(int i) const;
     const char* GetKeyShapeName(int i) const;
-    // keyShapes[defaultIndex]; the keyset must have key shapes.
+    // keyShapes[defaultIndex]; null when the keyset has no key shapes.
     KLKey* GetDefaultKeyShape() const;
 
     // The newest recognizer of that name, or null. AddRecognizer takes ownership and puts

@@ -48,6 +48,7 @@ TEST_F(KLKeySetTest, ConstructorsAndMessages) {
     EXPECT_EQ(one.imagesOnFile, 1);
     EXPECT_EQ(one.imagesChanged, 0);
     EXPECT_EQ(one.defaultIndex, 0);
+    EXPECT_EQ(one.GetDefaultKeyShape(), nullptr) << "no key shapes yet";
 
     KLKeySet two("brow", "browNode", 4, -1.5f, 2.5f);
     EXPECT_EQ(two.kind, 2);
