@@ -186,7 +186,7 @@ int Imp::read_wire_file(const char* name) {
 
 int Imp::LoadKeyset(const char* name) {
     std::ifstream in(name ? name : "");
-    if (!name || !in) {
+    if (!name || !in || KLFilePath::IsDirectory(name)) {
         report(KLFmt("Failed to open keyset file [%s].", name ? name : ""));
         return 0;
     }
@@ -217,6 +217,7 @@ int Imp::LoadKeyset(const char* name) {
     activeKeyset = 0;
     if (!batchMode)
         KLStatus("Deleting old keysets.");
+    // Batch mode clears too (without a word), so that a second load never adds to the first.
     clear_keyset_data();
     if (!batchMode)
         KLStatus("Parsing keyset description.");

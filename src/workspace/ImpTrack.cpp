@@ -44,7 +44,7 @@ std::unique_ptr<CueSound> read_track_sound(const std::string& path) {
 
 int Imp::LoadTrack(const char* name) {
     std::ifstream in(name ? name : "");
-    if (!name || !in) {
+    if (!name || !in || KLFilePath::IsDirectory(name)) {
         report(KLFmt("Failed to open track file [%s].", name ? name : ""));
         return 0;
     }

@@ -156,8 +156,10 @@ TEST_P(KeysetLoadFailure, ReportsAndLeavesTheWorkspaceAsDefined) {
     ASSERT_EQ(theImp.LoadKeyset(Describe(kMouth, "good.kset").c_str()), 1);
     ghost.calls.clear();
     const std::string path = dir / "misc_data/bad.kset";
-    if (f.description)
+    if (f.description && *f.description)
         WriteFile(path, f.description);
+    else if (f.description)
+        std::filesystem::create_directory(path);  // "": a directory of that name
     WriteFile(dir / "wire/text.gltf", "this is not a scene\n");
     std::string message = f.message;
     const std::string wires = dir / "wire";
@@ -178,7 +180,8 @@ TEST_P(KeysetLoadFailure, ReportsAndLeavesTheWorkspaceAsDefined) {
     }
     EXPECT_EQ(theImp.batchStop, f.batchStop);
     // A file that cannot be opened leaves the previous workspace; any later failure empties it.
-    EXPECT_EQ(theImp.keysetCount, f.description ? 0 : 1);
+    const bool opened = f.description && *f.description;
+    EXPECT_EQ(theImp.keysetCount, opened ? 0 : 1);
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -186,6 +189,7 @@ INSTANTIATE_TEST_SUITE_P(
     ::testing::Values(
         LoadFailure{"Missing", nullptr, 0, "Failed to open keyset file [%P].", 0},
         LoadFailure{"MissingBatch", nullptr, 1, "Failed to open keyset file [%P].", 0},
+        LoadFailure{"Directory", "", 0, "Failed to open keyset file [%P].", 0},
         LoadFailure{"NoWire", kMouth, 0, "Could not read wire file, cannot load keyset", 0},
         LoadFailure{"NoWireBatch", kMouth, 1, "No wire file!", 1},
         LoadFailure{"WireMissing", "wire gone.gltf\nbegin keyset m\nend\n", 0,

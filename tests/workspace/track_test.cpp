@@ -114,6 +114,8 @@ TEST_F(TrackTest, LoadingAgainReplacesTheTracksAndMarks) {
 TEST_F(TrackTest, AMissingFileIsToldAndChangesNothing) {
     ASSERT_EQ(theImp.LoadTrack(Track(kFullTrack).c_str()), 1);
     ghost.calls.clear();
+    EXPECT_EQ(theImp.LoadTrack((dir / "misc_data").c_str()), 0) << "a directory is no track";
+    ghost.calls.clear();
     const std::string missing = dir / "misc_data/none.track";
     EXPECT_EQ(theImp.LoadTrack(missing.c_str()), 0);
     EXPECT_THAT(ghost.calls,
