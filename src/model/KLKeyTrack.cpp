@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <iostream>
+#include <new>
 
 #include "model/FloatText.h"
 #include "model/KLKey.h"
@@ -112,29 +113,46 @@ float KLKeyTrack::bracket_keys_from_time(CueTime t, KLKeyEvent** prev, KLKeyEven
 void KLKeyTrack::PrepareFastAccess(CueTime start, CueTime end) {
     if (!(start < end))
         return;
-    FinishFastAccess();
+    fastTable.clear();  // keeps the memory of an earlier table for this one
+    fastCount = 0;
     fastStart = start;
     fastEnd = end;
     const double frames = std::trunc((end - start).Frames());
-    fastCount = frames > 0.0 ? int(frames) : 0;
-    fastTable.resize(size_t(fastCount));
+    const int count = frames > 0.0 ? int(frames) : 0;
+    try {
+        fastTable.reserve(size_t(count));
+    } catch (const std::bad_alloc&) {
+        // A range too long to tabulate leaves no table: lookups take the slow path.
+        std::cerr << "KLKeyTrack::PrepareFastAccess() range too long" << std::endl;
+        return;
+    }
+    fastCount = count;
 
     std::vector<KLKeyEvent*> order(events.begin(), events.end());
     const CueTime step(0, 0, 0, 1, 0);
     size_t next = 0;  // first event after the entry's time
+    KLKeyEvent* p = nullptr;
+    KLKeyEvent* n = order.empty() ? nullptr : order[0];
+    float prevFrames = 0.0f, span = 0.0f;  // of the bracketing pair, as fraction_between has them
     CueTime t = start;
     for (int i = 0; i < fastCount; ++i, t += step) {
-        while (next < order.size() && order[next]->time <= t)
-            ++next;
-        KLKeyEvent* p = next > 0 ? order[next - 1] : nullptr;
-        KLKeyEvent* n = next < order.size() ? order[next] : nullptr;
+        if (next < order.size() && order[next]->time <= t) {
+            while (next < order.size() && order[next]->time <= t)
+                ++next;
+            p = order[next - 1];
+            n = next < order.size() ? order[next] : nullptr;
+            if (n) {
+                prevFrames = float(p->time.Frames());
+                span = float(n->time.Frames()) - prevFrames;
+            }
+        }
         float fraction;
         if (p && n) {
-            fraction = fraction_between(t, p->time, n->time);
+            fraction = span == 0.0f ? 0.0f : (float(t.Frames()) - prevFrames) / span;
         } else {
             fraction = n ? 1.0f : 0.0f;
         }
-        fastTable[i] = FastEntry{p, fraction > 0.5f ? n : p, p, n, fraction};
+        fastTable.push_back(FastEntry{p, fraction > 0.5f ? n : p, p, n, fraction});
     }
 }
 
