@@ -55,7 +55,8 @@ class KLKeyTrack {
     // empty track. From the fast-access table when there is one.
     float bracket_keys_from_time(CueTime t, KLKeyEvent** prev, KLKeyEvent** next) const;
     // Builds the fast-access table: one entry per whole frame from start (inclusive) for
-    // truncate((end - start) in frames) frames. Nothing happens unless start < end.
+    // truncate((end - start) in frames) frames. Nothing happens unless start < end; a range
+    // too long to hold in memory leaves no table.
     void PrepareFastAccess(CueTime start, CueTime end);
     void FinishFastAccess();
 
