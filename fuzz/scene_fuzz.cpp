@@ -1,5 +1,7 @@
 // Feeds arbitrary bytes to the scene loader, as a binary .glb and as .gltf text, then walks the
 // node hierarchy the way extraction does and evaluates every animated channel.
+#include <unistd.h>
+
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
@@ -10,6 +12,7 @@
 #include "scene/KLWire.h"
 #include "scene/OrDagNode.h"
 #include "scene/SceneDocument.h"
+#include "toolkit/CueTime.h"
 
 namespace {
 double walk(OrDagNode* node, int depth) {
@@ -42,6 +45,24 @@ void run(const uint8_t* data, size_t size) {
     std::unique_ptr<KLDagList> list(KLWire::BuildDagList(&root, 1));
     for (OrDagNode* n : list->nodes) {
         KLWire::UniqueDagName(&root, n->name());
+    }
+    // Replace two channels of the first node and write the scene out and back in: the writer
+    // renumbers accessors and buffer views of whatever the loader accepted.
+    if (list->nodes.size() > 1) {
+        CueTime times[3] = {CueTime::FromTicks(0), CueTime::FromTicks(700),
+                            CueTime::FromTicks(3000)};
+        float values[3] = {0.0f, 1.5f, -2.0f};
+        int in[3] = {0, 1, 2}, out[3] = {2, 0, 1};
+        KLWire::alwaysClearChannel = 1;
+        KLWire::StoreChannel(list->nodes[1], 1, 3, times, values, in, nullptr, out, nullptr);
+        KLWire::StoreChannel(list->nodes[1], 4, 3, times, values, in, nullptr, out, nullptr);
+        static const std::string path = "/tmp/scene_fuzz_" + std::to_string(getpid()) + ".glb";
+        if (doc->Store(path, &error)) {
+            auto back = SceneDocument::Load(path, &error);
+            if (!back) {
+                __builtin_trap();  // what was written must read back
+            }
+        }
     }
 }
 }  // namespace

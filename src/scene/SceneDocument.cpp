@@ -14,6 +14,9 @@
 
 namespace {
 const char* const kPaths[3] = {"translation", "rotation", "scale"};
+// Key times beyond the workspace's time range (a CueTime reaches about 99 hours) are refused:
+// nothing could address them, and storing samples every frame up to them would never end.
+constexpr double kMaxSeconds = 360000.0;
 
 uint32_t read_u32(const unsigned char* p) {
     return uint32_t(p[0]) | uint32_t(p[1]) << 8 | uint32_t(p[2]) << 16 | uint32_t(p[3]) << 24;
@@ -283,8 +286,12 @@ bool SceneDocument::readAnimations(std::string* why) {
                 *why = where + "sampler output count does not match its input count";
                 return false;
             }
-            for (size_t k = 1; k < n; ++k) {
-                if (!(times[k] > times[k - 1])) {
+            for (size_t k = 0; k < n; ++k) {
+                if (std::fabs(times[k]) > kMaxSeconds) {
+                    *why = where + "a key time lies outside +-100 hours";
+                    return false;
+                }
+                if (k > 0 && !(times[k] > times[k - 1])) {
                     *why = where + "key times are not strictly increasing";
                     return false;
                 }

@@ -412,8 +412,10 @@ std::vector<double> SceneWriter::sampleTimes(int node, int first, bool frames) c
     }
     std::vector<double> times, merged;
     int fps = CueTime::default_fps > 0 ? CueTime::default_fps : 30;
-    for (double f = std::ceil(lo * fps - 1e-6); frames && any && f <= std::floor(hi * fps + 1e-6);
-         ++f) {
+    // At most one frame per 1/fps s across the CueTime range (about 99 hours), and never more.
+    double f0 = std::ceil(lo * fps - 1e-6), last = std::floor(hi * fps + 1e-6);
+    last = std::min(last, f0 + 360000.0 * fps);
+    for (double f = f0; frames && any && f <= last; ++f) {
         times.push_back(f / fps);
     }
     // Key times are in order already: merge them in.

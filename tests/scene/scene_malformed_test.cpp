@@ -122,6 +122,9 @@ TEST(SceneMalformed, NanAndUnorderedKeysAreErrors) {
     EXPECT_FALSE(SceneDocument::Load(dir + "/nan.gltf", &error));
     EXPECT_NE(error.find("NaN"), std::string::npos) << error;
     EXPECT_NE(error.find("nan.gltf"), std::string::npos);
+    WriteFile(dir + "/far.gltf", base_scene({0, 1e30f, 0, 0, 0, 1, 1, 1}));
+    EXPECT_FALSE(SceneDocument::Load(dir + "/far.gltf", &error));
+    EXPECT_NE(error.find("100 hours"), std::string::npos) << error;
     WriteFile(dir + "/order.gltf", base_scene({1, 0, 0, 0, 0, 1, 1, 1}));
     EXPECT_FALSE(SceneDocument::Load(dir + "/order.gltf", &error));
     EXPECT_NE(error.find("strictly increasing"), std::string::npos) << error;
