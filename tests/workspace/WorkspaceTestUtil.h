@@ -1,22 +1,32 @@
 #pragma once
 
 // Helpers shared by the workspace tests: temporary directories, files, environment, running
-// the chirrup program, a window interface that records what the workspace asks of it, and
-// small generated scene and sound files.
-#include <array>
+// the chirrup program, a window interface that records what the workspace asks of it, a
+// project fixture, and small generated scene and sound files.
+#include <gtest/gtest.h>
+
+#include <functional>
 #include <optional>
 #include <string>
 #include <utility>
 #include <vector>
 
+#include "toolkit/CueRecognizer.h"
 #include "toolkit/CueTime.h"
+#include "toolkit/CueTokenList.h"
+#include "toolkit/KLErrHandler.h"
+#include "toolkit/KLString.h"
 #include "workspace/Ghost.h"
+
+class KLEdlEvent;
 
 namespace wstest {
 
 std::string ReadFile(const std::string& path);  // empty when the file cannot be read
 void WriteFile(const std::string& path, const std::string& text);
 bool FileExists(const std::string& path);
+// What `f` writes on the error stream.
+std::string StdErr(const std::function<void()>& f);
 
 // A fresh directory under the system's temporary directory, removed with everything in it.
 class TempDir {
@@ -55,7 +65,7 @@ struct RunResult {
 };
 using EnvChange = std::pair<std::string, std::optional<std::string>>;  // nullopt: unset
 // Runs CHIRRUP_BINARY_DIR/bin/chirrup with `args` in `cwd`. The environment is this
-// process's without the variables the program reads (VX_*, TESSEL_*), plus `env`.
+// process's without the variables the program reads (VX_*, TESSEL_*, KL_PLUGIN*), plus `env`.
 RunResult RunChirrup(const std::vector<std::string>& args, const std::string& cwd,
                      const std::vector<EnvChange>& env = {});
 
@@ -70,31 +80,46 @@ class RecordingGhost : public Ghost {
     // The calls whose text begins with `prefix`.
     std::vector<std::string> Calls(const std::string& prefix) const;
 
-    int GetActiveKeyset() override;
-    void SetActiveKeyset(int index) override;
-    void InitSound(CueSound* sound) override;
-    void InitMarkTrack(KLMarkTrack* track) override;
-    void CenterKeyView() override;
-    void CenterMixView() override;
-    void ClearViews() override;
-    void ClearKeyTracks() override;
-    void ClearKeysets(int index) override;
-    void InitKeyset(int index) override;
-    void ClearKeysetMenu() override;
-    void DressKeysetMenu() override;
-    void ShowRecognizerGui(CueRecognizer* recognizer) override;
-    void SetMenuStatus() override;
-    void SetViewStatus() override;
-    void MakeKeysetImages() override;
-    int AdjustRelLoad(char** prefix, char** ext, int* start, int* end, int* by, int* zoom) override;
-    void DisplayDuration(CueTime duration) override;
-    void DisplayReferenceOffset(CueTime offset) override;
-    void Inform(const char* message, const char* button) override;
-    int Confirm(const char* message, const char* yes, const char* no) override;
+    int GetActiveKeyset() override { return activeKeyset; }
+    void SetActiveKeyset(int i) override { Log(KLFmt("SetActiveKeyset(%d)", activeKeyset = i)); }
+    void InitSound(CueSound* s) override { Log(s ? "InitSound(sound)" : "InitSound(null)"); }
+    void InitMarkTrack(KLMarkTrack* t) override {
+        Log(t ? "InitMarkTrack(track)" : "InitMarkTrack(null)");
+    }
+    void CenterKeyView() override { Log("CenterKeyView()"); }
+    void CenterMixView() override { Log("CenterMixView()"); }
+    void ClearViews() override { Log("ClearViews()"); }
+    void ClearKeyTracks() override { Log("ClearKeyTracks()"); }
+    void ClearKeysets(int i) override { Log(KLFmt("ClearKeysets(%d)", i)); }
+    void InitKeyset(int i) override { Log(KLFmt("InitKeyset(%d)", i)); }
+    void ClearKeysetMenu() override { Log("ClearKeysetMenu()"); }
+    void DressKeysetMenu() override { Log("DressKeysetMenu()"); }
+    void ShowRecognizerGui(CueRecognizer*) override { Log("ShowRecognizerGui()"); }
+    void SetMenuStatus() override { Log("SetMenuStatus()"); }
+    void SetViewStatus() override { Log("SetViewStatus()"); }
+    void MakeKeysetImages() override { Log("MakeKeysetImages()"); }
+    int AdjustRelLoad(char**, char**, int*, int*, int*, int*) override {
+        Log("AdjustRelLoad()");
+        return 0;
+    }
+    void DisplayDuration(CueTime d) override { Log(KLFmt("DisplayDuration(%d)", d.Ticks())); }
+    void DisplayReferenceOffset(CueTime o) override {
+        Log(KLFmt("DisplayReferenceOffset(%d)", o.Ticks()));
+    }
+    void Inform(const char* message, const char* button) override {
+        Log(KLFmt("Inform(%s|%s)", message, button));
+    }
+    int Confirm(const char* message, const char* yes, const char* no) override {
+        Log(KLFmt("Confirm(%s|%s|%s)", message, yes, no));
+        return confirmAnswer;
+    }
     void UpdateApplyDialog(KLEdlEvent* event) override;
-    void ResetFileManagers() override;
-    void ShowErrorFlag() override;
-    void ClearErrorFlag() override;
+    void ResetFileManagers() override { Log("ResetFileManagers()"); }
+    void ShowErrorFlag() override { Log("ShowErrorFlag()"); }
+    void ClearErrorFlag() override { Log("ClearErrorFlag()"); }
+
+  private:
+    void Log(const std::string& call) { calls.push_back(call); }
 };
 
 // Makes `ghost` the workspace's window interface while it lives.
@@ -110,19 +135,74 @@ class GhostScope {
 // Empties theImp: no keysets, sound, log or apply event; 30 frames per second; interactive.
 void ResetWorkspace();
 
-// One node of a generated scene: its parent (-1 for a root node) and, optionally, a
-// translation animation (key times in seconds, LINEAR).
-struct NodeSpec {
-    std::string name;
-    int parent = -1;
-    std::vector<float> times;
-    std::vector<std::array<float, 3>> translations;
+// A recognizer compiled into the tests: targets "a" and "e" and a setting of its own, "gain".
+class VowelRecognizer : public CueRecognizer {
+  public:
+    VowelRecognizer() : CueRecognizer("Vowel") { AddTarget("a"), AddTarget("e"); }
+    float gain = 1.0f;
+    void ResetSettings() override { CueRecognizer::ResetSettings(), gain = 1.0f; }
+    bool Recognize(const CueSound&) override { return true; }
+    CueRecognizer* Clone() const override { return new VowelRecognizer(); }
+
+  protected:
+    void ReadParameter(const CueTokenList& s) override {
+        if (s.Matches("gain") && s.Count() == 2)
+            gain = s.ArgFloat(1);
+    }
+    void WriteParameters(std::ostream& out) const override { out << "    gain " << gain << "\n"; }
 };
-// A glTF 2.0 scene (embedded buffer) with those nodes; `sceneName` names the scene.
-std::string MakeSceneJson(const std::vector<NodeSpec>& nodes, const std::string& sceneName = "");
-// A face: root "head" with children "jaw" and "lip". Key shapes stand at frames 0 (rest),
-// 10 and 20 at 30 frames per second: jaw TY 0, 1, 2; lip TX 0, 0, 5; lip TZ 0, 3, 3.
-std::string FaceSceneJson(const std::string& sceneName = "face");
+
+// Collects the toolkit's reports at or above `level` while installed.
+class Reports : public KLErrHandler {
+  public:
+    explicit Reports(int level = KLErr::kWarning) : level_(level) {}
+    void Handle(KLErr* e) override {
+        if (e->Level() >= level_)
+            text += e->Message();
+    }
+    std::string text;
+
+  private:
+    int level_;
+};
+
+// Names a TEST_P instance after its table row's label.
+struct ByLabel {
+    template <typename Info>
+    std::string operator()(const Info& info) const {
+        return info.param.label;
+    }
+};
+
+// A keyset "mouth" with the face's three key shapes.
+inline const char* const kMouth =
+    "begin keyset mouth\n    key rest 0\n    key open 10\n    key wide 20\nend\n";
+
+// A project: DIR/wire/face.gltf (the face scene), empty DIR/misc_data and DIR/work; the
+// workspace emptied, a recording window interface installed, no error-log viewer launched.
+class ProjectTest : public ::testing::Test {
+  protected:
+    void SetUp() override;
+    void TearDown() override { ResetWorkspace(); }
+    // Writes DIR/misc_data/`name` and returns its path.
+    std::string Data(const std::string& name, const std::string& text) const;
+    // `text` with %W, %M and %D replaced by the wire, data and project directories.
+    std::string Fill(std::string text) const;
+    // Loads a keyset description in batch mode (no window, no project question).
+    int BatchLoadKeyset(const std::string& path);
+
+    TempDir dir;
+    ScopedEnv project{"TESSEL_PROJECT", dir.path().c_str()};
+    ScopedEnv misc{"TESSEL_MISC_DIR", nullptr};
+    ScopedEnv viewer{"TESSEL_USER_ERROR_READER", "true"};
+    RecordingGhost ghost;
+    GhostScope scope{&ghost};
+};
+
+// A glTF 2.0 face (embedded buffer): root "head" with children "jaw" and "lip". Key shapes
+// stand at frames 0 (rest), 10 and 20 at 30 frames per second: jaw TY 0, 1, 2; lip TX 0, 0, 5;
+// lip TZ 0, 3, 3.
+std::string FaceSceneJson();
 
 // A 16-bit mono AIFF file of `frames` sample frames at `rate` (a slow ramp).
 void WriteAiff(const std::string& path, int frames, int rate);

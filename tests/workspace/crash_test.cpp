@@ -15,34 +15,26 @@
 #include "workspace/Imp.h"
 
 using namespace wstest;
-using ::testing::IsEmpty;
 
 namespace {
 
 struct Outcome {
-    bool exited = false;
-    int status = -1;  // exit status when exited
+    int status = -1;  // exit status when it exited
     int signal = 0;   // the signal that ended it otherwise
     std::string err;  // what it wrote on the error stream
 };
 
-class EmergencySave : public ::testing::TestWithParam<int> {
+class EmergencySave : public ProjectTest, public ::testing::WithParamInterface<int> {
   protected:
     void SetUp() override {
-        for (const char* sub : {"misc_data", "wire", "work"})
-            std::filesystem::create_directory(dir / sub);
-        WriteFile(dir / "wire/face.gltf", FaceSceneJson());
-        WriteFile(dir / "misc_data/face.kset",
-                  "wire face.gltf\n"
-                  "begin keyset mouth\n key rest 0\n key open 10\n key wide 20\nend\n"
-                  "begin shapeset \"the brow\" jaw 4\n key down 0\n key up 1\nend\n");
-        WriteFile(dir / "misc_data/t.track",
-                  "begin keytrack mouth\n event 3 open Linear 0.5\n event 9 wide\nend\n"
-                  "begin keytrack\t\"the brow\"\n event 4 up Smooth 2\nend\n");
+        ProjectTest::SetUp();
+        Data("face.kset", std::string("wire face.gltf\n") + kMouth +
+                              "begin shapeset \"the brow\" jaw 4\n key down 0\n key up 1\nend\n");
+        Data("t.track",
+             "begin keytrack mouth\n event 3 open Linear 0.5\n event 9 wide\nend\n"
+             "begin keytrack\t\"the brow\"\n event 4 up Smooth 2\nend\n");
         WriteAiff(dir / "misc_data/d.aiff", 8000, 8000);
-        ResetWorkspace();
     }
-    void TearDown() override { ResetWorkspace(); }
 
     // Forks a process that loads what is asked, waits for `sig`, and reports how it ended.
     Outcome Crash(int sig, bool keysets, bool sound) {
@@ -52,8 +44,7 @@ class EmergencySave : public ::testing::TestWithParam<int> {
         const pid_t pid = ::fork();
         if (pid == 0) {
             ::close(ready[0]);
-            FILE* err = std::freopen(errPath.c_str(), "w", stderr);
-            if (!err || ::chdir((dir / "work").c_str()) != 0)
+            if (!std::freopen(errPath.c_str(), "w", stderr) || ::chdir((dir / "work").c_str()))
                 ::_exit(120);
             theImp.batchMode = 1;
             if (keysets && (!theImp.LoadKeyset((dir / "misc_data/face.kset").c_str()) ||
@@ -69,38 +60,37 @@ class EmergencySave : public ::testing::TestWithParam<int> {
         }
         ::close(ready[1]);
         char byte = 0;
-        Outcome o;
         if (::read(ready[0], &byte, 1) == 1)
             ::kill(pid, sig);
         ::close(ready[0]);
         int status = 0;
         ::waitpid(pid, &status, 0);
-        o.exited = WIFEXITED(status);
-        if (o.exited)
+        Outcome o;
+        if (WIFEXITED(status))
             o.status = WEXITSTATUS(status);
         if (WIFSIGNALED(status))
             o.signal = WTERMSIG(status);
         o.err = ReadFile(errPath);
         return o;
     }
-
-    TempDir dir;
-    ScopedEnv project{"TESSEL_PROJECT", dir.path().c_str()};
+    std::vector<std::string> WorkFiles() const {
+        std::vector<std::string> names;
+        for (const auto& e : std::filesystem::directory_iterator(dir / "work"))
+            names.push_back(e.path().filename().string());
+        return names;
+    }
 };
 
 TEST_P(EmergencySave, WritesKeysetsAndTrackThatLoadBack) {
     const int sig = GetParam();
     const Outcome o = Crash(sig, true, true);
-    ASSERT_TRUE(o.exited) << "ended by signal " << o.signal;
+    EXPECT_EQ(o.signal, 0);
     EXPECT_EQ(o.status, 255);
     EXPECT_EQ(o.err, "EMERGENCY SAVE ON SIGNAL " + std::to_string(sig) + " ... Done.\n");
 
-    const std::string keysets = dir / "work/_m.keyset", track = dir / "work/_m.track";
-    ASSERT_TRUE(FileExists(keysets));
-    ASSERT_TRUE(FileExists(track));
     theImp.batchMode = 1;
-    ASSERT_EQ(theImp.LoadKeyset(keysets.c_str()), 1);
-    ASSERT_EQ(theImp.LoadTrack(track.c_str()), 1);
+    ASSERT_EQ(theImp.LoadKeyset((dir / "work/_m.keyset").c_str()), 1);
+    ASSERT_EQ(theImp.LoadTrack((dir / "work/_m.track").c_str()), 1);
     ASSERT_EQ(theImp.keysetCount, 2);
     EXPECT_STREQ(theImp.GetKeySet(1)->Name(), "the brow");
     EXPECT_EQ(theImp.GetKeyTrack(0)->events.Count(), 2);
@@ -111,40 +101,25 @@ TEST_P(EmergencySave, WritesKeysetsAndTrackThatLoadBack) {
 }
 
 // Segmentation violation, bad system call, termination, bus error, floating-point exception,
-// trap, abort, illegal instruction, and the two user signals (numbers 12 and 10).
+// trap, abort, illegal instruction, and the two user signals.
 INSTANTIATE_TEST_SUITE_P(Signals, EmergencySave,
                          ::testing::Values(SIGSEGV, SIGSYS, SIGTERM, SIGBUS, SIGFPE, SIGTRAP,
                                            SIGABRT, SIGILL, SIGUSR2, SIGUSR1),
                          [](const auto& info) { return std::string(sigabbrev_np(info.param)); });
 
-TEST_F(EmergencySave, WithoutASoundTheTrackIsNotSaved) {
-    const Outcome o = Crash(SIGTERM, true, false);
-    EXPECT_TRUE(o.exited);
-    EXPECT_EQ(o.status, 255);
-    EXPECT_TRUE(FileExists(dir / "work/_m.keyset"));
-    EXPECT_FALSE(FileExists(dir / "work/_m.track"));
-}
-
-TEST_F(EmergencySave, WithoutKeysetsNothingIsWrittenAndTheSignalTakesItsCourse) {
-    const Outcome o = Crash(SIGTERM, false, true);
-    EXPECT_FALSE(o.exited);
-    EXPECT_EQ(o.signal, SIGTERM);
+TEST_F(EmergencySave, WithoutKeysetsNothingIsSavedWithoutASoundNoTrack) {
+    Outcome o = Crash(SIGTERM, false, true);
+    EXPECT_EQ(o.signal, SIGTERM) << "the signal takes its course";
     EXPECT_EQ(o.err, "");
-    EXPECT_FALSE(FileExists(dir / "work/_m.keyset"));
-    EXPECT_FALSE(FileExists(dir / "work/_m.track"));
-}
+    EXPECT_THAT(WorkFiles(), ::testing::IsEmpty());
 
-TEST_F(EmergencySave, AnEarlierSaveIsReplacedWhole) {
     WriteFile(dir / "work/_m.keyset", std::string(100000, 'x'));
-    const Outcome o = Crash(SIGABRT, true, false);
+    o = Crash(SIGABRT, true, false);
     EXPECT_EQ(o.status, 255);
     const std::string saved = ReadFile(dir / "work/_m.keyset");
     EXPECT_EQ(saved.rfind("wire face.gltf 0\n\nbegin keyset mouth\n", 0), 0u) << saved;
-    EXPECT_EQ(saved.find('x'), std::string::npos);
-    std::vector<std::string> names;
-    for (const auto& e : std::filesystem::directory_iterator(dir / "work"))
-        names.push_back(e.path().filename().string());
-    EXPECT_THAT(names, ::testing::UnorderedElementsAre("_m.keyset")) << "no temporary file left";
+    EXPECT_EQ(saved.find('x'), std::string::npos) << "an earlier save is replaced whole";
+    EXPECT_THAT(WorkFiles(), ::testing::ElementsAre("_m.keyset")) << "no track, no temporary";
 }
 
 }  // namespace

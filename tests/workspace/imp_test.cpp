@@ -1,17 +1,17 @@
-// The workspace's small operations, the error log, the console window interface and saving
-// through a temporary file.
+// The workspace's small operations, the error log and its viewer, the console window
+// interface, saving through a temporary file, and apply inside the program.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <filesystem>
-#include <regex>
 
 #include "WorkspaceTestUtil.h"
+#include "model/KLEdlEvent.h"
 #include "model/KLKeySet.h"
 #include "model/KLKeyTrack.h"
 #include "scene/KLScene.h"
+#include "scene/KLWireSource.h"
 #include "toolkit/KLErrHandler.h"
 #include "workspace/ConsoleGhost.h"
 #include "workspace/Imp.h"
@@ -20,44 +20,18 @@
 using namespace wstest;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
+using ::testing::IsEmpty;
 
 namespace {
 
-class ImpTest : public ::testing::Test {
-  protected:
-    void SetUp() override {
-        ResetWorkspace();
-        ghost.calls.clear();
-    }
-    void TearDown() override { ResetWorkspace(); }
-    // Puts keysets of these names into the workspace, as a keyset load would.
-    void AddKeysets(const std::vector<std::string>& names) {
-        for (const std::string& n : names) {
-            const int i = theImp.keysetCount++;
-            theImp.keySets[i] = std::make_unique<KLKeySet>(n.c_str(), nullptr);
-            theImp.keyTracks[i] = std::make_unique<KLKeyTrack>(theImp.keySets[i].get());
-        }
-    }
-    TempDir dir;
-    RecordingGhost ghost;
-    GhostScope scope{&ghost};
-};
-
-TEST_F(ImpTest, FrameRateBelowOneSelectsThirty) {
-    for (int n : {0, -3}) {
-        theImp.SetFps(24);
-        theImp.SetFps(n);
-        EXPECT_EQ(theImp.fps, 30) << n;
-        EXPECT_EQ(CueTime::default_fps, 30) << n;
-    }
-    theImp.SetFps(25);
-    EXPECT_EQ(CueTime::default_fps, 25);
-    theImp.SetFps(30);
-}
+using ImpTest = ProjectTest;
 
 TEST_F(ImpTest, KeysetLookupsStayInBoundsAndFindTheFirstOfAName) {
-    AddKeysets({"a", "b", "b", "c", "d", "e", "f", "g", "h", "i"});
-    ASSERT_EQ(theImp.keysetCount, 10);
+    for (const char* n : {"a", "b", "b", "c", "d", "e", "f", "g", "h", "i"}) {
+        const int i = theImp.keysetCount++;
+        theImp.keySets[i] = std::make_unique<KLKeySet>(n, nullptr);
+        theImp.keyTracks[i] = std::make_unique<KLKeyTrack>(theImp.keySets[i].get());
+    }
     EXPECT_EQ(theImp.GetKeySet(10), nullptr);
     EXPECT_EQ(theImp.GetKeySet(-1), nullptr);
     EXPECT_EQ(theImp.GetKeyTrack(10), nullptr);
@@ -71,7 +45,6 @@ TEST_F(ImpTest, KeysetLookupsStayInBoundsAndFindTheFirstOfAName) {
 
 TEST_F(ImpTest, FeedbackOutOfRangeKeepsTheModeButRefreshesTheScene) {
     theImp.SetFeedback(1);
-    EXPECT_EQ(theImp.scene->Feedback(), 1);
     theImp.scene->Feedback(3);
     theImp.SetFeedback(7);
     EXPECT_EQ(theImp.feedback, 1);
@@ -79,168 +52,159 @@ TEST_F(ImpTest, FeedbackOutOfRangeKeepsTheModeButRefreshesTheScene) {
     theImp.SetFeedback(2);
 }
 
-TEST_F(ImpTest, DurationAndOffsetsReachTheWindow) {
-    theImp.SetDuration(CueTime(0, 0, 3, 0, 0));
-    EXPECT_EQ(theImp.requestedDuration.Ticks(), 18000);
-    EXPECT_EQ(theImp.duration.Ticks(), 18000);
-    theImp.SetReferenceOffset(CueTime::FromTicks(600));
-    theImp.SetPlayblastOffset(CueTime::FromTicks(1200));
-    EXPECT_EQ(theImp.playblastOffset.Ticks(), 1200);
-    EXPECT_THAT(ghost.calls, ElementsAre("DisplayDuration(18000)", "DisplayReferenceOffset(600)"));
-}
-
 // --- error log
 
-class ErrorLogTest : public ImpTest {
-  protected:
-    std::string log = dir / "errlog.vx";
-};
-
-TEST_F(ErrorLogTest, HeaderIsFollowedByAnEmptyLine) {
-    WriteFile(log, "old text that must go\n");
-    theImp.SetErrorFilename(log.c_str());
-    const std::string text = ReadFile(log);
-    EXPECT_TRUE(std::regex_match(
-        text, std::regex("---------- Chirrup Error Log ---------- "
-                         "[A-Z][a-z]{2} [A-Z][a-z]{2} [ 0-9]\\d \\d\\d:\\d\\d:\\d\\d \\d{4}\n\n")))
-        << text;
-}
-
-TEST_F(ErrorLogTest, ReportsAtOrAboveTheOutputLevelAreAppendedAndRaiseTheFlag) {
+TEST_F(ImpTest, ReportsAtOrAboveTheOutputLevelAreLoggedAndRaiseTheFlag) {
+    const std::string log = dir / "errlog.vx";
     theImp.SetErrorFilename(log.c_str());
     const size_t header = ReadFile(log).size();
     KLInform("not logged at the default level\n");
     KLWarning("Audio file [x] does not exist.\n");
     KLError("second");
     EXPECT_EQ(ReadFile(log).substr(header), "Audio file [x] does not exist.\nsecond");
-    EXPECT_EQ(theImp.errorLog->handled, 2);
     EXPECT_THAT(ghost.calls, ElementsAre("ShowErrorFlag()", "ShowErrorFlag()"));
-
     KLErrHandler::outputLevel = KLErr::kStatus;
     KLStatus("shown when verbose\n");
     KLErrHandler::outputLevel = KLErrHandler::kDefaultOutputLevel;
     EXPECT_THAT(ReadFile(log), HasSubstr("shown when verbose\n"));
-}
 
-TEST_F(ErrorLogTest, UnwritableLogSendsEachMessageToTheErrorStream) {
     const std::string bad = dir / "missing-dir/errlog.vx";
     theImp.SetErrorFilename(bad.c_str());
-    testing::internal::CaptureStderr();
-    KLError("Audio file [a.aiff] does not exist.\n");
-    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+    EXPECT_EQ(StdErr([] { KLError("Audio file [a.aiff] does not exist.\n"); }),
               "ERROR: Unable to append to error log file, " + bad +
                   ".\nAudio file [a.aiff] does not exist.\n");
 }
 
-TEST_F(ErrorLogTest, ViewAppendsASeparatorOnlyAfterNewMessages) {
-    ScopedEnv viewer("TESSEL_USER_ERROR_READER", "true");
-    theImp.SetErrorFilename(log.c_str());
+TEST_F(ImpTest, ViewingAppendsASeparatorOnlyAfterNewMessages) {
+    const std::string log = dir / "errlog.vx", seen = dir / "seen";
     const std::string separator = "\n---------------------------------------\n\n";
+    std::optional<ScopedEnv> viewer;
+    viewer.emplace("TESSEL_USER_ERROR_READER", ("sh -c 'cp \"$0\" " + seen + "'").c_str());
+    theImp.SetErrorFilename(log.c_str());
     const size_t header = ReadFile(log).size();
     theImp.ViewErrorLog();
     EXPECT_EQ(ReadFile(log).size(), header) << "no messages yet: no separator";
     KLError("one\n");
     theImp.ViewErrorLog();
+    EXPECT_EQ(ReadFile(seen).substr(header), "one\n") << "the viewer gets the log";
     theImp.ViewErrorLog();
-    EXPECT_EQ(ReadFile(log).substr(header), "one\n" + separator);
     KLError("two\n");
-    theImp.ViewErrorLog();
-    EXPECT_EQ(ReadFile(log).substr(header), "one\n" + separator + "two\n" + separator);
-    EXPECT_EQ(ghost.Calls("ClearErrorFlag").size(), 4u);
-}
-
-TEST_F(ErrorLogTest, AViewerThatFailsIsReportedIntoTheLog) {
-    ScopedEnv viewer("TESSEL_USER_ERROR_READER", "false");
-    theImp.SetErrorFilename(log.c_str());
-    const size_t header = ReadFile(log).size();
+    viewer.reset();
+    viewer.emplace("TESSEL_USER_ERROR_READER", "false");
     theImp.ViewErrorLog();
     EXPECT_EQ(ReadFile(log).substr(header),
-              "Problem launching error log viewer.\n\n---------------------------------------\n\n");
-}
-
-TEST_F(ErrorLogTest, TheViewerGetsTheLogFileName) {
-    const std::string seen = dir / "seen";
-    const std::string command = "cp";
-    ScopedEnv viewer("TESSEL_USER_ERROR_READER", ("sh -c 'cp \"$0\" " + seen + "'").c_str());
-    theImp.SetErrorFilename(log.c_str());
-    KLError("for the viewer\n");
-    theImp.ViewErrorLog();
-    EXPECT_THAT(ReadFile(seen), HasSubstr("for the viewer\n"));
+              "one\n" + separator + "two\n" + "Problem launching error log viewer.\n" + separator);
+    EXPECT_EQ(ghost.Calls("ClearErrorFlag").size(), 4u);
 }
 
 // --- console window interface
 
-TEST(ConsoleGhostTest, InformAndConfirmWriteToTheErrorStream) {
-    ConsoleGhost& console = ConsoleGhost::Instance();
-    testing::internal::CaptureStderr();
-    console.Inform("Failed to open track file [t].", "Dismiss");
-    const int answer =
-        console.Confirm("Dag name [jaw] isn't unique, ignored.", "Continue", "Cancel");
-    EXPECT_EQ(testing::internal::GetCapturedStderr(),
-              "Failed to open track file [t].\n"
-              "Dag name [jaw] isn't unique, ignored.\nAssuming OK\n");
+TEST_F(ImpTest, TheConsoleAndBatchModeAnswerOnTheErrorStream) {
+    int answer = 0;
+    EXPECT_EQ(StdErr([&] {
+                  ConsoleGhost::Instance().Inform("Failed to open track file [t].", "Dismiss");
+                  answer = ConsoleGhost::Instance().Confirm("Dag [jaw]?", "Continue", "Cancel");
+              }),
+              "Failed to open track file [t].\nDag [jaw]?\nAssuming OK\n");
     EXPECT_EQ(answer, 1);
-}
-
-TEST(ConsoleGhostTest, BatchModeRoutesTheModelsQuestionsToTheConsole) {
-    RecordingGhost ghost;
-    GhostScope scope(&ghost);
     theImp.batchMode = 1;
-    testing::internal::CaptureStderr();
-    const int answer = theImp.Confirm("Could not locate apply dag [x].", "Continue", "Cancel");
-    theImp.batchMode = 0;
-    EXPECT_EQ(testing::internal::GetCapturedStderr(),
-              "Could not locate apply dag [x].\nAssuming OK\n");
+    EXPECT_EQ(StdErr([&] { answer = theImp.Confirm("Could not locate [x].", "Go", "Stop"); }),
+              "Could not locate [x].\nAssuming OK\n");
     EXPECT_EQ(answer, 1);
-    EXPECT_TRUE(ghost.calls.empty());
+    EXPECT_THAT(ghost.calls, IsEmpty());
+    theImp.batchMode = 0;
     theImp.Inform("asked interactively", "OK");
     EXPECT_THAT(ghost.calls, ElementsAre("Inform(asked interactively|OK)"));
 }
 
 // --- saving through a temporary file
 
-std::vector<std::string> Entries(const std::string& dir) {
-    std::vector<std::string> names;
-    for (const auto& e : std::filesystem::directory_iterator(dir))
-        names.push_back(e.path().filename().string());
-    std::sort(names.begin(), names.end());
-    return names;
-}
-
-TEST(SafeFileTest, CommitReplacesTheTargetAndLeavesNoTemporaryFile) {
-    TempDir dir;
-    WriteFile(dir / "a.track", "old\n");
-    ::chmod((dir / "a.track").c_str(), 0640);
+TEST_F(ImpTest, SafeFileReplacesOnCommitOnlyAndLeavesNoTemporaryFile) {
+    const std::string target = dir / "work/a.track";
+    WriteFile(target, "old\n");
+    ::chmod(target.c_str(), 0640);
     {
-        SafeFile file(dir / "a.track");
+        SafeFile abandoned(target);
+        abandoned.Stream() << "half written";
+    }
+    EXPECT_EQ(ReadFile(target), "old\n");
+    {
+        SafeFile file(target);
         ASSERT_TRUE(file.IsOpen());
         file.Stream() << "new\n";
-        EXPECT_EQ(ReadFile(dir / "a.track"), "old\n") << "nothing changes before Commit";
+        EXPECT_EQ(ReadFile(target), "old\n") << "nothing changes before Commit";
         EXPECT_TRUE(file.Commit());
     }
-    EXPECT_EQ(ReadFile(dir / "a.track"), "new\n");
-    EXPECT_THAT(Entries(dir.path()), ElementsAre("a.track"));
+    EXPECT_EQ(ReadFile(target), "new\n");
     struct stat st;
-    ASSERT_EQ(::stat((dir / "a.track").c_str(), &st), 0);
+    ASSERT_EQ(::stat(target.c_str(), &st), 0);
     EXPECT_EQ(st.st_mode & 0777, 0640u) << "the replaced file's permissions are kept";
-}
-
-TEST(SafeFileTest, AbandonedSaveLeavesTheTargetAlone) {
-    TempDir dir;
-    WriteFile(dir / "a.keyset", "precious\n");
-    {
-        SafeFile file(dir / "a.keyset");
-        file.Stream() << "half written";
-    }
-    EXPECT_EQ(ReadFile(dir / "a.keyset"), "precious\n");
-    EXPECT_THAT(Entries(dir.path()), ElementsAre("a.keyset"));
-}
-
-TEST(SafeFileTest, UncreatableFilesAreRefused) {
-    TempDir dir;
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(dir / "work"), {}), 1);
     EXPECT_FALSE(SafeFile(dir / "no-such-dir/a.keyset").IsOpen());
     EXPECT_FALSE(SafeFile(dir.path()).IsOpen()) << "a directory is not a file";
     EXPECT_FALSE(SafeFile("").IsOpen());
+}
+
+// --- apply: two keysets named "mouth", the first over the whole face, the second on "lip"
+
+class ApplyTest : public ProjectTest {
+  protected:
+    void SetUp() override {
+        ProjectTest::SetUp();
+        ASSERT_EQ(BatchLoadKeyset(Data("face.kset", std::string("wire face.gltf\n") + kMouth +
+                                                        "begin keyset other\n key rest 0\n"
+                                                        " key wide 20\nend\n"
+                                                        "begin keyset mouth lip\n key rest 0\n"
+                                                        " key wide 20\nend\n")),
+                  1);
+        theImp.SetDuration(CueTime(0, 0, 4, 0, 0));
+        ghost.calls.clear();
+        theImp.OpenApplyWire((dir / "wire/face.gltf").c_str());
+        theImp.applyEvent->OpenWire();
+        target = theImp.applyEvent->wire.get();
+        ASSERT_TRUE(target && target->Valid());
+    }
+    void Key(int keyset, double frame, int shape, float value) {
+        theImp.GetKeyTrack(keyset)->InsertKey(shape, CueTime::FromFrames(frame),
+                                              theImp.GetKeySet(keyset)->GetKeyShape(shape), 1,
+                                              value);
+    }
+    int Apply(const char* keyset, const char* dag, KLWireSource* to) {
+        return theImp.ApplyWire(to, keyset, dag, CueTime(), theImp.duration, CueTime());
+    }
+    KLWireSource* target = nullptr;
+};
+
+TEST_F(ApplyTest, TheApplyEventCoversTheWholeWorkspace) {
+    EXPECT_STREQ(theImp.applyEvent->WireFile(), "face.gltf") << "held below the wire directory";
+    EXPECT_EQ(theImp.applyEvent->sourceIn, CueTime());
+    EXPECT_EQ(theImp.applyEvent->sourceOut.Ticks(), 24000);
+    EXPECT_EQ(theImp.applyEvent->destIn, CueTime());
+    EXPECT_EQ(theImp.applyEvent->destOut.Ticks(), 24000);
+    EXPECT_THAT(ghost.calls, ElementsAre("UpdateApplyDialog(face.gltf)"));
+    theImp.OpenApplyWire("/elsewhere/b.gltf");
+    EXPECT_STREQ(theImp.applyEvent->WireFile(), "/elsewhere/b.gltf");
+}
+
+TEST_F(ApplyTest, EveryKeysetOfTheNameIsAppliedInSlotOrder) {
+    Key(0, 0, 0, 1.0f);
+    Key(0, 6, 2, 1.0f);  // first "mouth": wide, lip TX 5, jaw TY 2
+    Key(2, 6, 1, 0.5f);  // second "mouth": half of wide on lip only, lip TX 2.5
+    Key(1, 3, 1, 1.0f);
+    EXPECT_EQ(Apply("other", "head", target), 1);
+    EXPECT_EQ(Apply("nobody", "head", target), 0);
+    EXPECT_EQ(Apply("mouth", "head", nullptr), 0);
+    ghost.calls.clear();
+    EXPECT_EQ(Apply("mouth", "nothere", target), 0);
+    EXPECT_THAT(ghost.calls,
+                ElementsAre("Inform(Cannot find base dag [nothere] for apply ...|Dismiss)",
+                            "Inform(Cannot find base dag [nothere] for apply ...|Dismiss)"));
+    EXPECT_EQ(Apply("mouth", "head", target), 1);
+    EXPECT_EQ(KLWireSource::Active(), theImp.wireSource.get()) << "the workspace's scene again";
+    const std::string out = dir / "wire/out.gltf";
+    ASSERT_EQ(theImp.applyEvent->StoreWire(out.c_str()), 1);
+    EXPECT_NEAR(*EvalChannel(out, "jaw", 1, 6), 2.0, 1e-4) << "from the first keyset";
+    EXPECT_NEAR(*EvalChannel(out, "lip", 0, 6), 2.5, 1e-4) << "the second one wrote last";
 }
 
 }  // namespace

@@ -40,6 +40,12 @@ bool FileExists(const std::string& path) {
     return ::access(path.c_str(), F_OK) == 0;
 }
 
+std::string StdErr(const std::function<void()>& f) {
+    testing::internal::CaptureStderr();
+    f();
+    return testing::internal::GetCapturedStderr();
+}
+
 TempDir::TempDir() {
     std::string pattern = std::filesystem::temp_directory_path().string() + "/chirrup-ws-XXXXXX";
     std::vector<char> name(pattern.begin(), pattern.end());
@@ -130,84 +136,8 @@ std::vector<std::string> RecordingGhost::Calls(const std::string& prefix) const 
     return found;
 }
 
-int RecordingGhost::GetActiveKeyset() {
-    return activeKeyset;
-}
-void RecordingGhost::SetActiveKeyset(int index) {
-    calls.push_back(KLFmt("SetActiveKeyset(%d)", index));
-    activeKeyset = index;
-}
-void RecordingGhost::InitSound(CueSound* sound) {
-    calls.push_back(sound ? "InitSound(sound)" : "InitSound(null)");
-}
-void RecordingGhost::InitMarkTrack(KLMarkTrack* track) {
-    calls.push_back(track ? "InitMarkTrack(track)" : "InitMarkTrack(null)");
-}
-void RecordingGhost::CenterKeyView() {
-    calls.push_back("CenterKeyView()");
-}
-void RecordingGhost::CenterMixView() {
-    calls.push_back("CenterMixView()");
-}
-void RecordingGhost::ClearViews() {
-    calls.push_back("ClearViews()");
-}
-void RecordingGhost::ClearKeyTracks() {
-    calls.push_back("ClearKeyTracks()");
-}
-void RecordingGhost::ClearKeysets(int index) {
-    calls.push_back(KLFmt("ClearKeysets(%d)", index));
-}
-void RecordingGhost::InitKeyset(int index) {
-    calls.push_back(KLFmt("InitKeyset(%d)", index));
-}
-void RecordingGhost::ClearKeysetMenu() {
-    calls.push_back("ClearKeysetMenu()");
-}
-void RecordingGhost::DressKeysetMenu() {
-    calls.push_back("DressKeysetMenu()");
-}
-void RecordingGhost::ShowRecognizerGui(CueRecognizer*) {
-    calls.push_back("ShowRecognizerGui()");
-}
-void RecordingGhost::SetMenuStatus() {
-    calls.push_back("SetMenuStatus()");
-}
-void RecordingGhost::SetViewStatus() {
-    calls.push_back("SetViewStatus()");
-}
-void RecordingGhost::MakeKeysetImages() {
-    calls.push_back("MakeKeysetImages()");
-}
-int RecordingGhost::AdjustRelLoad(char**, char**, int*, int*, int*, int*) {
-    calls.push_back("AdjustRelLoad()");
-    return 0;
-}
-void RecordingGhost::DisplayDuration(CueTime duration) {
-    calls.push_back(KLFmt("DisplayDuration(%d)", duration.Ticks()));
-}
-void RecordingGhost::DisplayReferenceOffset(CueTime offset) {
-    calls.push_back(KLFmt("DisplayReferenceOffset(%d)", offset.Ticks()));
-}
-void RecordingGhost::Inform(const char* message, const char* button) {
-    calls.push_back(KLFmt("Inform(%s|%s)", message, button));
-}
-int RecordingGhost::Confirm(const char* message, const char* yes, const char* no) {
-    calls.push_back(KLFmt("Confirm(%s|%s|%s)", message, yes, no));
-    return confirmAnswer;
-}
 void RecordingGhost::UpdateApplyDialog(KLEdlEvent* event) {
-    calls.push_back(
-        KLFmt("UpdateApplyDialog(%s)", event && event->WireFile() ? event->WireFile() : ""));
-}
-void RecordingGhost::ResetFileManagers() {
-    calls.push_back("ResetFileManagers()");
-}
-void RecordingGhost::ShowErrorFlag() {
-    calls.push_back("ShowErrorFlag()");
-}
-void RecordingGhost::ClearErrorFlag() {
-    calls.push_back("ClearErrorFlag()");
+    Log(KLFmt("UpdateApplyDialog(%s)", event && event->WireFile() ? event->WireFile() : ""));
 }
 
 GhostScope::GhostScope(Ghost* ghost) : saved_(theGhost) {
@@ -233,102 +163,61 @@ void ResetWorkspace() {
     theImp.wireFrame = 0.0f;
 }
 
-namespace {
+void ProjectTest::SetUp() {
+    for (const char* sub : {"misc_data", "wire", "work"})
+        std::filesystem::create_directory(dir / sub);
+    WriteFile(dir / "wire/face.gltf", FaceSceneJson());
+    ResetWorkspace();
+    ghost.calls.clear();
+}
 
-std::string base64(const std::vector<uint8_t>& bytes) {
-    static const char* digits = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
-    std::string text;
-    for (size_t i = 0; i < bytes.size(); i += 3) {
-        uint32_t v = uint32_t(bytes[i]) << 16;
-        if (i + 1 < bytes.size())
-            v |= uint32_t(bytes[i + 1]) << 8;
-        if (i + 2 < bytes.size())
-            v |= bytes[i + 2];
-        text += digits[(v >> 18) & 63];
-        text += digits[(v >> 12) & 63];
-        text += i + 1 < bytes.size() ? digits[(v >> 6) & 63] : '=';
-        text += i + 2 < bytes.size() ? digits[v & 63] : '=';
-    }
+std::string ProjectTest::Data(const std::string& name, const std::string& text) const {
+    WriteFile(dir / ("misc_data/" + name), text);
+    return dir / ("misc_data/" + name);
+}
+
+std::string ProjectTest::Fill(std::string text) const {
+    for (const auto& [key, value] : {std::pair<std::string, std::string>{"%W", dir / "wire"},
+                                     {"%M", dir / "misc_data"},
+                                     {"%D", dir.path()}})
+        for (size_t at = text.find(key); at != std::string::npos;
+             at = text.find(key, at + value.size()))
+            text.replace(at, 2, value);
     return text;
 }
 
-void put_float(std::vector<uint8_t>& bytes, float f) {
-    uint8_t raw[4];
-    std::memcpy(raw, &f, 4);  // glTF buffers are little-endian, as is this machine
-    bytes.insert(bytes.end(), raw, raw + 4);
+int ProjectTest::BatchLoadKeyset(const std::string& path) {
+    theImp.batchMode = 1;
+    int loaded = 0;
+    StdErr([&] { loaded = theImp.LoadKeyset(path.c_str()); });
+    theImp.batchMode = 0;
+    return loaded;
 }
 
-}  // namespace
-
-std::string MakeSceneJson(const std::vector<NodeSpec>& nodes, const std::string& sceneName) {
-    std::vector<uint8_t> buffer;
-    std::ostringstream views, accessors, channels, samplers, nodeText;
-    int accessor = 0;
-    for (size_t i = 0; i < nodes.size(); ++i) {
-        const NodeSpec& n = nodes[i];
-        std::string children;
-        for (size_t j = 0; j < nodes.size(); ++j)
-            if (nodes[j].parent == int(i))
-                children += (children.empty() ? "" : ",") + std::to_string(j);
-        nodeText << (i ? "," : "") << "{\"name\":\"" << n.name << "\"";
-        if (!children.empty())
-            nodeText << ",\"children\":[" << children << "]";
-        nodeText << "}";
-        if (n.times.empty())
-            continue;
-        // Input accessor (times), then output accessor (translations).
-        const size_t inOffset = buffer.size();
-        float lo = n.times.front(), hi = n.times.front();
-        for (float t : n.times) {
-            put_float(buffer, t);
-            lo = std::min(lo, t), hi = std::max(hi, t);
-        }
-        const size_t outOffset = buffer.size();
-        for (const auto& v : n.translations)
-            for (float c : v)
-                put_float(buffer, c);
-        const int count = int(n.times.size());
-        views << (accessor ? "," : "") << "{\"buffer\":0,\"byteOffset\":" << inOffset
-              << ",\"byteLength\":" << count * 4 << "},{\"buffer\":0,\"byteOffset\":" << outOffset
-              << ",\"byteLength\":" << count * 12 << "}";
-        accessors << (accessor ? "," : "") << "{\"bufferView\":" << accessor
-                  << ",\"componentType\":5126,\"count\":" << count
-                  << ",\"type\":\"SCALAR\",\"min\":[" << lo << "],\"max\":[" << hi
-                  << "]},{\"bufferView\":" << accessor + 1
-                  << ",\"componentType\":5126,\"count\":" << count << ",\"type\":\"VEC3\"}";
-        const int sampler = accessor / 2;
-        samplers << (sampler ? "," : "") << "{\"input\":" << accessor
-                 << ",\"output\":" << accessor + 1 << ",\"interpolation\":\"LINEAR\"}";
-        channels << (sampler ? "," : "") << "{\"sampler\":" << sampler
-                 << ",\"target\":{\"node\":" << i << ",\"path\":\"translation\"}}";
-        accessor += 2;
-    }
-    std::string roots;
-    for (size_t i = 0; i < nodes.size(); ++i)
-        if (nodes[i].parent < 0)
-            roots += (roots.empty() ? "" : ",") + std::to_string(i);
-    std::ostringstream json;
-    json << "{\"asset\":{\"version\":\"2.0\"},\"scene\":0,\"scenes\":[{";
-    if (!sceneName.empty())
-        json << "\"name\":\"" << sceneName << "\",";
-    json << "\"nodes\":[" << roots << "]}],\"nodes\":[" << nodeText.str() << "]";
-    if (accessor) {
-        json << ",\"buffers\":[{\"byteLength\":" << buffer.size()
-             << ",\"uri\":\"data:application/octet-stream;base64," << base64(buffer) << "\"}]"
-             << ",\"bufferViews\":[" << views.str() << "],\"accessors\":[" << accessors.str()
-             << "],\"animations\":[{\"channels\":[" << channels.str() << "],\"samplers\":["
-             << samplers.str() << "]}]";
-    }
-    json << "}\n";
-    return json.str();
-}
-
-std::string FaceSceneJson(const std::string& sceneName) {
-    const std::vector<float> keys{0.0f, 10.0f / 30, 20.0f / 30};
-    return MakeSceneJson({{"head", -1, {}, {}},
-                          {"jaw", 0, keys, {{0, 0, 0}, {0, 1, 0}, {0, 2, 0}}},
-                          {"lip", 0, keys, {{0, 0, 0}, {0, 0, 3}, {5, 0, 3}}}},
-                         sceneName);
+std::string FaceSceneJson() {
+    // The buffer: jaw key times (3 floats) and translations (9), then the same for lip.
+    return R"({"asset": {"version": "2.0"}, "scene": 0, "scenes": [{"name": "face", "nodes": [0]}],
+ "nodes": [{"name": "head", "children": [1, 2]}, {"name": "jaw"}, {"name": "lip"}],
+ "buffers": [{"byteLength": 96, "uri": "data:application/octet-stream;base64,)"
+           "AAAAAKuqqj6rqio/AAAAAAAAAAAAAAAAAAAAAAAAgD8AAAAAAAAAAAAAAEAAAAAAAAAAAKuqqj6rqio/"
+           "AAAAAAAAAAAAAAAAAAAAAAAAAAAAAEBAAACgQAAAAAAAAEBA"
+           R"("}],
+ "bufferViews": [{"buffer": 0, "byteOffset": 0, "byteLength": 12},
+  {"buffer": 0, "byteOffset": 12, "byteLength": 36},
+  {"buffer": 0, "byteOffset": 48, "byteLength": 12},
+  {"buffer": 0, "byteOffset": 60, "byteLength": 36}],
+ "accessors": [
+  {"bufferView": 0, "componentType": 5126, "count": 3, "type": "SCALAR",
+   "min": [0], "max": [0.666667]},
+  {"bufferView": 1, "componentType": 5126, "count": 3, "type": "VEC3"},
+  {"bufferView": 2, "componentType": 5126, "count": 3, "type": "SCALAR",
+   "min": [0], "max": [0.666667]},
+  {"bufferView": 3, "componentType": 5126, "count": 3, "type": "VEC3"}],
+ "animations": [{"channels": [{"sampler": 0, "target": {"node": 1, "path": "translation"}},
+                              {"sampler": 1, "target": {"node": 2, "path": "translation"}}],
+                 "samplers": [{"input": 0, "output": 1, "interpolation": "LINEAR"},
+                              {"input": 2, "output": 3, "interpolation": "LINEAR"}]}]}
+)";
 }
 
 void WriteAiff(const std::string& path, int frames, int rate) {
