@@ -447,6 +447,17 @@ std::vector<double> SceneWriter::sampleTimes(int node, int first, bool frames) c
     return out;
 }
 
+void SceneWriter::evaluateAxes(int node, int first, const std::vector<double>& times,
+                               std::vector<double> axis[3]) const {
+    for (int a = 0; a < 3; ++a) {
+        if (const ChannelCurve* curve = doc_.Curve(node, first + a)) {
+            curve->EvaluateSorted(times, &axis[a]);
+        } else {
+            axis[a].assign(times.size(), doc_.RestValue(node, first + a));
+        }
+    }
+}
+
 void SceneWriter::sampleTranslationScale(int node, int first, const char* path) {
     const ChannelCurve* c[3];
     const ChannelCurve* lead = nullptr;
@@ -498,13 +509,7 @@ void SceneWriter::sampleTranslationScale(int node, int first, const char* path) 
         s.interpolation = "CUBICSPLINE";
         std::vector<double> times = sampleTimes(node, first, false);
         std::vector<double> axis[3];
-        for (int a = 0; a < 3; ++a) {
-            if (c[a]) {
-                c[a]->EvaluateSorted(times, &axis[a]);
-            } else {
-                axis[a].assign(times.size(), doc_.RestValue(node, first + a));
-            }
-        }
+        evaluateAxes(node, first, times, axis);
         for (size_t k = 0; k < times.size(); ++k) {
             s.times.push_back(float(times[k]));
             for (int part = 0; part < 3; ++part) {
@@ -518,13 +523,7 @@ void SceneWriter::sampleTranslationScale(int node, int first, const char* path) 
     } else {
         std::vector<double> times = sampleTimes(node, first, true);
         std::vector<double> axis[3];
-        for (int a = 0; a < 3; ++a) {
-            if (c[a]) {
-                c[a]->EvaluateSorted(times, &axis[a]);
-            } else {
-                axis[a].assign(times.size(), doc_.RestValue(node, first + a));
-            }
-        }
+        evaluateAxes(node, first, times, axis);
         for (size_t k = 0; k < times.size(); ++k) {
             s.times.push_back(float(times[k]));
             for (int a = 0; a < 3; ++a) {
@@ -549,13 +548,7 @@ void SceneWriter::sampleRotation(int node) {
     EulerRotation::Quat previous = {0, 0, 0, 1};
     std::vector<double> times = sampleTimes(node, 3, true);
     std::vector<double> axis[3];
-    for (int a = 0; a < 3; ++a) {
-        if (c[a]) {
-            c[a]->EvaluateSorted(times, &axis[a]);
-        } else {
-            axis[a].assign(times.size(), doc_.RestValue(node, 3 + a));
-        }
-    }
+    evaluateAxes(node, 3, times, axis);
     s.times.reserve(times.size());
     s.values.reserve(times.size() * 4);
     for (size_t k = 0; k < times.size(); ++k) {

@@ -38,6 +38,10 @@ class SceneWriter {
     // Every key time of the node's three channels from `firstChannel` and, with `frames`,
     // every whole frame between the first and last key, ascending, one per distinct float.
     std::vector<double> sampleTimes(int node, int firstChannel, bool frames) const;
+    // The three channels from `first` at `times` (seconds, ascending); an unanimated axis
+    // holds its rest value.
+    void evaluateAxes(int node, int first, const std::vector<double>& times,
+                      std::vector<double> axis[3]) const;
     int appendAccessor(const std::vector<float>& data, int type, size_t count, bool withMinMax);
     void makeNodeTrs(int node);
 
