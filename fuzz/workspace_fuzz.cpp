@@ -20,13 +20,20 @@ bool demoLoaded = false;
 
 void setUp() {
     static bool done = false;
-    if (done) return;
+    if (done)
+        return;
     done = true;
     char dir[] = "/tmp/chirrup-fuzz-XXXXXX";
-    if (!mkdtemp(dir) || chdir(dir) != 0) std::abort();
+    if (!mkdtemp(dir) || chdir(dir) != 0)
+        std::abort();
     const std::string demo = std::string(CHIRRUP_SOURCE_DIR) + "/resources/demo/";
-    for (const char* f : {"face.glb", "dialogue.aiff", "demo.kset"})
-        if (symlink((demo + f).c_str(), f) != 0) std::abort();
+    for (const char* f : {"face.glb", "demo.kset"})
+        if (symlink((demo + f).c_str(), f) != 0)
+            std::abort();
+    const std::string tiny =
+        std::string(CHIRRUP_SOURCE_DIR) + "/fuzz/corpus/sound_fuzz/tiny16.aiff";
+    if (symlink(tiny.c_str(), "dialogue.aiff") != 0)
+        std::abort();
     unsetenv("TESSEL_PROJECT");
     theImp.batchMode = 1;
     theGhost = &ConsoleGhost::Instance();
@@ -36,7 +43,8 @@ void setUp() {
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     setUp();
-    if (size == 0) return 0;
+    if (size == 0)
+        return 0;
     const bool track = data[0] & 1;
     {
         std::ofstream out("input", std::ios::binary | std::ios::trunc);
@@ -47,10 +55,12 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
             theImp.LoadKeyset("demo.kset");
             demoLoaded = theImp.keysetCount == 3;
         }
-        if (theImp.LoadTrack("input")) theImp.SaveTrack("saved.track");
+        if (theImp.LoadTrack("input"))
+            theImp.SaveTrack("saved.track");
     } else {
         demoLoaded = false;
-        if (theImp.LoadKeyset("input") && theImp.keysetCount > 0) theImp.SaveKeyset("saved.kset");
+        if (theImp.LoadKeyset("input") && theImp.keysetCount > 0)
+            theImp.SaveKeyset("saved.kset");
     }
     return 0;
 }
