@@ -2,78 +2,78 @@
 
 #include <gtest/gtest.h>
 
-#include <sstream>
+#include <algorithm>
+#include <cmath>
 
 #include "model/ModelTestUtil.h"
-#include "toolkit/CueRecognizer.h"
+#include "scene/KLWire.h"
 #include "toolkit/KLFilePath.h"
 #include "toolkit/KLImageSGI.h"
 
 namespace {
 
-class NamedRecognizer : public CueRecognizer {
-  public:
-    explicit NamedRecognizer(const char* name) : CueRecognizer(name) {}
-    bool Recognize(const CueSound&) override { return false; }
-    CueRecognizer* Clone() const override { return new NamedRecognizer(Name()); }
-};
-
-class KLKeySetTest : public ::testing::Test {
-  protected:
-    void SetUp() override {
-        const auto* info = ::testing::UnitTest::GetInstance()->current_test_info();
-        dir = std::make_unique<TempDir>(std::string("keyset_") + info->name());
-        imp.pixDir = dir->Path();
-    }
-    // A picture file of w x h pixels in the picture directory.
-    void MakePicture(const std::string& name, int w = 32, int h = 24) {
-        KLImageSGI picture(w, h);
-        ASSERT_TRUE(picture.Store(dir->File(name).c_str()));
-    }
-    static std::string Written(KLKeySet& set) {
-        std::ostringstream out;
-        set.Write(out);
-        return out.str();
-    }
-
-    RecordingImp imp;
-    std::unique_ptr<TempDir> dir;
-};
-
-TEST_F(KLKeySetTest, ConstructorsAndMessages) {
-    KLKeySet one("mouth", "face.gltf");
-    EXPECT_EQ(one.kind, 1);
-    EXPECT_EQ(*one.sourceFile, "face.gltf");
-    EXPECT_FALSE(one.nodeName);
-    EXPECT_EQ(one.imagesOnFile, 1);
-    EXPECT_EQ(one.imagesChanged, 0);
-    EXPECT_EQ(one.defaultIndex, 0);
-    EXPECT_EQ(one.GetDefaultKeyShape(), nullptr) << "no key shapes yet";
-
-    KLKeySet two("brow", "browNode", 4, -1.5f, 2.5f);
-    EXPECT_EQ(two.kind, 2);
-    EXPECT_FALSE(two.sourceFile);
-    EXPECT_EQ(*two.nodeName, "browNode");
-    EXPECT_EQ(two.channelIndex, 4);
-    EXPECT_EQ(two.lowValue, -1.5f);
-    EXPECT_EQ(two.highValue, 2.5f);
-
+TEST(KLKeyChannel, SetGetAndDump) {
     CerrCapture err;
-    KLKeySet unnamed(nullptr, "x");
-    KLKeySet unnamed2(nullptr, "n", 0, 0, 0);
-    KLKey key(1.0f, nullptr, nullptr);
+    KLKeyChannel c("jaw", KLKeyChannel::kRX, 2);
+    c.Set(-1, 1.0f);  // out of range: ignored, not counted, silent
+    c.Set(2, 1.0f);
+    for (float v : {2.5f, 3.5f, 3.5f})
+        c.Set(1, v);
+    EXPECT_EQ(c.count, 3) << "every set in range counts";
+    EXPECT_EQ(c.Get(1), 3.5f);
+    EXPECT_EQ(c.Get(2), -10000.0f);
+    EXPECT_EQ(c.Get(-1), -10000.0f);
+    c.Dump();  // the count exceeds the size: only existing slots are printed
     EXPECT_EQ(err.Text(),
-              "KLKeySet::KLKeySet() no keyset name given\n"
-              "KLKeySet::KLKeySet() no keyset name given\nKLKey::KLKey() name is 0\n");
+              "KLKeyChannel::Get() out of range\nKLKeyChannel::Get() out of range\n"
+              "    Idx 0 value 0\n    Idx 1 value 3.5\n");
 }
 
-TEST_F(KLKeySetTest, LookupsAreExactAndFirstWins) {
-    KLKeySet set("mouth", nullptr);
-    std::istringstream in("key rest 0\nkey ah 12\nkey ah 20\nkey oo 12\nend\n");
-    set.Read(in);
+// Constant unless every slot was set (by count) and the values differ exactly.
+struct ConstantCase {
+    const char* name;
+    int size;
+    std::vector<std::pair<int, float>> sets;
+    int constant;
+};
+class KLKeyChannelConstant : public ::testing::TestWithParam<ConstantCase> {};
+TEST_P(KLKeyChannelConstant, Rule) {
+    KLKeyChannel c("a", 0, GetParam().size);
+    for (const auto& [i, v] : GetParam().sets)
+        c.Set(i, v);
+    EXPECT_EQ(c.Constant(), GetParam().constant);
+}
+INSTANTIATE_TEST_SUITE_P(
+    Cases, KLKeyChannelConstant,
+    ::testing::Values(ConstantCase{"NothingSet", 3, {}, 1},
+                      ConstantCase{"PartlySet", 3, {{0, 1.0f}, {2, 5.0f}}, 1},
+                      ConstantCase{"AllEqual", 3, {{0, 0.25f}, {1, 0.25f}, {2, 0.25f}}, 1},
+                      ConstantCase{"LastUlpDiffers",
+                                   3,
+                                   {{0, 1.0f}, {1, 1.0f}, {2, std::nextafter(1.0f, 2.0f)}},
+                                   0},
+                      // count matches size, slot 1 never set: its zero differs
+                      ConstantCase{"OneSlotSetTwice", 2, {{0, 3.0f}, {0, 4.0f}}, 0},
+                      ConstantCase{"ThreeSetsOnTwoSlots", 2, {{0, 1.0f}, {1, 2.0f}, {1, 2.0f}}, 1},
+                      ConstantCase{"NoValues", -5, {}, 1}),
+    [](const auto& p) { return std::string(p.param.name); });
+
+class KLKeySetTest : public ModelTest {
+  protected:
+    KLKeySetTest() { imp.pixDir = dir; }
+    void MakePicture(const std::string& name) {
+        ASSERT_TRUE(KLImageSGI(32, 24).Store(File(name).c_str()));
+    }
+    bool OnFile(const std::string& name) { return KLFilePath::Exists(File(name).c_str()); }
+    KLKeySet set{"mouth", nullptr};
+};
+
+// Shape lookups are exact and the first of equal frames or names wins; channels added later
+// are found first.
+TEST_F(KLKeySetTest, Lookups) {
+    ReadText(set, "key rest 0\nkey ah 12\nkey ah 20\nkey oo 12\nend\n");
     ASSERT_EQ(set.keyShapeCount, 4);
-    for (int i = 0; i < 4; ++i)
-        EXPECT_EQ(set.keyShapes[i]->index, i);
+    EXPECT_EQ(set.keyShapes[3]->index, 3);
     EXPECT_EQ(set.GetKeyShapeIdx(12.0f), 1);
     EXPECT_EQ(set.GetKeyShapeIdx(12.5f), -1);
     EXPECT_EQ(set.GetKeyShapeId("ah"), 1);
@@ -82,258 +82,224 @@ TEST_F(KLKeySetTest, LookupsAreExactAndFirstWins) {
     EXPECT_EQ(set.GetKeyShapeFrame(2), 20.0f);
     EXPECT_EQ(set.GetKeyShapeFrame(4), -1.0f);
     EXPECT_STREQ(set.GetKeyShapeName(3), "oo");
-    EXPECT_EQ(set.GetKeyShape(-1), nullptr);
-    EXPECT_EQ(set.GetKeyShape(4), nullptr);
-    EXPECT_EQ(set.GetKeyShapeName(4), nullptr);
-    EXPECT_EQ(set.GetKeyShapeImage(4), nullptr);
-    EXPECT_EQ(set.GetKeyShapeIcon(-1), nullptr);
-    EXPECT_EQ(set.GetDefaultKeyShape(), set.keyShapes[0].get());
-}
-
-TEST_F(KLKeySetTest, LaterAddedChannelsAndRecognizersAreFoundFirst) {
-    KLKeySet set("mouth", nullptr);
-    auto* first = new KLKeyChannel("jaw", 3, 2);
-    auto* second = new KLKeyChannel("jaw", 3, 2);
-    set.AddKeyChannel(first);
+    EXPECT_TRUE(!set.GetKeyShape(-1) && !set.GetKeyShapeName(4) && !set.GetKeyShapeImage(4));
+    auto* later = new KLKeyChannel("jaw", 3, 2);
+    set.AddKeyChannel(new KLKeyChannel("jaw", 3, 2));
     set.AddKeyChannel(new KLKeyChannel("jaw", 4, 2));
-    set.AddKeyChannel(second);
-    EXPECT_EQ(set.GetKeyChannel("jaw", 3), second);
-    EXPECT_EQ(set.GetKeyChannel("jaw", 5), nullptr);
-    EXPECT_EQ(set.GetKeyChannel("lip", 3), nullptr);
-
-    auto* r1 = new NamedRecognizer("phoneme");
-    auto* r2 = new NamedRecognizer("phoneme");
-    set.AddRecognizer(r1);
-    set.AddRecognizer(new NamedRecognizer("loudness"));
-    set.AddRecognizer(r2);
-    EXPECT_EQ(set.GetRecognizer("phoneme"), r2);
-    EXPECT_STREQ(set.GetRecognizer("loudness")->Name(), "loudness");
-    EXPECT_EQ(set.GetRecognizer("other"), nullptr);
+    set.AddKeyChannel(later);
+    EXPECT_EQ(set.GetKeyChannel("jaw", 3), later);
+    EXPECT_TRUE(!set.GetKeyChannel("jaw", 5) && !set.GetKeyChannel("lip", 3));
 }
 
-TEST_F(KLKeySetTest, ReadSkipsOtherShapesSilently) {
-    MakePicture("pic.sgi");
-    KLKeySet set("mouth", nullptr);
-    std::istringstream in(
-        "# a comment\n"
-        "key short\n"
-        "key a 1 pic.sgi extra\n"
-        "keys b 2\n"
-        "\n"
-        "key c 3\n"
-        "shape d 4\n"
-        "end here\n"
-        "key after 5\n");
+// Only "key" lines of three or four words count, silently; the block ends at "end"; a new
+// read replaces the key shapes. The default is the last shape at the rest frame (kind 1).
+TEST_F(KLKeySetTest, ReadStatementsAndDefault) {
     CerrCapture err;
+    imp.restFrame = 5.0f;
+    ReadText(set, "key x 1\nkey y 2\n");
+    std::istringstream in(
+        "# a comment\nkey short\nkey a 5 pic.sgi extra\nkeys b 5\n\nkey c 5\nshape d 4\n"
+        "key e 6\nkey f 5\nkey g 7\nend here\nkey after 5\n");
     set.Read(in);
     EXPECT_EQ(err.Text(), "");
-    ASSERT_EQ(set.keyShapeCount, 1);
+    ASSERT_EQ(set.keyShapeCount, 4);
     EXPECT_STREQ(set.GetKeyShapeName(0), "c");
+    EXPECT_EQ(set.GetDefaultKeyShape(), set.keyShapes[2].get());
     std::string rest;
     std::getline(in, rest);
     EXPECT_EQ(rest, "key after 5") << "the block stops at its end line";
-}
-
-TEST_F(KLKeySetTest, ReadReplacesShapesAndTracksPictures) {
-    MakePicture("open.sgi");
-    KLKeySet set("mouth", nullptr);
-    std::istringstream first("key x 1\nkey y 2\nend\n");
-    set.Read(first);
-    ASSERT_EQ(set.keyShapeCount, 2);
-
-    set.imagesOnFile = 1;
-    std::istringstream second("key open 7 open.sgi\nend\n");
-    set.Read(second);
-    ASSERT_EQ(set.keyShapeCount, 1);
-    EXPECT_STREQ(set.keyShapes[0]->ImageFile(), "open.sgi") << "kept as written";
-    EXPECT_EQ(set.imagesOnFile, 1);
-
-    std::istringstream third("key open 7 open.sgi\nkey gone 8 missing.sgi\nend\n");
-    set.Read(third);
-    ASSERT_EQ(set.keyShapeCount, 2);
-    EXPECT_EQ(set.keyShapes[1]->ImageFile(), nullptr);
-    EXPECT_EQ(set.imagesOnFile, 0);
-
-    std::istringstream empty("end\n");
-    set.Read(empty);
+    ReadText(set, "end\n");
     EXPECT_EQ(set.keyShapeCount, 0);
-    EXPECT_TRUE(set.keyShapes.empty());
-}
-
-TEST_F(KLKeySetTest, AbsolutePicturePathIsNotJoined) {
-    MakePicture("abs.sgi");
-    imp.pixDir = "/nonexistent-pix";
-    KLKeySet set("mouth", nullptr);
-    std::istringstream in("key a 1 " + dir->File("abs.sgi") + "\nkey b 2 abs.sgi\n");
-    set.Read(in);
-    ASSERT_EQ(set.keyShapeCount, 2);
-    EXPECT_STREQ(set.keyShapes[0]->ImageFile(), dir->File("abs.sgi").c_str());
-    EXPECT_EQ(set.keyShapes[1]->ImageFile(), nullptr);
-}
-
-// Kind 1 reads frames as whole numbers; kind 2 takes the number as written unless the
-// picture is readable.
-TEST_F(KLKeySetTest, FrameNumberAsymmetry) {
-    MakePicture("p.sgi");
-    const std::string block = "key a 12.75 p.sgi\nkey b 12.75 nope.sgi\nkey c 12.75\nend\n";
-    KLKeySet one("one", nullptr);
-    std::istringstream in1(block);
-    one.Read(in1);
-    KLKeySet two("two", "node", 0, 0, 1);
-    std::istringstream in2(block);
-    two.Read(in2);
-    ASSERT_EQ(one.keyShapeCount, 3);
-    ASSERT_EQ(two.keyShapeCount, 3);
-    EXPECT_EQ(one.keyShapes[0]->frame, 12.0f);
-    EXPECT_EQ(one.keyShapes[1]->frame, 12.0f);
-    EXPECT_EQ(one.keyShapes[2]->frame, 12.0f);
-    EXPECT_EQ(two.keyShapes[0]->frame, 12.0f);
-    EXPECT_EQ(two.keyShapes[1]->frame, 12.75f);
-    EXPECT_EQ(two.keyShapes[2]->frame, 12.75f);
-}
-
-TEST_F(KLKeySetTest, DefaultIndexIsLastShapeAtRestFrame) {
-    imp.restFrame = 5.0f;
-    KLKeySet one("one", nullptr);
-    std::istringstream in("key a 5\nkey b 6\nkey c 5\nkey d 7\n");
-    one.Read(in);
-    EXPECT_EQ(one.defaultIndex, 2);
-
+    EXPECT_EQ(set.GetDefaultKeyShape(), nullptr);
     KLKeySet two("two", "node", 0, 0, 1);
     two.defaultIndex = 1;
-    std::istringstream in2("key a 5\nkey b 6\nkey c 5\n");
-    two.Read(in2);
+    ReadText(two, "key a 5\nkey b 6\nkey c 5\n");
     EXPECT_EQ(two.defaultIndex, 1) << "kind 2 keeps its default";
 }
 
-TEST_F(KLKeySetTest, MalformedInputDoesNotCrash) {
-    KLKeySet set("mouth", nullptr);
-    std::string garbage(
-        "key \"\" \"\"\nkey \"\n\"\"\"\"\nkey x 99999999999999999999\nkey y -1e40\n"
-        "key z nan\n");
-    for (int i = 0; i < 256; ++i)
-        garbage.push_back(char(i * 37));
-    garbage += "\nkey w -7\n";
-    std::istringstream in(garbage);
-    set.Read(in);
-    ASSERT_GE(set.keyShapeCount, 4);
-    EXPECT_STREQ(set.GetKeyShapeName(0), "");
-    EXPECT_EQ(set.GetKeyShapeFrame(1), 2147483647.0f) << "saturated";
-    EXPECT_EQ(set.keyShapes.back()->frame, -7.0f);
-    std::ostringstream out;
-    set.Write(out);  // huge frames name their pictures without overflow
-    EXPECT_NE(out.str().find("key x 2147483648 mouth.2147483647.sgi"), std::string::npos)
-        << out.str();
-}
-
-TEST_F(KLKeySetTest, WriteKeepsPictureNamesWhenAllOnFile) {
-    MakePicture("a.sgi");
-    MakePicture("b c.sgi");
-    KLKeySet set("mouth", nullptr);
-    std::istringstream in("key a 0 a.sgi\n    key \"wide open\" 12 \"b c.sgi\"\nend\n");
-    set.Read(in);
-    ASSERT_EQ(set.imagesOnFile, 1);
-    EXPECT_EQ(Written(set), "    key a 0 a.sgi\n    key \"wide open\" 12 \"b c.sgi\"\n");
-    EXPECT_FALSE(KLFilePath::Exists(dir->File("mouth.0000.sgi").c_str())) << "nothing stored";
-}
-
-TEST_F(KLKeySetTest, WriteNamesGeneratedPicturesAndStoresThem) {
-    MakePicture("a.sgi");
-    KLKeySet set("mouth", nullptr);
-    std::istringstream in("key a 3 a.sgi\nkey \"b\tc\" 12\nend\n");
-    set.Read(in);
-    ASSERT_EQ(set.imagesOnFile, 0);
-    EXPECT_EQ(Written(set), "    key a 3 mouth.0003.sgi\n    key \"b\tc\" 12 mouth.0012.sgi\n");
-    // Key a had a readable picture: it is stored anew, at 160 x 121.
-    auto stored = KLImageSGI::Load(dir->File("mouth.0003.sgi").c_str());
-    ASSERT_TRUE(stored);
-    EXPECT_EQ(stored->Width(), 160);
-    EXPECT_EQ(stored->Height(), 121);
-    EXPECT_FALSE(KLFilePath::Exists(dir->File("mouth.0012.sgi").c_str())) << "no picture to store";
-}
-
-TEST_F(KLKeySetTest, KindTwoPicturesAreNumberedByIndex) {
-    KLKeySet set("brow", "node", 1, 0, 1);
-    std::istringstream in("key up 2.5\nkey down 7.25\n");
-    set.Read(in);
-    set.keyShapes[1]->SetImage(new KLImageSGI(10, 10));
-    set.imagesChanged = 1;
-    EXPECT_EQ(Written(set), "    key up 2.5 brow.0000.sgi\n    key down 7.25 brow.0001.sgi\n");
-    EXPECT_TRUE(KLFilePath::Exists(dir->File("brow.0001.sgi").c_str()));
-}
-
-// Everything Write produces reads back to equal key shapes.
-TEST_F(KLKeySetTest, RoundTrip) {
-    MakePicture("x y.sgi");
-    MakePicture("z.sgi");
-    KLKeySet set("mouth", nullptr);
-    std::istringstream in("key \"x y\" 1 \"x y.sgi\"\nkey \"tab\there\" 2 z.sgi\nkey q 30 z.sgi\n");
-    set.Read(in);
-    const std::string text = Written(set);
-    KLKeySet again("mouth", nullptr);
-    std::istringstream back(text);
-    again.Read(back);
-    ASSERT_EQ(again.keyShapeCount, set.keyShapeCount);
-    for (int i = 0; i < set.keyShapeCount; ++i) {
-        EXPECT_EQ(*again.keyShapes[i]->name, *set.keyShapes[i]->name);
-        EXPECT_EQ(again.keyShapes[i]->frame, set.keyShapes[i]->frame);
-        EXPECT_EQ(*again.keyShapes[i]->imageFile, *set.keyShapes[i]->imageFile);
+// A picture is kept when readable (relative names below the picture directory); frames are
+// whole numbers, except for kind 2 without a readable picture.
+TEST_F(KLKeySetTest, ReadPicturesAndFrames) {
+    MakePicture("p.sgi");
+    const std::string block =
+        "key a 12.75 p.sgi\nkey b 12.75 nope.sgi\nkey c 12.75 " + File("p.sgi") + "\nkey d 12.75\n";
+    KLKeySet two("two", "node", 0, 0, 1);
+    ReadText(set, block);
+    ReadText(two, block);
+    ASSERT_TRUE(set.keyShapeCount == 4 && two.keyShapeCount == 4);
+    EXPECT_STREQ(set.keyShapes[0]->ImageFile(), "p.sgi") << "kept as written";
+    EXPECT_EQ(set.keyShapes[1]->ImageFile(), nullptr);
+    EXPECT_EQ(set.keyShapes[2]->ImageFile(), File("p.sgi"));
+    EXPECT_EQ(set.imagesOnFile, 0) << "a picture missing";
+    for (size_t i = 0; i < 4; ++i) {
+        EXPECT_EQ(set.keyShapes[i]->frame, 12.0f) << i;
+        EXPECT_EQ(two.keyShapes[i]->frame, i == 0 || i == 2 ? 12.0f : 12.75f) << i;
     }
-    EXPECT_EQ(Written(again), text);
-}
-
-// A double quote in a name is written as it stands, so the name cannot be read back whole:
-// the tokenizer takes the quote as the start of a quoted stretch.
-TEST_F(KLKeySetTest, NameWithDoubleQuoteDoesNotRoundTrip) {
-    KLKeySet set("mouth", nullptr);
-    std::istringstream in("key ok 1\n");
-    set.Read(in);
-    set.keyShapes[0]->name = "say\"ah";
     set.imagesOnFile = 1;
-    set.keyShapes[0]->imageFile = "p.sgi";
-    EXPECT_EQ(Written(set), "    key say\"ah 1 p.sgi\n");
+    ReadText(set, "key a 1 p.sgi\n");
+    EXPECT_EQ(set.imagesOnFile, 1);
+    imp.pixDir = "/nonexistent-pix";
+    ReadText(set, "key a 1 p.sgi\n");
+    EXPECT_EQ(set.keyShapes[0]->ImageFile(), nullptr);
 }
 
-TEST_F(KLKeySetTest, KeyPictures) {
-    MakePicture("face.sgi", 64, 48);
-    KLKey none(1.0f, "none", nullptr);
-    EXPECT_EQ(none.GetImage(), nullptr);
-    EXPECT_EQ(none.GetIcon(), nullptr);
+// Frames beyond the integer range saturate, and name their pictures without overflow.
+TEST_F(KLKeySetTest, HugeFramesSaturate) {
+    ReadText(set, "key \"\" \"\"\nkey x 99999999999999999999\nkey y -1e40\nkey w -7\n");
+    ASSERT_EQ(set.keyShapeCount, 4);
+    EXPECT_STREQ(set.GetKeyShapeName(0), "");
+    EXPECT_EQ(set.GetKeyShapeFrame(1), 2147483647.0f);
+    EXPECT_EQ(set.GetKeyShapeFrame(3), -7.0f);
+    EXPECT_NE(Written(set).find("key x 2147483648 mouth.2147483647.sgi"), std::string::npos);
+}
 
-    KLKey missing(1.0f, "missing", "missing.sgi");
-    {
-        CerrCapture err;
-        EXPECT_EQ(missing.GetImage(), nullptr);
-        EXPECT_EQ(err.Text(), "KLKey::GetImage() failed to get image\n");
+// Each block read, written (pictures stored as needed), read back to equal key shapes and
+// written again to the same text.
+struct WriteCase {
+    const char *name, *input;
+    bool kindTwo;
+    int pictureSetOn;  // a picture set in the program on this key shape; -1: none
+    const char *golden, *stored, *notStored;  // picture files the write does and does not store
+};
+class KLKeySetWrite : public KLKeySetTest, public ::testing::WithParamInterface<WriteCase> {};
+
+TEST_P(KLKeySetWrite, GoldenAndReadBack) {
+    const WriteCase& c = GetParam();
+    for (const char* p : {"a.sgi", "b c.sgi"})
+        MakePicture(p);
+    KLKeySet two("brow", "node", 1, 0, 1);
+    KLKeySet& s = c.kindTwo ? two : set;
+    ReadText(s, c.input);
+    if (c.pictureSetOn >= 0) {
+        s.keyShapes[size_t(c.pictureSetOn)]->SetImage(new KLImageSGI(10, 10));
+        s.imagesChanged = 1;
     }
+    EXPECT_EQ(Written(s), c.golden);
+    if (c.stored) {
+        auto stored = KLImageSGI::Load(File(c.stored).c_str());
+        ASSERT_TRUE(stored);
+        EXPECT_TRUE(stored->Width() == 160 && stored->Height() == 121);
+    }
+    EXPECT_FALSE(OnFile(c.notStored));
+    if (c.kindTwo)
+        return;  // a stored picture makes kind 2 read its frame as a whole number
+    KLKeySet again("mouth", nullptr);
+    ReadText(again, c.golden);
+    ASSERT_EQ(again.keyShapeCount, s.keyShapeCount);
+    for (int i = 0; i < s.keyShapeCount; ++i) {
+        EXPECT_EQ(*again.keyShapes[i]->name, *s.keyShapes[i]->name);
+        EXPECT_EQ(again.keyShapes[i]->frame, s.keyShapes[i]->frame);
+    }
+    EXPECT_EQ(Written(again), c.golden);
+}
 
-    KLKey onFile(1.0f, "face", "face.sgi");
-    KLImageSGI* picture = onFile.GetImage();
-    ASSERT_NE(picture, nullptr);
-    EXPECT_EQ(picture->Width(), 160);
-    EXPECT_EQ(picture->Height(), 121);
-    EXPECT_EQ(onFile.GetImage(), picture) << "loaded once";
-    KLImageSGI* icon = onFile.GetIcon();
-    ASSERT_NE(icon, nullptr);
-    EXPECT_EQ(icon->Width(), 80);
-    EXPECT_EQ(icon->Height(), 60);
-    EXPECT_EQ(onFile.fileIcon.get(), icon);
+INSTANTIATE_TEST_SUITE_P(
+    Blocks, KLKeySetWrite,
+    ::testing::Values(WriteCase{"AllOnFileKeepNames",
+                                "key a 0 a.sgi\n  key \"wide open\" 12 \"b c.sgi\"\nend\n", false,
+                                -1, "    key a 0 a.sgi\n    key \"wide open\" 12 \"b c.sgi\"\n",
+                                nullptr, "mouth.0000.sgi"},
+                      WriteCase{"GeneratedNamesByFrame", "key a 3 a.sgi\nkey \"b\tc\" 12\n", false,
+                                -1,
+                                "    key a 3 mouth.0003.sgi\n    key \"b\tc\" 12 mouth.0012.sgi\n",
+                                "mouth.0003.sgi", "mouth.0012.sgi"},
+                      WriteCase{"KindTwoNamesByIndex", "key up 2.5\nkey down 7.25\n", true, 1,
+                                "    key up 2.5 brow.0000.sgi\n    key down 7.25 brow.0001.sgi\n",
+                                "brow.0001.sgi", "brow.0000.sgi"}),
+    [](const auto& p) { return std::string(p.param.name); });
 
-    // A picture set in the program takes precedence, with its own icon made at once.
-    onFile.SetImage(new KLImageSGI(300, 200));
-    ASSERT_NE(onFile.icon, nullptr);
-    EXPECT_EQ(onFile.GetImage(), onFile.image.get());
-    EXPECT_EQ(onFile.GetImage()->Width(), 160);
-    EXPECT_EQ(onFile.GetIcon(), onFile.icon.get());
-    EXPECT_EQ(onFile.icon->Height(), 60);
-    onFile.ClearImage();
-    EXPECT_EQ(onFile.GetImage(), picture) << "the file's picture stays";
-    EXPECT_EQ(onFile.GetIcon(), icon);
-
+// A picture is loaded once at 160 x 121 with an 80 x 60 icon; one set in the program takes
+// precedence with its own icon until cleared.
+TEST_F(KLKeySetTest, KeyPictures) {
+    MakePicture("face.sgi");
     CerrCapture err;
-    onFile.SetImage(nullptr);
-    EXPECT_EQ(err.Text(), "KLKey::SetImage() no image on input\n");
-    EXPECT_EQ(onFile.GetImage(), picture);
+    EXPECT_EQ(KLKey(1.0f, "missing", "missing.sgi").GetImage(), nullptr);
+    KLKey key(1.0f, "face", "face.sgi");
+    KLImageSGI* picture = key.GetImage();
+    ASSERT_TRUE(picture && picture->Width() == 160 && picture->Height() == 121);
+    EXPECT_EQ(key.GetImage(), picture) << "loaded once";
+    KLImageSGI* icon = key.GetIcon();
+    ASSERT_TRUE(icon && icon->Width() == 80 && icon->Height() == 60);
+    key.SetImage(new KLImageSGI(300, 200));
+    EXPECT_TRUE(key.GetImage() != picture && key.GetImage()->Width() == 160);
+    EXPECT_TRUE(key.GetIcon() != icon && key.GetIcon()->Height() == 60);
+    key.ClearImage();
+    EXPECT_TRUE(key.GetImage() == picture && key.GetIcon() == icon);
+    key.SetImage(nullptr);
+    EXPECT_EQ(err.Text(),
+              "KLKey::GetImage() failed to get image\nKLKey::SetImage() no image on input\n");
+}
+
+// Key shapes at frames 0, 15 and 30 (0, 0.5 and 1 second at 30 fps) of a scene with a
+// constant-translated "head" over "neck" over "jaw" (translation x 0, 1, 2, y and z constant;
+// rotation about X 0, 10, 20) and a constant-scaled "brow"; two top-level nodes "lip" ("lip",
+// "lip#2") with translation x changing; an unanimated "still".
+class ExtractTest : public ModelTest {
+  protected:
+    void SetUp() override {
+        SceneBuilder b;
+        const std::vector<float> at = {0.0f, 0.5f, 1.0f};
+        const int head = b.AddNode("head");
+        b.Animate(head, "translation", at, {1, 2, 3, 1, 2, 3, 1, 2, 3});
+        const int jaw = b.AddNode("jaw", b.AddNode("neck", head));
+        b.Animate(jaw, "translation", at, {0, 7, 0, 1, 7, 0, 2, 7, 0});
+        b.RotateX(jaw, at, {0, 10, 20});
+        b.Animate(b.AddNode("brow", head), "scale", at, {1, 1, 1, 1, 1, 1, 1, 1, 1});
+        b.Animate(b.AddNode("lip"), "translation", at, {0, 0, 0, 1, 0, 0, 0, 0, 0});
+        b.Animate(b.AddNode("lip"), "translation", at, {5, 0, 0, 5, 0, 0, 6, 0, 0});
+        b.AddNode("still");
+        Open(b, "face.gltf");
+        ReadText(set, "key rest 0\nkey open 15\nkey wide 30\n");
+    }
+    KLKeySet set{"mouth", "face.gltf"};
+};
+
+// Only channels that change are kept, each reported. Starting from a node rather than the
+// root walks that node and the siblings after it.
+TEST_F(ExtractTest, KeepsOnlyChannelsThatChange) {
+    ReportCapture reports;
+    set.ExtractKeys(root.get());
+    EXPECT_EQ(set.keyChannels.size(), 4u);
+    KLKeyChannel* tx = set.GetKeyChannel("jaw", KLKeyChannel::kTX);
+    ASSERT_NE(tx, nullptr);
+    EXPECT_EQ(tx->count, 3);
+    for (int i = 0; i < 3; ++i)
+        EXPECT_FLOAT_EQ(tx->Get(i), float(i));
+    EXPECT_NEAR(set.GetKeyChannel("jaw", KLKeyChannel::kRX)->Get(1), 10.0f, 1e-3);
+    EXPECT_NEAR(set.GetKeyChannel("jaw", KLKeyChannel::kRX)->Get(2), 20.0f, 1e-3);
+    std::vector<std::string> reported = reports.messages;
+    std::sort(reported.begin(), reported.end());
+    EXPECT_EQ(reported,
+              (std::vector<std::string>{"Key Channel [jaw.RX].\n", "Key Channel [jaw.TX].\n",
+                                        "Key Channel [lip#2.TX].\n", "Key Channel [lip.TX].\n"}));
+
+    std::unique_ptr<OrDagNode> head(root->childNode());
+    std::unique_ptr<OrDagNode> lip(head->nextNode());
+    ASSERT_STREQ(KLWire::NodeName(lip.get()), "lip");
+    KLKeySet fromLip("mouth", "face.gltf"), empty("none", nullptr);
+    ReadText(fromLip, "key rest 0\nkey open 15\nkey wide 30\n");
+    fromLip.ExtractKeys(lip.get());
+    EXPECT_EQ(fromLip.keyChannels.size(), 2u);
+    EXPECT_NE(fromLip.GetKeyChannel("lip#2", KLKeyChannel::kTX), nullptr);
+    empty.ExtractKeys(root.get());
+    set.ExtractKeys(nullptr);
+    EXPECT_TRUE(empty.keyChannels.empty());
+}
+
+// Two nodes sampled under one name share a channel; every slot is then set twice, so the
+// channel counts as incompletely filled and is dropped.
+TEST_F(ExtractTest, NodesSharingANameDropTheirChannel) {
+    std::unique_ptr<OrDagNode> lip(KLWire::FetchDagNode(root.get(), "lip"));
+    std::unique_ptr<OrDagNode> still(KLWire::FetchDagNode(root.get(), "still"));
+    for (int i = 0; i < set.keyShapeCount; ++i) {
+        const CueTime t(double(set.keyShapes[i]->frame), 0);
+        set.extract_dag(t, i, lip.get());
+        set.extract_dag(t, i, lip.get());
+    }
+    ASSERT_NE(set.GetKeyChannel("lip", KLKeyChannel::kTX), nullptr);
+    EXPECT_EQ(set.GetKeyChannel("lip", KLKeyChannel::kTX)->count, 6);
+    set.ExtractKeys(still.get());
+    EXPECT_TRUE(set.keyChannels.empty());
 }
 
 }  // namespace

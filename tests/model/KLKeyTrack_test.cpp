@@ -2,58 +2,45 @@
 
 #include <gtest/gtest.h>
 
-#include <sstream>
-
 #include "model/KLKeySet.h"
 #include "model/ModelTestUtil.h"
+#include "scene/KLChannel.h"
+#include "scene/KLGraphNode.h"
+#include "scene/KLKeyFrameList.h"
 
 namespace {
 
-CueTime Ticks(int32_t t) {
-    return CueTime::FromTicks(t);
-}
-
-class KLKeyTrackTest : public ::testing::Test {
+class KLKeyTrackTest : public ModelTest {
   protected:
-    KLKeyTrackTest() : set("mouth", nullptr), track(&set) {
-        std::istringstream in("key rest 0\nkey jaw 10\nkey \"wide open\" 20\nend\n");
-        set.Read(in);
-    }
-    void TearDown() override { CueTime::default_fps = 30; }
+    KLKeyTrackTest() { ReadText(set, "key rest 0\nkey jaw 10\nkey \"wide open\" 20\nend\n"); }
     KLKeyEvent* Add(int32_t ticks, int shape = 1, int smoothing = 1, float value = 1.0f) {
         return track.InsertKey(shape, Ticks(ticks), set.GetKeyShape(shape), smoothing, value);
     }
-    std::string Written() const {
-        std::ostringstream out;
-        track.Write(out);
-        return out.str();
+    // What bracket_keys_from_time gives without the table.
+    float SlowBracket(CueTime t, KLKeyEvent** prev, KLKeyEvent** next) {
+        std::vector<KLKeyTrack::FastEntry> saved;
+        saved.swap(track.fastTable);
+        const float f = track.bracket_keys_from_time(t, prev, next);
+        saved.swap(track.fastTable);
+        return f;
     }
 
-    RecordingImp imp;
-    KLKeySet set;
-    KLKeyTrack track;
+    KLKeySet set{"mouth", nullptr};
+    KLKeyTrack track{&set};
 };
 
-TEST_F(KLKeyTrackTest, InsertAndRemoveMarkModified) {
+// Inserting (even refused at an occupied instant) and removing mark the track modified.
+TEST_F(KLKeyTrackTest, InsertRemoveDurationClear) {
+    EXPECT_EQ(track.Duration(), CueTime());
     KLKeyEvent* a = Add(100, 1, 2, 0.5f);
     ASSERT_NE(a, nullptr);
-    EXPECT_EQ(a->shapeIndex, 1);
-    EXPECT_EQ(a->key, set.GetKeyShape(1));
-    EXPECT_EQ(a->smoothing, 2);
-    EXPECT_EQ(a->value, 0.5f);
-    EXPECT_EQ(imp.modified, 1);
     EXPECT_EQ(Add(100, 2), nullptr) << "occupied instant";
-    EXPECT_EQ(imp.modified, 2) << "a refused insert marks modified too";
     EXPECT_EQ(a->shapeIndex, 1);
+    EXPECT_EQ(imp.modified, 2);
     EXPECT_EQ(track.RemoveKey(Ticks(101)), 0);
     EXPECT_EQ(imp.modified, 2);
     EXPECT_EQ(track.RemoveKey(Ticks(100)), 1);
     EXPECT_EQ(imp.modified, 3);
-    EXPECT_TRUE(track.events.Empty());
-}
-
-TEST_F(KLKeyTrackTest, DurationAndClear) {
-    EXPECT_EQ(track.Duration(), CueTime());
     Add(300);
     Add(-50);
     EXPECT_EQ(track.Duration(), Ticks(300));
@@ -62,256 +49,217 @@ TEST_F(KLKeyTrackTest, DurationAndClear) {
     EXPECT_EQ(track.Duration(), CueTime());
 }
 
-TEST_F(KLKeyTrackTest, EmptyTrackLookups) {
-    for (int mode : {0, 1}) {
-        track.lookupMode = mode;
-        EXPECT_EQ(track.key_from_time(Ticks(0)), nullptr);
-    }
-    KLKeyEvent* prev = Add(0);  // any non-null value to see it overwritten
-    track.RemoveKey(Ticks(0));
-    KLKeyEvent* next = prev;
+// Previous: the last key at or before t. Nearest: the tie goes to the later key. Both on an
+// empty track and with an unknown mode: none. Bracket: the keys around t and t's position
+// between them in frames.
+TEST_F(KLKeyTrackTest, SlowLookups) {
+    EXPECT_EQ(track.key_from_time(Ticks(0)), nullptr);
+    KLKeyEvent *prev = nullptr, *next = nullptr;
     EXPECT_EQ(track.bracket_keys_from_time(Ticks(5), &prev, &next), 0.0f);
-    EXPECT_EQ(prev, nullptr);
-    EXPECT_EQ(next, nullptr);
-
-    track.PrepareFastAccess(Ticks(0), Ticks(6000));
-    EXPECT_EQ(track.fastCount, 30);
-    EXPECT_EQ(track.key_from_time_fast(Ticks(300)), nullptr);
-    EXPECT_EQ(track.bracket_keys_from_time(Ticks(300), &prev, &next), 0.0f);
-    EXPECT_EQ(prev, nullptr);
-    EXPECT_EQ(next, nullptr);
-}
-
-TEST_F(KLKeyTrackTest, PreviousLookup) {
-    KLKeyEvent* a = Add(100);
-    KLKeyEvent* b = Add(200);
-    EXPECT_EQ(track.key_from_time(Ticks(99)), nullptr);
-    EXPECT_EQ(track.key_from_time(Ticks(100)), a);
-    EXPECT_EQ(track.key_from_time(Ticks(199)), a);
-    EXPECT_EQ(track.key_from_time(Ticks(200)), b);
-    EXPECT_EQ(track.key_from_time(Ticks(1 << 30)), b);
-    track.lookupMode = 7;
-    EXPECT_EQ(track.key_from_time(Ticks(150)), nullptr);
-}
-
-TEST_F(KLKeyTrackTest, NearestLookupTieGoesToLaterKey) {
-    track.lookupMode = KLKeyTrack::kNearest;
+    EXPECT_TRUE(!prev && !next);
     KLKeyEvent* a = Add(100);
     KLKeyEvent* b = Add(110);
-    EXPECT_EQ(track.key_from_time(Ticks(50)), a) << "only a next key";
-    EXPECT_EQ(track.key_from_time(Ticks(104)), a);
-    EXPECT_EQ(track.key_from_time(Ticks(105)), b) << "exactly between";
-    EXPECT_EQ(track.key_from_time(Ticks(106)), b);
-    EXPECT_EQ(track.key_from_time(Ticks(5000)), b) << "only a previous key";
-}
-
-// The fast table breaks the tie the other way: at exactly one half the earlier key is nearest.
-TEST_F(KLKeyTrackTest, FastTableTieGoesToEarlierKey) {
+    const std::pair<int32_t, KLKeyEvent*> previous[] = {
+        {99, nullptr}, {100, a}, {109, a}, {110, b}, {1 << 30, b}};
+    for (const auto& [t, expected] : previous)
+        EXPECT_EQ(track.key_from_time(Ticks(t)), expected) << t;
     track.lookupMode = KLKeyTrack::kNearest;
-    KLKeyEvent* a = Add(0);
-    KLKeyEvent* b = Add(400);  // two frames at 30 fps
-    track.PrepareFastAccess(Ticks(0), Ticks(600));
-    ASSERT_EQ(track.fastCount, 3);
-    EXPECT_EQ(track.fastTable[1].fraction, 0.5f);
-    EXPECT_EQ(track.key_from_time(Ticks(200)), b);
-    EXPECT_EQ(track.key_from_time_fast(Ticks(200)), a);
-    EXPECT_EQ(track.key_from_time_fast(Ticks(399)), a) << "whole frame 1";
-    EXPECT_EQ(track.key_from_time_fast(Ticks(400)), b);
+    const std::pair<int32_t, KLKeyEvent*> nearest[] = {
+        {50, a}, {104, a}, {105, b}, {106, b}, {5000, b}};
+    for (const auto& [t, expected] : nearest)
+        EXPECT_EQ(track.key_from_time(Ticks(t)), expected) << t;
+    track.lookupMode = 7;
+    EXPECT_EQ(track.key_from_time(Ticks(105)), nullptr);
+    track.Clear();
+    a = Add(300);
+    b = Add(900);
+    const std::tuple<int32_t, float, KLKeyEvent*, KLKeyEvent*> brackets[] = {
+        {0, 1.0f, nullptr, a}, {300, 0.0f, a, b}, {450, 0.25f, a, b}, {901, 0.0f, b, nullptr}};
+    for (const auto& [t, fraction, p, n] : brackets) {
+        EXPECT_EQ(track.bracket_keys_from_time(Ticks(t), &prev, &next), fraction) << t;
+        EXPECT_TRUE(prev == p && next == n) << t;
+    }
 }
 
-TEST_F(KLKeyTrackTest, BracketWithoutTable) {
-    KLKeyEvent* a = Add(300);
-    KLKeyEvent* b = Add(900);
-    KLKeyEvent* prev;
-    KLKeyEvent* next;
-    EXPECT_EQ(track.bracket_keys_from_time(Ticks(0), &prev, &next), 1.0f);
-    EXPECT_EQ(prev, nullptr);
-    EXPECT_EQ(next, a);
-    EXPECT_EQ(track.bracket_keys_from_time(Ticks(450), &prev, &next), 0.25f);
-    EXPECT_EQ(prev, a);
-    EXPECT_EQ(next, b);
-    EXPECT_EQ(track.bracket_keys_from_time(Ticks(300), &prev, &next), 0.0f);
-    EXPECT_EQ(prev, a);
-    EXPECT_EQ(track.bracket_keys_from_time(Ticks(901), &prev, &next), 0.0f);
-    EXPECT_EQ(prev, b);
-    EXPECT_EQ(next, nullptr);
-}
-
-// The table holds, per whole frame, what the lookups give at that frame's start; times are
-// clamped to the table's range.
-TEST_F(KLKeyTrackTest, FastTableMatchesSlowLookups) {
+// The table holds, per whole frame, what the slow lookups give at that frame's start; times
+// are clamped to its range. At exactly one half the table's nearest key is the earlier one,
+// the slow lookup's the later one.
+class FastTable : public KLKeyTrackTest, public ::testing::WithParamInterface<int> {};
+TEST_P(FastTable, MatchesSlowLookups) {
+    CueTime::default_fps = GetParam();
+    const int32_t frame = 6000 / GetParam();
     track.lookupMode = KLKeyTrack::kNearest;
-    for (int32_t t : {-700, 130, 200, 455, 1000, 1010, 4321})
-        Add(t, t % 3 < 0 ? 0 : t % 3);
-    const CueTime start = Ticks(-1000), end = Ticks(5000);
-    track.PrepareFastAccess(start, end);
-    ASSERT_EQ(track.fastCount, 30);
-    EXPECT_EQ(track.fastStart, start);
-    EXPECT_EQ(track.fastEnd, end);
+    for (int32_t t : {-700, 130, 200, 455, 1000, 1010, 1500, 2500, 4321})
+        Add(t, t < 0 ? 0 : t % 3);
+    track.PrepareFastAccess(Ticks(-1000), Ticks(5000));
+    ASSERT_EQ(track.fastCount, 6000 / frame);
     for (int i = 0; i < track.fastCount; ++i) {
-        const CueTime t = Ticks(-1000 + 200 * i);
-        const KLKeyTrack::FastEntry& e = track.fastTable[i];
+        const CueTime t = Ticks(-1000 + frame * i);
+        const KLKeyTrack::FastEntry& e = track.fastTable[size_t(i)];
         KLKeyEvent *prev, *next;
-        const float fraction = [&] {
-            std::vector<KLKeyTrack::FastEntry> saved;
-            saved.swap(track.fastTable);
-            const float f = track.bracket_keys_from_time(t, &prev, &next);
-            saved.swap(track.fastTable);
-            return f;
-        }();
-        EXPECT_EQ(e.prev, prev) << i;
-        EXPECT_EQ(e.prev2, prev) << i;
-        EXPECT_EQ(e.next, next) << i;
+        const float fraction = SlowBracket(t, &prev, &next);
+        EXPECT_TRUE(e.prev == prev && e.prev2 == prev && e.next == next) << i;
         EXPECT_EQ(e.fraction, fraction) << i;
         EXPECT_EQ(e.nearest, fraction > 0.5f ? next : prev) << i;
-        EXPECT_EQ(track.key_from_time_fast(t + Ticks(199)), e.nearest);
-        EXPECT_EQ(track.bracket_keys_from_time(t + Ticks(150), &prev, &next), e.fraction);
-        EXPECT_EQ(prev, e.prev);
-        EXPECT_EQ(next, e.next);
+        EXPECT_EQ(track.key_from_time_fast(t + Ticks(frame - 1)), e.nearest) << i;
+        EXPECT_EQ(track.bracket_keys_from_time(t + Ticks(frame / 2), &prev, &next), e.fraction);
+        EXPECT_TRUE(prev == e.prev && next == e.next) << i;
     }
-    EXPECT_EQ(track.key_from_time_fast(Ticks(-50000)), track.fastTable[0].nearest);
-    EXPECT_EQ(track.key_from_time_fast(Ticks(50000)), track.fastTable[29].nearest);
+    const KLKeyTrack::FastEntry& half = track.fastTable[size_t(3000 / frame)];  // tick 2000
+    EXPECT_EQ(half.fraction, 0.5f);
+    EXPECT_EQ(track.fastTable[size_t(3000 / frame - 1)].fraction, GetParam() == 24 ? 0.25f : 0.3f);
+    EXPECT_EQ(track.key_from_time_fast(Ticks(2000)), half.prev);
+    EXPECT_EQ(track.key_from_time(Ticks(2000)), half.next);
+    EXPECT_EQ(track.key_from_time_fast(Ticks(-50000)), track.fastTable.front().nearest);
+    EXPECT_EQ(track.key_from_time_fast(Ticks(50000)), track.fastTable.back().nearest);
     track.lookupMode = KLKeyTrack::kPrevious;
-    EXPECT_EQ(track.key_from_time_fast(Ticks(50000)), track.fastTable[29].prev);
-
+    EXPECT_EQ(track.key_from_time_fast(Ticks(50000)), track.fastTable.back().prev);
     track.FinishFastAccess();
-    EXPECT_TRUE(track.fastTable.empty());
-    EXPECT_EQ(track.fastCount, 0);
+    EXPECT_TRUE(track.fastTable.empty() && track.fastCount == 0);
 }
+INSTANTIATE_TEST_SUITE_P(Fps, FastTable, ::testing::Values(24, 30),
+                         [](const auto& p) { return "fps" + std::to_string(p.param); });
 
 TEST_F(KLKeyTrackTest, FastTableRangeRules) {
     KLKeyEvent* a = Add(100);
     track.PrepareFastAccess(Ticks(600), Ticks(600));
-    EXPECT_TRUE(track.fastTable.empty()) << "an empty range builds nothing";
     track.PrepareFastAccess(Ticks(600), Ticks(0));
-    EXPECT_TRUE(track.fastTable.empty());
+    EXPECT_TRUE(track.fastTable.empty()) << "an empty range builds nothing";
     EXPECT_EQ(track.key_from_time_fast(Ticks(150)), a) << "without a table: slow lookup";
-
     track.PrepareFastAccess(Ticks(0), Ticks(399));  // 1.995 frames: one entry
     EXPECT_EQ(track.fastCount, 1);
     track.PrepareFastAccess(Ticks(0), Ticks(60000));
-    EXPECT_EQ(track.fastCount, 300);
     track.PrepareFastAccess(Ticks(5), Ticks(5));
     EXPECT_EQ(track.fastCount, 300) << "an empty range keeps the old table";
     track.RemoveKey(Ticks(100));
     EXPECT_TRUE(track.fastTable.empty()) << "removing a key drops the table";
+    track.PrepareFastAccess(Ticks(0), Ticks(6000));
+    EXPECT_EQ(track.key_from_time_fast(Ticks(300)), nullptr);
 }
 
-TEST_F(KLKeyTrackTest, FastTableAtTwentyFourFps) {
-    CueTime::default_fps = 24;
-    KLKeyEvent* a = Add(0);
-    KLKeyEvent* b = Add(1000);  // four frames of 250 ticks
-    track.PrepareFastAccess(Ticks(0), Ticks(1500));
-    ASSERT_EQ(track.fastCount, 6);
-    const float expected[] = {0.0f, 0.25f, 0.5f, 0.75f, 0.0f, 0.0f};
-    for (int i = 0; i < 6; ++i)
-        EXPECT_EQ(track.fastTable[i].fraction, expected[i]) << i;
-    EXPECT_EQ(track.fastTable[3].nearest, b);
-    EXPECT_EQ(track.fastTable[2].nearest, a);
-    EXPECT_EQ(track.fastTable[5].next, nullptr);
-}
-
-TEST_F(KLKeyTrackTest, SmoothingNames) {
-    EXPECT_EQ(SmoothFromString(nullptr), 1);
-    for (const char* s : {"Linear", "LINEAR", "linear"})
-        EXPECT_EQ(SmoothFromString(s), 0);
-    for (const char* s : {"Smooth", "SMOOTH", "smooth"})
-        EXPECT_EQ(SmoothFromString(s), 2);
-    for (const char* s : {"Ease", "EASE", "ease", "LiNeAr", "", "Unknown"}) {
-        EXPECT_EQ(SmoothFromString(s), 1) << s;
-    }
-    KLKeyEvent e(0, CueTime(), nullptr, 0, 1.0f);
-    EXPECT_STREQ(e.GetSmoothName(), "Linear");
-    e.SetSmoothName("smooth");
-    EXPECT_STREQ(e.GetSmoothName(), "Smooth");
-    e.SetSmoothName("whatever");
-    EXPECT_STREQ(e.GetSmoothName(), "Ease");
-    e.smoothing = 3;
-    EXPECT_STREQ(e.GetSmoothName(), "Unknown");
-    e.smoothing = -1;
-    EXPECT_STREQ(e.GetSmoothName(), "Unknown");
-}
-
-TEST_F(KLKeyTrackTest, ReadGolden) {
-    std::istringstream in(
-        "    event 12 jaw Ease 1\n"
-        "event 3.5 jaw\n"
-        "event 20 \"wide open\" Linear\n"
-        "event 30 rest smooth 0.25\n"
-        "event 40 jaw Smooth 2 extra\n"
-        "event 41\n"
-        "event 3.5 rest Linear 0\n"
-        "key 50 jaw\n"
-        "end\n"
-        "event 60 jaw\n");
-    track.Read(in, &set);
+// Events at fractional frames, smoothing names (exact spellings only), defaults Ease and 1;
+// other statements skipped; the first event at a time kept.
+TEST_F(KLKeyTrackTest, ReadWriteGolden) {
+    ReadText(track,
+             "    event 12 jaw Ease 1\nevent 3.5 jaw\nevent 20 \"wide open\" Linear\n"
+             "event 30 rest smooth 0.25\nevent 31 rest LiNeAr\nevent 32 rest LINEAR 2\n"
+             "event 40 jaw Smooth 2 extra\nevent 41\nevent 3.5 rest Linear 0\nkey 50 jaw\n"
+             "end\nevent 60 jaw\n",
+             &set);
     EXPECT_TRUE(imp.informs.empty());
-    EXPECT_EQ(Written(),
-              "    event 3.5 jaw Ease 1\n"
-              "    event 12 jaw Ease 1\n"
-              "    event 20 \"wide open\" Linear 1\n"
-              "    event 30 rest Smooth 0.25\n");
-    KLKeyEvent* first = track.events.Head();
-    EXPECT_EQ(first->time.Ticks(), 700);
-    EXPECT_EQ(first->key, set.GetKeyShape(1));
-    EXPECT_EQ(first->shapeIndex, 1);
-}
+    const std::string golden =
+        "    event 3.5 jaw Ease 1\n    event 12 jaw Ease 1\n"
+        "    event 20 \"wide open\" Linear 1\n    event 30 rest Smooth 0.25\n"
+        "    event 31 rest Ease 1\n    event 32 rest Linear 2\n";
+    EXPECT_EQ(Written(track), golden);
+    EXPECT_EQ(track.events.Head()->time.Ticks(), 700);
+    EXPECT_EQ(track.events.Head()->key, set.GetKeyShape(1));
 
-TEST_F(KLKeyTrackTest, ReadAtTwentyFourFps) {
     CueTime::default_fps = 24;
-    std::istringstream in("event 3.5 jaw\n");
-    track.Read(in, &set);
-    ASSERT_EQ(track.events.Count(), 1);
-    EXPECT_EQ(track.events.Head()->time.Ticks(), 875);
-    EXPECT_EQ(track.events.Head()->smoothing, 1);
-    EXPECT_EQ(track.events.Head()->value, 1.0f);
-    EXPECT_EQ(Written(), "    event 3.5 jaw Ease 1\n");
+    KLKeyTrack at24(&set);
+    ReadText(at24, "event 3.5 jaw\n", &set);
+    EXPECT_EQ(at24.events.Head()->time.Ticks(), 875);
+    EXPECT_EQ(Written(at24), "    event 3.5 jaw Ease 1\n");
 }
 
-TEST_F(KLKeyTrackTest, UnknownKeyShapeIsReportedAndSkipped) {
-    std::istringstream in(
-        "event 1 nose\nevent 2 jaw\nevent 3 \"wide\" Ease 1\nevent 4 x a b c d\n");
-    track.Read(in, &set);
+TEST_F(KLKeyTrackTest, RoundTripKeepsEveryField) {
+    Add(0, 0, 0, 0.0f);
+    Add(7, 2, 1, -0.5f);
+    Add(1234567, 1, 2, 1.75f);
+    Add(-200, 2, 2, 100.0f);
+    KLKeyTrack again(&set);
+    ReadText(again, Written(track), &set);
+    ASSERT_EQ(again.events.Count(), track.events.Count());
+    auto it = again.events.begin();
+    for (const KLKeyEvent* e : track.events) {
+        EXPECT_TRUE((*it)->time == e->time && (*it)->key == e->key);
+        EXPECT_TRUE((*it)->smoothing == e->smoothing && (*it)->value == e->value);
+        ++it;
+    }
+}
+
+// A key shape missing from the keyset is reported and its line skipped; times beyond the
+// tick range are clamped.
+TEST_F(KLKeyTrackTest, UnknownKeyShapeAndClampedTimes) {
+    ReadText(track,
+             "event 1 nose\nevent 2 jaw\nevent 3 \"wide\" Ease 1\nevent 4 x a b c d\n"
+             "event 1e38 jaw\nevent -1e38 jaw\n",
+             &set);
     ASSERT_EQ(imp.informs.size(), 3u);
     EXPECT_EQ(imp.informs[0].message, "Failed to find keyshape [nose] in keyset [mouth].");
     EXPECT_EQ(imp.informs[0].first, "Dismiss");
     EXPECT_EQ(imp.informs[1].message, "Failed to find keyshape [wide] in keyset [mouth].");
     EXPECT_EQ(imp.informs[2].message, "Failed to find keyshape [x] in keyset [mouth].");
-    EXPECT_EQ(track.events.Count(), 1);
-}
-
-TEST_F(KLKeyTrackTest, RoundTrip) {
-    Add(0, 0, 0, 0.0f);
-    Add(7, 2, 1, -0.5f);
-    Add(1234567, 1, 2, 1.75f);
-    Add(-200, 2, 2, 100.0f);
-    const std::string text = Written();
-    KLKeyTrack again(&set);
-    std::istringstream in(text);
-    again.Read(in, &set);
-    ASSERT_EQ(again.events.Count(), track.events.Count());
-    auto it = again.events.begin();
-    for (const KLKeyEvent* e : track.events) {
-        EXPECT_EQ((*it)->time, e->time);
-        EXPECT_EQ((*it)->key, e->key);
-        EXPECT_EQ((*it)->smoothing, e->smoothing);
-        EXPECT_EQ((*it)->value, e->value);
-        ++it;
-    }
-}
-
-TEST_F(KLKeyTrackTest, BadInputDoesNotCrash) {
-    std::string text = "event 1e38 jaw\nevent -1e38 jaw\nevent nan jaw\nevent \"\" \"\" \"\"\n";
-    text += "event 5 jaw Ease 1e39\nevent 9 \"\" \"\" \"\" \"\"\nevent";
-    for (int i = 1; i < 256; ++i)
-        text.push_back(char(i));
-    std::istringstream in(text);
-    track.Read(in, &set);
-    ASSERT_EQ(track.events.Count(), 4);
+    ASSERT_EQ(track.events.Count(), 3);
     EXPECT_EQ(track.events.Head()->time.Ticks(), INT32_MIN);
     EXPECT_EQ(track.events.Tail()->time.Ticks(), INT32_MAX);
-    EXPECT_EQ(imp.informs.size(), 2u);
-    EXPECT_EQ(imp.informs[0].message, "Failed to find keyshape [] in keyset [mouth].");
+}
+
+// Kind 1 previews through a key-shape channel (shape values) and a value channel, registered
+// with the keyset's key frame list while the workspace prepares key frames; static mode shows
+// the rest pose.
+TEST_F(KLKeyTrackTest, PreviewKindOne) {
+    KLKeyFrameList list({0, 10, 20}, 0);
+    for (int i = 0; i < 3; ++i)
+        set.keyShapes[size_t(i)]->shapeValue = 7 + i;
+    Add(400, 1, 1, 0.5f);
+    Add(1200, 2, 0, 1.5f);
+    track.SetStatic();  // no channels yet: nothing to do
+    imp.prepare = 0;
+    track.PrepareKeyFrames(&list);
+    imp.prepare = 1;
+    track.PrepareKeyFrames(nullptr);  // no list
+    EXPECT_EQ(track.shapeChannel, nullptr);
+    set.keyFrameList = &list;
+    track.PrepareKeyFrames(nullptr);
+    ASSERT_TRUE(track.shapeChannel && track.weightChannel);
+    ASSERT_EQ(list.KeyChannels().size(), 1u);
+    EXPECT_EQ(list.KeyChannels()[0], std::make_pair(track.shapeChannel, track.weightChannel));
+    KLChannel *shape = track.shapeChannel, *weight = track.weightChannel;
+    EXPECT_FLOAT_EQ(shape->Evaluate(Ticks(400)), 8.0f);
+    EXPECT_FLOAT_EQ(shape->Evaluate(Ticks(1200)), 9.0f);
+    EXPECT_FLOAT_EQ(weight->Evaluate(Ticks(400)), 0.5f);
+    EXPECT_FLOAT_EQ(weight->Evaluate(Ticks(1200)), 1.5f);
+    set.defaultIndex = 2;
+    track.SetStatic();
+    EXPECT_FLOAT_EQ(shape->Evaluate(Ticks(400)), 9.0f);
+    EXPECT_FLOAT_EQ(weight->Evaluate(Ticks(400)), 1.0f);
+    track.ClearStatic();
+    EXPECT_FLOAT_EQ(shape->Evaluate(Ticks(400)), 8.0f);
+    track.RemoveKey(Ticks(400));
+    track.PrepareKeyFrames(nullptr);
+    EXPECT_EQ(track.shapeChannel, shape) << "the same channels, refilled";
+    EXPECT_TRUE(list.KeyChannels().size() == 1 && shape->KeyCount() == 1 &&
+                weight->KeyCount() == 1);
+    track.Clear();
+    EXPECT_TRUE(!track.shapeChannel && !track.weightChannel && list.KeyChannels().empty());
+}
+
+// Kind 2 previews through its control node's channel, borrowed, not owned; static mode shows
+// the low value.
+TEST_F(KLKeyTrackTest, PreviewKindTwo) {
+    KLKeySet brow("brow", "browNode", 5, -0.5f, 2.0f);
+    KLKeyTrack t(&brow);
+    t.InsertKey(0, Ticks(200), nullptr, 1, 0.25f);
+    t.InsertKey(0, Ticks(600), nullptr, 1, 0.75f);
+    t.PrepareKeyFrames(nullptr);
+    EXPECT_EQ(t.weightChannel, nullptr) << "no value channel yet";
+    CerrCapture err;
+    t.SetControlGraphNode(nullptr);
+    EXPECT_EQ(err.Text(), "NO GRAPH NODE\n");
+    KLGraphNode node("browNode");
+    t.SetControlGraphNode(&node);
+    ASSERT_NE(node.Transform()->Channel(5), nullptr);
+    EXPECT_EQ(t.weightChannel, node.Transform()->Channel(5));
+    t.PrepareKeyFrames(nullptr);
+    EXPECT_TRUE(t.shapeChannel == nullptr && t.weightChannel->KeyCount() == 2);
+    EXPECT_FLOAT_EQ(t.weightChannel->Evaluate(Ticks(600)), 0.75f);
+    t.SetStatic();
+    EXPECT_FLOAT_EQ(t.weightChannel->Evaluate(Ticks(600)), -0.5f);
+    t.ClearStatic();
+    EXPECT_FLOAT_EQ(t.weightChannel->Evaluate(Ticks(600)), 0.75f);
+    t.Clear();
+    EXPECT_TRUE(t.weightChannel == nullptr && node.Transform()->Channel(5) != nullptr);
 }
 
 }  // namespace

@@ -1,24 +1,27 @@
 #pragma once
 
+#include <gtest/gtest.h>
+
 #include <iostream>
+#include <memory>
 #include <sstream>
 #include <string>
-#include <utility>
 #include <vector>
 
+#include "scene/KLWireSource.h"
+#include "scene/OrDagNode.h"
+#include "toolkit/CueTime.h"
+#include "toolkit/KLErrHandler.h"
 #include "toolkit/KLStdImp.h"
 
-// A workspace for the data model's tests: directories and the rest frame as set by the test,
-// and a record of every modified mark, message and question. Confirm answers from `answers`
-// in turn (nonzero: the first button), then yes.
+// A workspace recording every modified mark, message and question; directories and the rest
+// frame as set by the test. Confirm answers from `answers` in turn (nonzero: the first
+// button), then yes.
 class RecordingImp : public KLStdImp {
   public:
     struct Dialog {
-        std::string message;
-        std::string first;
-        std::string second;  // empty for Inform
+        std::string message, first, second;  // second empty for Inform
     };
-
     const char* GetPixDirectory() override { return pixDir.empty() ? nullptr : pixDir.c_str(); }
     const char* GetWireDirectory() override { return wireDir.empty() ? nullptr : wireDir.c_str(); }
     float DefaultKeyFrame() override { return restFrame; }
@@ -29,18 +32,13 @@ class RecordingImp : public KLStdImp {
     }
     int Confirm(const char* message, const char* yes, const char* no) override {
         confirms.push_back({message, yes, no});
-        if (next < answers.size())
-            return answers[next++];
-        return 1;
+        return next < answers.size() ? answers[next++] : 1;
     }
 
-    std::string pixDir;
-    std::string wireDir;
+    std::string pixDir, wireDir;
     float restFrame = 0.0f;
-    int modified = 0;
-    int prepare = 1;
-    std::vector<Dialog> informs;
-    std::vector<Dialog> confirms;
+    int modified = 0, prepare = 1;
+    std::vector<Dialog> informs, confirms;
     std::vector<int> answers;
     size_t next = 0;
 };
@@ -57,50 +55,65 @@ class CerrCapture {
     std::streambuf* old_;
 };
 
-// A fresh directory under the build tree for one test, removed with everything in it.
-class TempDir {
+// Records every report of the toolkit's reporting functions while it lives.
+class ReportCapture : public KLErrHandler {
   public:
-    explicit TempDir(const std::string& name);
-    ~TempDir();
-    const std::string& Path() const { return path_; }
-    std::string File(const std::string& name) const { return path_ + "/" + name; }
-
-  private:
-    std::string path_;
+    void Handle(KLErr* e) override { messages.push_back(e->Message()); }
+    std::vector<std::string> messages;
 };
 
-// Writes `text` to `path`; false on failure.
-bool WriteTextFile(const std::string& path, const std::string& text);
-
-// A small glTF scene put together in a test: named nodes in a hierarchy and LINEAR
-// translation, rotation (Euler degrees about X) and scale animations, written as .gltf with
-// embedded buffers through tinygltf's writer.
+// A small glTF scene: named nodes in a hierarchy and LINEAR animations, written as .gltf with
+// embedded buffers.
 class SceneBuilder {
   public:
     SceneBuilder();
     ~SceneBuilder();
-    // Adds a node under `parent` (-1: a top-level node) and returns its index.
+    // Adds a node under `parent` (-1: top level) and returns its index.
     int AddNode(const std::string& name, int parent = -1);
-    // Keys at `seconds`; `xyz` holds three values per key.
-    void Translate(int node, const std::vector<float>& seconds, const std::vector<float>& xyz);
-    void Scale(int node, const std::vector<float>& seconds, const std::vector<float>& xyz);
+    // Keys at `seconds` of "translation" or "scale", three values per key.
+    void Animate(int node, const std::string& path, const std::vector<float>& seconds,
+                 const std::vector<float>& xyz);
     // Rotation about X by `degrees` at each key.
     void RotateX(int node, const std::vector<float>& seconds, const std::vector<float>& degrees);
     bool Write(const std::string& path) const;
 
   private:
     struct Impl;
-    Impl* impl_;
+    std::unique_ptr<Impl> impl_;
 };
 
-// Records every report of the toolkit's reporting functions while it lives.
-class ReportLog;
-class ReportCapture {
-  public:
-    ReportCapture();
-    ~ReportCapture();
-    const std::vector<std::string>& Messages() const;
+inline CueTime Ticks(int32_t t) {
+    return CueTime::FromTicks(t);
+}
+inline CueTime Frames(double f) {
+    return CueTime(f, 0);
+}
 
-  private:
-    ReportLog* log_;
+// What `x.Write(out)` writes, and `x.Read(in, extra...)` from `text`.
+template <class T>
+std::string Written(T& x) {
+    std::ostringstream out;
+    x.Write(out);
+    return out.str();
+}
+template <class T, class... Extra>
+void ReadText(T& x, const std::string& text, Extra... extra) {
+    std::istringstream in(text);
+    x.Read(in, extra...);
+}
+
+// The workspace record, a fresh directory named after the test (removed afterwards) and
+// optionally a scene opened from it; the frame rate goes back to 30 afterwards.
+class ModelTest : public ::testing::Test {
+  protected:
+    ModelTest();
+    ~ModelTest() override;
+    std::string File(const std::string& name) const { return dir + "/" + name; }
+    // Writes `scene` as File(name) and opens it as `wire` with its `root`.
+    void Open(const SceneBuilder& scene, const std::string& name);
+
+    RecordingImp imp;
+    std::string dir;
+    std::unique_ptr<KLWireSource> wire;
+    std::unique_ptr<OrDagNode> root;
 };
