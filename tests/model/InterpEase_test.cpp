@@ -12,6 +12,9 @@ struct Ease {
     float e2;
 };
 
+void PrintTo(const Ease& p, std::ostream* os) {
+    *os << "e1 " << p.e1 << " e2 " << p.e2;
+}
 class InterpEaseCurve : public ::testing::TestWithParam<Ease> {};
 
 // Exact ends; the pieces meet at e1 and e2 with the values e1/D and (2 e2 - e1)/D

@@ -12,7 +12,8 @@
 
 namespace {
 
-TEST(KLKeyChannel, SetGetAndDump) {
+// Channel names as reports show them; an unknown channel is reported and named TX.
+TEST(KLKeyChannel, SetGetNamesAndDump) {
     CerrCapture err;
     KLKeyChannel c("jaw", KLKeyChannel::kRX, 2);
     c.Set(-1, 1.0f);  // out of range: ignored, not counted, silent
@@ -24,9 +25,14 @@ TEST(KLKeyChannel, SetGetAndDump) {
     EXPECT_EQ(c.Get(2), -10000.0f);
     EXPECT_EQ(c.Get(-1), -10000.0f);
     c.Dump();  // the count exceeds the size: only existing slots are printed
-    EXPECT_EQ(err.Text(),
-              "KLKeyChannel::Get() out of range\nKLKeyChannel::Get() out of range\n"
-              "    Idx 0 value 0\n    Idx 1 value 3.5\n");
+    std::string names;
+    for (int i = 0; i <= 9; ++i)
+        names += KLKeyChannel("n", i, 1).GetChannelName();
+    EXPECT_EQ(names, "TXTYTZRXRYRZSXSYSZTX");
+    EXPECT_EQ(
+        err.Text(),
+        "KLKeyChannel::Get() out of range\nKLKeyChannel::Get() out of range\n"
+        "    Idx 0 value 0\n    Idx 1 value 3.5\nKLKeyChannel::GetChannelName() unknown channel\n");
 }
 
 // Constant unless every slot was set (by count) and the values differ exactly.
@@ -36,6 +42,9 @@ struct ConstantCase {
     std::vector<std::pair<int, float>> sets;
     int constant;
 };
+void PrintTo(const ConstantCase& c, std::ostream* os) {
+    *os << c.name;
+}
 class KLKeyChannelConstant : public ::testing::TestWithParam<ConstantCase> {};
 TEST_P(KLKeyChannelConstant, Rule) {
     KLKeyChannel c("a", 0, GetParam().size);
@@ -161,6 +170,9 @@ struct WriteCase {
     int pictureSetOn;  // a picture set in the program on this key shape; -1: none
     const char *golden, *stored, *notStored;  // picture files the write does and does not store
 };
+void PrintTo(const WriteCase& c, std::ostream* os) {
+    *os << c.name;
+}
 class KLKeySetWrite : public KLKeySetTest, public ::testing::WithParamInterface<WriteCase> {};
 
 TEST_P(KLKeySetWrite, GoldenAndReadBack) {
