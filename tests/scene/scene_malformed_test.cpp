@@ -22,8 +22,10 @@ std::string data_uri(const std::vector<float>& v) {
                                    unsigned(v.size() * 4));
 }
 
-// A valid scene: node "a" (child "b") whose translation is animated by two keys.
-std::string base_scene(const std::vector<float>& data = {0, 1, 0, 0, 0, 1, 1, 1}) {
+// A valid scene: node "a" (child "b") whose translation is animated by two keys; `data` holds
+// the two key times, then the two values.
+const std::vector<float> kData = {0, 1, 0, 0, 0, 1, 1, 1};
+std::string base_scene(const std::vector<float>& data = kData) {
     return R"({"asset":{"version":"2.0"},"scenes":[{"nodes":[0]}],"scene":0,)"
            R"("nodes":[{"name":"a","children":[1]},{"name":"b"}],)"
            R"("buffers":[{"byteLength":32,"uri":")" +
@@ -41,27 +43,16 @@ struct Case {
     const char* from;  // replaced once in the base scene
     const char* to;
     const char* reason;  // expected in the message
+    std::vector<float> data = kData;
 };
+const float kNaN = std::numeric_limits<float>::quiet_NaN();
 
-std::ostream& operator<<(std::ostream& out, const Case& c) {
-    return out << c.name;
-}
-
-std::string replaced(std::string s, const Case& c) {
-    size_t at = s.find(c.from);
-    EXPECT_NE(at, std::string::npos) << c.name;
-    if (at != std::string::npos) {
-        s.replace(at, std::strlen(c.from), c.to);
-    }
-    return s;
-}
 }  // namespace
 
 TEST(SceneMalformed, BaseSceneIsValid) {
-    std::string dir = MakeTempDir();
-    WriteFile(dir + "/ok.gltf", base_scene());
-    std::string error;
-    auto doc = SceneDocument::Load(dir + "/ok.gltf", &error);
+    std::string path = MakeTempDir() + "/ok.gltf", error;
+    WriteFile(path, base_scene());
+    auto doc = SceneDocument::Load(path, &error);
     ASSERT_TRUE(doc) << error;
     EXPECT_NEAR(doc->Curve(0, 2)->eval(15), 0.5, 1e-6);
 }
@@ -71,7 +62,10 @@ class MalformedScene : public ::testing::TestWithParam<Case> {};
 TEST_P(MalformedScene, GivesAnErrorNamingTheFile) {
     const Case& c = GetParam();
     std::string path = MakeTempDir() + "/broken.gltf";
-    WriteFile(path, replaced(base_scene(), c));
+    std::string text = base_scene(c.data);
+    size_t at = text.find(c.from);
+    ASSERT_NE(at, std::string::npos) << c.from;
+    WriteFile(path, text.replace(at, std::strlen(c.from), c.to));
     KLWireSource source(path.c_str());
     EXPECT_FALSE(source.Valid());
     EXPECT_NE(source.ErrorText().find("[" + path + "]"), std::string::npos) << source.ErrorText();
@@ -79,7 +73,7 @@ TEST_P(MalformedScene, GivesAnErrorNamingTheFile) {
     EXPECT_EQ(source.RootNode(), nullptr);
     EXPECT_EQ(KLWire::IsWireFile(path.c_str()), 0);
     // The same bytes from memory fail the same way.
-    std::string text = ReadFile(path), error;
+    std::string error;
     EXPECT_FALSE(SceneDocument::LoadFromMemory(reinterpret_cast<const unsigned char*>(text.data()),
                                                text.size(), "mem", &error));
     EXPECT_NE(error.find("[mem]"), std::string::npos);
@@ -112,59 +106,43 @@ INSTANTIATE_TEST_SUITE_P(
         Case{"WrongOutputType", R"("count":2,"type":"VEC3")", R"("count":6,"type":"SCALAR")",
              "wrong element type"},
         Case{"MissingExternalBuffer", R"("uri":"data:)", R"("uri":"missing.bin","x":")",
-             "missing.bin"}));
-
-TEST(SceneMalformed, NanAndUnorderedKeysAreErrors) {
-    std::string dir = MakeTempDir();
-    std::string error;
-    float nan = std::numeric_limits<float>::quiet_NaN();
-    WriteFile(dir + "/nan.gltf", base_scene({0, 1, 0, nan, 0, 1, 1, 1}));
-    EXPECT_FALSE(SceneDocument::Load(dir + "/nan.gltf", &error));
-    EXPECT_NE(error.find("NaN"), std::string::npos) << error;
-    EXPECT_NE(error.find("nan.gltf"), std::string::npos);
-    WriteFile(dir + "/far.gltf", base_scene({0, 1e30f, 0, 0, 0, 1, 1, 1}));
-    EXPECT_FALSE(SceneDocument::Load(dir + "/far.gltf", &error));
-    EXPECT_NE(error.find("100 hours"), std::string::npos) << error;
-    WriteFile(dir + "/order.gltf", base_scene({1, 0, 0, 0, 0, 1, 1, 1}));
-    EXPECT_FALSE(SceneDocument::Load(dir + "/order.gltf", &error));
-    EXPECT_NE(error.find("strictly increasing"), std::string::npos) << error;
-}
+             "missing.bin"},
+        Case{"NaNKeyValue", "", "", "NaN", {0, 1, 0, kNaN, 0, 1, 1, 1}},
+        Case{"KeyBeyond100Hours", "", "", "100 hours", {0, 1e30f, 0, 0, 0, 1, 1, 1}},
+        Case{"KeysOutOfOrder", "", "", "strictly increasing", {1, 0, 0, 0, 0, 1, 1, 1}},
+        Case{"EqualKeyTimes", "", "", "strictly increasing", {0, 0, 0, 0, 0, 1, 1, 1}}),
+    [](const ::testing::TestParamInfo<Case>& info) { return std::string(info.param.name); });
 
 TEST(SceneMalformed, MissingEmptyAndTruncatedFiles) {
-    std::string dir = MakeTempDir();
-    std::string error;
-    EXPECT_FALSE(SceneDocument::Load(dir + "/none.glb", &error));
-    EXPECT_NE(error.find("none.glb"), std::string::npos);
-    EXPECT_FALSE(SceneDocument::Load(dir, &error));
-    EXPECT_NE(error.find("not a regular file"), std::string::npos) << error;
+    std::string dir = MakeTempDir(), error;
+    auto refused = [&](const std::string& leaf, const std::string& bytes, const char* reason) {
+        if (!bytes.empty()) {
+            WriteFile(dir + "/" + leaf, bytes);
+        }
+        EXPECT_FALSE(SceneDocument::Load(dir + "/" + leaf, &error)) << leaf;
+        EXPECT_NE(error.find(leaf), std::string::npos) << error;
+        EXPECT_NE(error.find(reason), std::string::npos) << error;
+    };
+    refused("none.glb", "", "");
+    refused("", "", "not a regular file");  // the directory itself
     WriteFile(dir + "/empty.gltf", "");
-    EXPECT_FALSE(SceneDocument::Load(dir + "/empty.gltf", &error));
-    EXPECT_NE(error.find("empty"), std::string::npos);
+    refused("empty.gltf", "", "empty");
 
-    TestScene s = MakeFaceScene();
-    ASSERT_TRUE(s.Write(dir + "/face.glb", TestScene::kBinary));
+    ASSERT_TRUE(MakeFaceScene().Write(dir + "/face.glb", TestScene::kBinary));
     std::string glb = ReadFile(dir + "/face.glb");
     ASSERT_TRUE(SceneDocument::Load(dir + "/face.glb", &error)) << error;
     // Cut at every few bytes: never a crash, always a message naming the file.
-    for (size_t cut = 0; cut < glb.size(); cut += 97) {
-        WriteFile(dir + "/cut.glb", glb.substr(0, cut));
-        EXPECT_FALSE(SceneDocument::Load(dir + "/cut.glb", &error)) << cut;
-        EXPECT_NE(error.find("cut.glb"), std::string::npos);
+    for (size_t cut = 1; cut < glb.size(); cut += 97) {
+        refused("cut.glb", glb.substr(0, cut), "");
     }
-    // A length field larger than the file.
-    std::string big = glb;
-    big[8] = char(0xff);
-    big[9] = char(0xff);
-    WriteFile(dir + "/big.glb", big);
-    EXPECT_FALSE(SceneDocument::Load(dir + "/big.glb", &error));
-    EXPECT_NE(error.find("chunk lengths"), std::string::npos) << error;
+    std::string big = glb;  // a length field larger than the file
+    big[8] = big[9] = char(0xff);
+    refused("big.glb", big, "chunk lengths");
     // A few bytes after the JSON chunk: too short for a chunk header.
     uint32_t jsonLength = 0;
     std::memcpy(&jsonLength, glb.data() + 12, 4);
     std::string stub = glb.substr(0, 20 + jsonLength) + "BIN!";
     uint32_t total = uint32_t(stub.size());
     std::memcpy(&stub[8], &total, 4);
-    WriteFile(dir + "/stub.glb", stub);
-    EXPECT_FALSE(SceneDocument::Load(dir + "/stub.glb", &error));
-    EXPECT_NE(error.find("chunk lengths"), std::string::npos) << error;
+    refused("stub.glb", stub, "chunk lengths");
 }

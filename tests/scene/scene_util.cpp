@@ -3,10 +3,13 @@
 #include <stdlib.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdio>
-#include <cstring>
 #include <fstream>
-#include <sstream>
+#include <iterator>
+
+#include "scene/KLWire.h"
+#include "toolkit/CueTime.h"
 
 TestScene::TestScene() {
     model.asset.version = "2.0";
@@ -19,25 +22,25 @@ TestScene::TestScene() {
 
 int TestScene::AddFloats(const std::vector<float>& v, int type, bool withMinMax) {
     tinygltf::Buffer& b = model.buffers[0];
+    const unsigned char* p = reinterpret_cast<const unsigned char*>(v.data());
     tinygltf::BufferView view;
     view.buffer = 0;
     view.byteOffset = b.data.size();
     view.byteLength = v.size() * 4;
-    const unsigned char* p = reinterpret_cast<const unsigned char*>(v.data());
     b.data.insert(b.data.end(), p, p + v.size() * 4);
     model.bufferViews.push_back(view);
     tinygltf::Accessor a;
     a.bufferView = int(model.bufferViews.size()) - 1;
     a.componentType = TINYGLTF_COMPONENT_TYPE_FLOAT;
     a.type = type;
-    int width = type == TINYGLTF_TYPE_SCALAR ? 1 : (type == TINYGLTF_TYPE_VEC3 ? 3 : 4);
-    a.count = v.size() / size_t(width);
+    size_t width = type == TINYGLTF_TYPE_SCALAR ? 1 : (type == TINYGLTF_TYPE_VEC3 ? 3 : 4);
+    a.count = v.size() / width;
     if (withMinMax) {
-        a.minValues.assign(size_t(width), 1e30);
-        a.maxValues.assign(size_t(width), -1e30);
+        a.minValues.assign(width, 1e30);
+        a.maxValues.assign(width, -1e30);
         for (size_t i = 0; i < v.size(); ++i) {
-            a.minValues[i % size_t(width)] = std::min(a.minValues[i % size_t(width)], double(v[i]));
-            a.maxValues[i % size_t(width)] = std::max(a.maxValues[i % size_t(width)], double(v[i]));
+            a.minValues[i % width] = std::min(a.minValues[i % width], double(v[i]));
+            a.maxValues[i % width] = std::max(a.maxValues[i % width], double(v[i]));
         }
     }
     model.accessors.push_back(a);
@@ -128,10 +131,8 @@ TestScene MakeFaceScene() {
 }
 
 std::string MakeTempDir() {
-    std::string tmpl = std::string(CHIRRUP_BINARY_DIR) + "/scene-test-XXXXXX";
-    std::vector<char> name(tmpl.begin(), tmpl.end());
-    name.push_back('\0');
-    const char* made = mkdtemp(name.data());
+    std::string name = std::string(CHIRRUP_BINARY_DIR) + "/scene-test-XXXXXX";
+    const char* made = mkdtemp(&name[0]);
     return made ? std::string(made) : std::string("/tmp");
 }
 
@@ -142,26 +143,61 @@ void WriteFile(const std::string& path, const std::string& bytes) {
 
 std::string ReadFile(const std::string& path) {
     std::ifstream in(path, std::ios::binary);
-    std::stringstream ss;
-    ss << in.rdbuf();
-    return ss.str();
+    return std::string(std::istreambuf_iterator<char>(in), {});
 }
 
-int RunValidator(const std::string& path, std::string* output) {
+::testing::AssertionResult OpenScene::Open(const std::string& path) {
+    KLWire::Initialize();
+    CueTime::default_fps = 30;
+    root.reset();
+    source = std::make_unique<KLWireSource>(path.c_str());
+    if (!source->Valid()) {
+        return ::testing::AssertionFailure() << source->ErrorText();
+    }
+    root.reset(source->RootNode());
+    return ::testing::AssertionSuccess();
+}
+
+Node OpenScene::Fetch(const char* name, OrDagNode* below) const {
+    return Node(KLWire::FetchDagNode(below ? below : root.get(), name));
+}
+
+int StoreKeys(OrDagNode* node, int channel, const std::vector<StoreKey>& keys, bool clear) {
+    std::vector<CueTime> times;
+    std::vector<float> values;
+    std::vector<int> in, out;
+    for (const StoreKey& k : keys) {
+        times.push_back(CueTime::FromTicks(k.ticks));
+        values.push_back(k.value);
+        in.push_back(k.in);
+        out.push_back(k.out);
+    }
+    KLWire::alwaysClearChannel = clear ? 1 : 0;
+    return KLWire::StoreChannel(node, channel, int(keys.size()), times.data(), values.data(),
+                                in.data(), nullptr, out.data(), nullptr);
+}
+
+double OpenScene::Eval(const char* name, int channel, double frame) const {
+    Node n = Fetch(name);
+    OrChannel* c = n ? KLWire::FindChannel(n.get(), channel) : nullptr;
+    EXPECT_TRUE(c) << name << " channel " << channel;
+    return c ? c->eval(frame) : NAN;
+}
+
+void ExpectValidGltf(const std::string& path) {
     if (std::system("node --version >/dev/null 2>&1") != 0) {
-        return -1;
+        GTEST_SKIP() << "node is not installed";
     }
     std::string cmd =
         "node " + std::string(CHIRRUP_SOURCE_DIR) + "/tools/validate-gltf.mjs '" + path + "' 2>&1";
     FILE* p = popen(cmd.c_str(), "r");
-    if (!p) {
-        return -1;
-    }
+    ASSERT_TRUE(p) << cmd;
     char buf[512];
-    output->clear();
+    std::string report;
     while (fgets(buf, sizeof buf, p)) {
-        *output += buf;
+        report += buf;
     }
     int status = pclose(p);
-    return WIFEXITED(status) ? WEXITSTATUS(status) : 99;
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << report;
+    EXPECT_NE(report.find(": 0 errors"), std::string::npos) << report;
 }
