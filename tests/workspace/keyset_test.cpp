@@ -127,6 +127,14 @@ TEST_F(KeysetTest, AnEleventhKeysetIsRefusedAndItsBlockSkipped) {
     EXPECT_EQ(reports.text, "Maximum keysets [10] reached.Maximum keysets [10] reached.");
 }
 
+TEST_F(KeysetTest, AKeysetOverANodeNotInTheSceneHasNoChannels) {
+    Reports reports;
+    ASSERT_EQ(BatchLoadKeyset(Describe("begin keyset lips nosuch\n key a 0\n key b 10\nend\n")), 1);
+    EXPECT_THAT(reports.text,
+                HasSubstr("Keyset [lips]: no node [nosuch] in the wire file, no key channels.\n"));
+    EXPECT_TRUE(theImp.GetKeySet(0)->keyChannels.empty());
+}
+
 struct RecognizerFailure {
     const char* label;
     const char* blocks;
