@@ -73,16 +73,16 @@ std::unique_ptr<KLImageSGI> KLImageSGI::Load(const char* path, std::string* erro
             return nullptr;
         }
     }
-    const OIIO::ImageSpec& spec = in->spec();
-    const long long pixels = (long long)spec.width * spec.height;
-    if (spec.deep || spec.width < 1 || spec.height < 1 || spec.nchannels < 1 ||
+    const OIIO::ImageSpec& layout = in->spec();
+    const long long pixels = (long long)layout.width * layout.height;
+    if (layout.deep || layout.width < 1 || layout.height < 1 || layout.nchannels < 1 ||
         pixels > kMaxPixels) {
         set_error(error, prefix + "unsupported picture size or layout");
         return nullptr;
     }
 
     // Only the first four channels matter: grey, grey+alpha, RGB or RGBA.
-    const int nch = std::min(spec.nchannels, 4);
+    const int nch = std::min(layout.nchannels, 4);
     std::vector<uint8_t> raw(size_t(pixels) * size_t(nch));
     if (!in->read_image(0, 0, 0, nch, OIIO::TypeDesc::UINT8, raw.data())) {
         set_error(error, prefix + oiio_message(in->geterror(), "read error"));
@@ -90,9 +90,9 @@ std::unique_ptr<KLImageSGI> KLImageSGI::Load(const char* path, std::string* erro
     }
     in->close();
 
-    auto image = std::make_unique<KLImageSGI>(spec.width, spec.height);
+    auto image = std::make_unique<KLImageSGI>(layout.width, layout.height);
     const bool grey = nch < 3;
-    const int alpha = (nch == 2 || nch == 4) && spec.alpha_channel == nch - 1 ? nch - 1 : -1;
+    const int alpha = (nch == 2 || nch == 4) && layout.alpha_channel == nch - 1 ? nch - 1 : -1;
     uint8_t* out = image->pixels_.data();
     for (long long i = 0; i < pixels; ++i, out += 4) {
         const uint8_t* p = &raw[size_t(i) * size_t(nch)];
@@ -149,9 +149,9 @@ bool KLImageSGI::Store(const char* path, std::string* error) const {
         set_error(error, prefix + oiio_message(OIIO::geterror(), "no SGI writer"));
         return false;
     }
-    OIIO::ImageSpec spec(width_, height_, 4, OIIO::TypeDesc::UINT8);
-    spec.alpha_channel = 3;
-    bool ok = out->open(temp, spec) && out->write_image(OIIO::TypeDesc::UINT8, pixels_.data());
+    OIIO::ImageSpec layout(width_, height_, 4, OIIO::TypeDesc::UINT8);
+    layout.alpha_channel = 3;
+    bool ok = out->open(temp, layout) && out->write_image(OIIO::TypeDesc::UINT8, pixels_.data());
     ok = out->close() && ok;
     if (!ok) {
         set_error(error, prefix + oiio_message(out->geterror(), "write error"));

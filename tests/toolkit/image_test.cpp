@@ -35,10 +35,10 @@ class ImageTest : public ::testing::Test {
                       const std::vector<uint8_t>& pixels) {
         auto out = OIIO::ImageOutput::create(path);
         ASSERT_TRUE(out) << path;
-        OIIO::ImageSpec spec(w, h, nchannels, OIIO::TypeDesc::UINT8);
-        spec.alpha_channel = nchannels == 4 ? 3 : -1;
-        spec.attribute("oiio:UnassociatedAlpha", 1);
-        ASSERT_TRUE(out->open(path, spec)) << out->geterror();
+        OIIO::ImageSpec layout(w, h, nchannels, OIIO::TypeDesc::UINT8);
+        layout.alpha_channel = nchannels == 4 ? 3 : -1;
+        layout.attribute("oiio:UnassociatedAlpha", 1);
+        ASSERT_TRUE(out->open(path, layout)) << out->geterror();
         ASSERT_TRUE(out->write_image(OIIO::TypeDesc::UINT8, pixels.data())) << out->geterror();
         ASSERT_TRUE(out->close());
     }

@@ -230,8 +230,9 @@ TEST_P(DamagedSoundTest, KeepsWhatCanBeReadAndSaysWhy) {
     expect_samples(sound,
                    {Samples::value_type(expected[0].begin(), expected[0].begin() + d.frames)},
                    kExact, d.frames);
-    if (warned)
+    if (warned) {
         EXPECT_EQ(errors_.reports[0].first, KLErr::kWarning);
+    }
 }
 
 INSTANTIATE_TEST_SUITE_P(
