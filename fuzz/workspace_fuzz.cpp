@@ -1,8 +1,10 @@
 // Feeds arbitrary bytes to the keyset-file and track-file readers of the workspace, in batch
 // mode, and saves what was read. The first byte chooses the reader (even: keyset file, odd:
 // track file); the rest is the file. Track files are read against the demo keysets, so that
-// their key-track blocks find keysets to fill. Runs in a scratch directory that holds links to
-// the demo scene and sound, so relative names in the input resolve there.
+// their key-track blocks find keysets to fill. Runs in a scratch directory that holds the demo
+// keysets and, under the demo scene's and sound's names, a tiny scene and a tiny sound (reading
+// the real ones every time would leave the fuzzer little time for the readers), so relative
+// names in the input resolve there.
 #include <unistd.h>
 
 #include <cstdint>
@@ -26,13 +28,10 @@ void setUp() {
     char dir[] = "/tmp/chirrup-fuzz-XXXXXX";
     if (!mkdtemp(dir) || chdir(dir) != 0)
         std::abort();
-    const std::string demo = std::string(CHIRRUP_SOURCE_DIR) + "/resources/demo/";
-    for (const char* f : {"face.glb", "demo.kset"})
-        if (symlink((demo + f).c_str(), f) != 0)
-            std::abort();
-    const std::string tiny =
-        std::string(CHIRRUP_SOURCE_DIR) + "/fuzz/corpus/sound_fuzz/tiny16.aiff";
-    if (symlink(tiny.c_str(), "dialogue.aiff") != 0)
+    const std::string source(CHIRRUP_SOURCE_DIR);
+    if (symlink((source + "/resources/demo/demo.kset").c_str(), "demo.kset") != 0 ||
+        symlink((source + "/fuzz/corpus/scene_fuzz/linear_translation.glb").c_str(), "face.glb") ||
+        symlink((source + "/fuzz/corpus/sound_fuzz/tiny16.aiff").c_str(), "dialogue.aiff") != 0)
         std::abort();
     unsetenv("TESSEL_PROJECT");
     theImp.batchMode = 1;
