@@ -73,7 +73,8 @@ std::unique_ptr<KLImageSGI> KLImageSGI::Load(const char* path, std::string* erro
             return nullptr;
         }
     }
-    const OIIO::ImageSpec& layout = in->spec();
+    // Sizes, channel count and alpha are all this reader needs; the metadata is not copied.
+    const OIIO::ImageSpec layout = in->spec_dimensions(0, 0);
     const long long pixels = (long long)layout.width * layout.height;
     if (layout.deep || layout.width < 1 || layout.height < 1 || layout.nchannels < 1 ||
         pixels > kMaxPixels) {
