@@ -1,8 +1,6 @@
 #pragma once
 
-// Helpers shared by the workspace tests: temporary directories, files, environment, running
-// the chirrup program, a window interface that records what the workspace asks of it, a
-// project fixture, and small generated scene and sound files.
+// Helpers shared by the workspace tests.
 #include <gtest/gtest.h>
 
 #include <functional>
@@ -18,23 +16,19 @@
 #include "toolkit/KLString.h"
 #include "workspace/Ghost.h"
 
-class KLEdlEvent;
-
 namespace wstest {
 
 std::string ReadFile(const std::string& path);  // empty when the file cannot be read
 void WriteFile(const std::string& path, const std::string& text);
 bool FileExists(const std::string& path);
-// What `f` writes on the error stream.
-std::string StdErr(const std::function<void()>& f);
+std::string StdErr(const std::function<void()>& f);  // what `f` writes on the error stream
 
-// A fresh directory under the system's temporary directory, removed with everything in it.
+// A fresh temporary directory, removed with everything in it.
 class TempDir {
   public:
     TempDir();
     ~TempDir();
     TempDir(const TempDir&) = delete;
-    TempDir& operator=(const TempDir&) = delete;
     const std::string& path() const { return path_; }
     std::string operator/(const std::string& name) const { return path_ + "/" + name; }
 
@@ -42,43 +36,38 @@ class TempDir {
     std::string path_;
 };
 
-// Sets (or with a null value unsets) an environment variable while it lives; the
-// preferences are read again on both ends.
+// Sets (a null value: unsets) an environment variable while it lives; the preferences are
+// read again on both ends.
 class ScopedEnv {
   public:
     ScopedEnv(const char* name, const char* value);
     ~ScopedEnv();
     ScopedEnv(const ScopedEnv&) = delete;
-    ScopedEnv& operator=(const ScopedEnv&) = delete;
 
   private:
     std::string name_;
     std::optional<std::string> old_;
 };
 
-// What a run of the chirrup program did: exit status (-1 when it did not exit normally),
-// its standard output and error stream.
 struct RunResult {
-    int status = -1;
-    std::string out;
-    std::string err;
+    int status = -1;  // -1 when the program did not exit normally
+    std::string out, err;
 };
 using EnvChange = std::pair<std::string, std::optional<std::string>>;  // nullopt: unset
-// Runs CHIRRUP_BINARY_DIR/bin/chirrup with `args` in `cwd`. The environment is this
-// process's without the variables the program reads (VX_*, TESSEL_*, KL_PLUGIN*), plus `env`.
+// Runs the chirrup program in `cwd` with this process's environment less everything the
+// program reads (VX_*, TESSEL_*, KL_PLUGIN*), plus `env`.
 RunResult RunChirrup(const std::vector<std::string>& args, const std::string& cwd,
                      const std::vector<EnvChange>& env = {});
 
-// A window interface that writes down every call as "Name(arguments)" in order, answers
-// questions with `confirmAnswer` and reports `activeKeyset`.
+// A window interface that writes down every call as "Name(arguments)", answers questions
+// with `confirmAnswer` and reports `activeKeyset`.
 class RecordingGhost : public Ghost {
   public:
     std::vector<std::string> calls;
     int confirmAnswer = 1;
     int activeKeyset = -1;
 
-    // The calls whose text begins with `prefix`.
-    std::vector<std::string> Calls(const std::string& prefix) const;
+    std::vector<std::string> Calls(const std::string& prefix) const;  // those starting so
 
     int GetActiveKeyset() override { return activeKeyset; }
     void SetActiveKeyset(int i) override { Log(KLFmt("SetActiveKeyset(%d)", activeKeyset = i)); }
@@ -86,22 +75,22 @@ class RecordingGhost : public Ghost {
     void InitMarkTrack(KLMarkTrack* t) override {
         Log(t ? "InitMarkTrack(track)" : "InitMarkTrack(null)");
     }
+    void ClearKeysets(int i) override { Log(KLFmt("ClearKeysets(%d)", i)); }
+    void InitKeyset(int i) override { Log(KLFmt("InitKeyset(%d)", i)); }
+    void ShowRecognizerGui(CueRecognizer*) override { Log("ShowRecognizerGui()"); }
     void CenterKeyView() override { Log("CenterKeyView()"); }
     void CenterMixView() override { Log("CenterMixView()"); }
     void ClearViews() override { Log("ClearViews()"); }
     void ClearKeyTracks() override { Log("ClearKeyTracks()"); }
-    void ClearKeysets(int i) override { Log(KLFmt("ClearKeysets(%d)", i)); }
-    void InitKeyset(int i) override { Log(KLFmt("InitKeyset(%d)", i)); }
     void ClearKeysetMenu() override { Log("ClearKeysetMenu()"); }
     void DressKeysetMenu() override { Log("DressKeysetMenu()"); }
-    void ShowRecognizerGui(CueRecognizer*) override { Log("ShowRecognizerGui()"); }
     void SetMenuStatus() override { Log("SetMenuStatus()"); }
     void SetViewStatus() override { Log("SetViewStatus()"); }
     void MakeKeysetImages() override { Log("MakeKeysetImages()"); }
-    int AdjustRelLoad(char**, char**, int*, int*, int*, int*) override {
-        Log("AdjustRelLoad()");
-        return 0;
-    }
+    void ResetFileManagers() override { Log("ResetFileManagers()"); }
+    void ShowErrorFlag() override { Log("ShowErrorFlag()"); }
+    void ClearErrorFlag() override { Log("ClearErrorFlag()"); }
+    int AdjustRelLoad(char**, char**, int*, int*, int*, int*) override { return 0; }
     void DisplayDuration(CueTime d) override { Log(KLFmt("DisplayDuration(%d)", d.Ticks())); }
     void DisplayReferenceOffset(CueTime o) override {
         Log(KLFmt("DisplayReferenceOffset(%d)", o.Ticks()));
@@ -114,9 +103,6 @@ class RecordingGhost : public Ghost {
         return confirmAnswer;
     }
     void UpdateApplyDialog(KLEdlEvent* event) override;
-    void ResetFileManagers() override { Log("ResetFileManagers()"); }
-    void ShowErrorFlag() override { Log("ShowErrorFlag()"); }
-    void ClearErrorFlag() override { Log("ClearErrorFlag()"); }
 
   private:
     void Log(const std::string& call) { calls.push_back(call); }
@@ -125,8 +111,8 @@ class RecordingGhost : public Ghost {
 // Makes `ghost` the workspace's window interface while it lives.
 class GhostScope {
   public:
-    explicit GhostScope(Ghost* ghost);
-    ~GhostScope();
+    explicit GhostScope(Ghost* ghost) : saved_(theGhost) { theGhost = ghost; }
+    ~GhostScope() { theGhost = saved_; }
 
   private:
     Ghost* saved_;
@@ -135,7 +121,7 @@ class GhostScope {
 // Empties theImp: no keysets, sound, log or apply event; 30 frames per second; interactive.
 void ResetWorkspace();
 
-// A recognizer compiled into the tests: targets "a" and "e" and a setting of its own, "gain".
+// A recognizer compiled into the tests: targets "a" and "e" and a setting "gain".
 class VowelRecognizer : public CueRecognizer {
   public:
     VowelRecognizer() : CueRecognizer("Vowel") { AddTarget("a"), AddTarget("e"); }
@@ -166,30 +152,19 @@ class Reports : public KLErrHandler {
     int level_;
 };
 
-// Names a TEST_P instance after its table row's label.
-struct ByLabel {
-    template <typename Info>
-    std::string operator()(const Info& info) const {
-        return info.param.label;
-    }
-};
-
-// A keyset "mouth" with the face's three key shapes.
 inline const char* const kMouth =
     "begin keyset mouth\n    key rest 0\n    key open 10\n    key wide 20\nend\n";
 
-// A project: DIR/wire/face.gltf (the face scene), empty DIR/misc_data and DIR/work; the
-// workspace emptied, a recording window interface installed, no error-log viewer launched.
+// A project DIR with DIR/wire/face.gltf (the face scene) and empty DIR/misc_data and
+// DIR/work; the workspace emptied, a recording window interface, no error-log viewer.
 class ProjectTest : public ::testing::Test {
   protected:
     void SetUp() override;
     void TearDown() override { ResetWorkspace(); }
-    // Writes DIR/misc_data/`name` and returns its path.
-    std::string Data(const std::string& name, const std::string& text) const;
+    std::string Data(const std::string& name, const std::string& text) const;  // its path
     // `text` with %W, %M and %D replaced by the wire, data and project directories.
     std::string Fill(std::string text) const;
-    // Loads a keyset description in batch mode (no window, no project question).
-    int BatchLoadKeyset(const std::string& path);
+    int BatchLoadKeyset(const std::string& path);  // no window, no project question
 
     TempDir dir;
     ScopedEnv project{"TESSEL_PROJECT", dir.path().c_str()};
@@ -199,16 +174,14 @@ class ProjectTest : public ::testing::Test {
     GhostScope scope{&ghost};
 };
 
-// A glTF 2.0 face (embedded buffer): root "head" with children "jaw" and "lip". Key shapes
-// stand at frames 0 (rest), 10 and 20 at 30 frames per second: jaw TY 0, 1, 2; lip TX 0, 0, 5;
-// lip TZ 0, 3, 3.
+// A glTF face: root "head" with children "jaw" and "lip"; key shapes at frames 0, 10 and 20
+// (30 per second): jaw TY 0, 1, 2; lip TX 0, 0, 5; lip TZ 0, 3, 3.
 std::string FaceSceneJson();
 
-// A 16-bit mono AIFF file of `frames` sample frames at `rate` (a slow ramp).
-void WriteAiff(const std::string& path, int frames, int rate);
+// A 16-bit mono 8000 Hz AIFF file of `frames` sample frames.
+void WriteAiff(const std::string& path, int frames);
 
-// The value of node `node`'s channel (0..8) at `frame` (30 frames per second) in the scene
-// file `path`; nullopt when the file, node or channel is missing.
+// Node `node`'s channel (0..8) at `frame` (30 per second) in scene file `path`, if there.
 std::optional<double> EvalChannel(const std::string& path, const char* node, int channel,
                                   double frame);
 

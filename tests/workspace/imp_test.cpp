@@ -1,9 +1,14 @@
 // The workspace's small operations, the error log and its viewer, the console window
-// interface, saving through a temporary file, and apply inside the program.
+// interface, saving through a temporary file, apply inside the program, and the emergency
+// save on a fatal signal.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
+#include <csignal>
+#include <cstring>
 #include <filesystem>
 
 #include "WorkspaceTestUtil.h"
@@ -12,7 +17,6 @@
 #include "model/KLKeyTrack.h"
 #include "scene/KLScene.h"
 #include "scene/KLWireSource.h"
-#include "toolkit/KLErrHandler.h"
 #include "workspace/ConsoleGhost.h"
 #include "workspace/Imp.h"
 #include "workspace/SafeFile.h"
@@ -38,8 +42,6 @@ TEST_F(ImpTest, KeysetLookupsStayInBoundsAndFindTheFirstOfAName) {
     EXPECT_EQ(theImp.GetKeySet(9), theImp.keySets[9].get());
     EXPECT_EQ(theImp.GetKeySetId("b"), 1);
     EXPECT_EQ(theImp.GetKeySetId("B"), -1) << "names are case-sensitive";
-    EXPECT_EQ(theImp.GetKeySet("b"), theImp.keySets[1].get());
-    EXPECT_EQ(theImp.GetKeySet("zz"), nullptr);
     EXPECT_EQ(theImp.GetKeySetId(nullptr), -1);
 }
 
@@ -48,16 +50,14 @@ TEST_F(ImpTest, FeedbackOutOfRangeKeepsTheModeButRefreshesTheScene) {
     theImp.scene->Feedback(3);
     theImp.SetFeedback(7);
     EXPECT_EQ(theImp.feedback, 1);
-    EXPECT_EQ(theImp.scene->Feedback(), 1) << "the scene is told the kept mode again";
+    EXPECT_EQ(theImp.scene->Feedback(), 1);
     theImp.SetFeedback(2);
 }
 
-// --- error log
-
-TEST_F(ImpTest, ReportsAtOrAboveTheOutputLevelAreLoggedAndRaiseTheFlag) {
+TEST_F(ImpTest, ErrorLogTakesReportsAtTheOutputLevelAndTheViewerSeesIt) {
     const std::string log = dir / "errlog.vx";
     theImp.SetErrorFilename(log.c_str());
-    const size_t header = ReadFile(log).size();
+    size_t header = ReadFile(log).size();
     KLInform("not logged at the default level\n");
     KLWarning("Audio file [x] does not exist.\n");
     KLError("second");
@@ -68,20 +68,13 @@ TEST_F(ImpTest, ReportsAtOrAboveTheOutputLevelAreLoggedAndRaiseTheFlag) {
     KLErrHandler::outputLevel = KLErrHandler::kDefaultOutputLevel;
     EXPECT_THAT(ReadFile(log), HasSubstr("shown when verbose\n"));
 
-    const std::string bad = dir / "missing-dir/errlog.vx";
-    theImp.SetErrorFilename(bad.c_str());
-    EXPECT_EQ(StdErr([] { KLError("Audio file [a.aiff] does not exist.\n"); }),
-              "ERROR: Unable to append to error log file, " + bad +
-                  ".\nAudio file [a.aiff] does not exist.\n");
-}
-
-TEST_F(ImpTest, ViewingAppendsASeparatorOnlyAfterNewMessages) {
-    const std::string log = dir / "errlog.vx", seen = dir / "seen";
+    // Viewing appends a separator only after new messages.
+    const std::string seen = dir / "seen";
     const std::string separator = "\n---------------------------------------\n\n";
     std::optional<ScopedEnv> viewer;
     viewer.emplace("TESSEL_USER_ERROR_READER", ("sh -c 'cp \"$0\" " + seen + "'").c_str());
     theImp.SetErrorFilename(log.c_str());
-    const size_t header = ReadFile(log).size();
+    header = ReadFile(log).size();
     theImp.ViewErrorLog();
     EXPECT_EQ(ReadFile(log).size(), header) << "no messages yet: no separator";
     KLError("one\n");
@@ -95,9 +88,13 @@ TEST_F(ImpTest, ViewingAppendsASeparatorOnlyAfterNewMessages) {
     EXPECT_EQ(ReadFile(log).substr(header),
               "one\n" + separator + "two\n" + "Problem launching error log viewer.\n" + separator);
     EXPECT_EQ(ghost.Calls("ClearErrorFlag").size(), 4u);
-}
 
-// --- console window interface
+    const std::string bad = dir / "missing-dir/errlog.vx";
+    theImp.SetErrorFilename(bad.c_str());
+    EXPECT_EQ(StdErr([] { KLError("Audio file [a.aiff] does not exist.\n"); }),
+              "ERROR: Unable to append to error log file, " + bad +
+                  ".\nAudio file [a.aiff] does not exist.\n");
+}
 
 TEST_F(ImpTest, TheConsoleAndBatchModeAnswerOnTheErrorStream) {
     int answer = 0;
@@ -112,21 +109,13 @@ TEST_F(ImpTest, TheConsoleAndBatchModeAnswerOnTheErrorStream) {
               "Could not locate [x].\nAssuming OK\n");
     EXPECT_EQ(answer, 1);
     EXPECT_THAT(ghost.calls, IsEmpty());
-    theImp.batchMode = 0;
-    theImp.Inform("asked interactively", "OK");
-    EXPECT_THAT(ghost.calls, ElementsAre("Inform(asked interactively|OK)"));
 }
-
-// --- saving through a temporary file
 
 TEST_F(ImpTest, SafeFileReplacesOnCommitOnlyAndLeavesNoTemporaryFile) {
     const std::string target = dir / "work/a.track";
     WriteFile(target, "old\n");
     ::chmod(target.c_str(), 0640);
-    {
-        SafeFile abandoned(target);
-        abandoned.Stream() << "half written";
-    }
+    SafeFile(target).Stream() << "abandoned";
     EXPECT_EQ(ReadFile(target), "old\n");
     {
         SafeFile file(target);
@@ -142,69 +131,130 @@ TEST_F(ImpTest, SafeFileReplacesOnCommitOnlyAndLeavesNoTemporaryFile) {
     EXPECT_EQ(std::distance(std::filesystem::directory_iterator(dir / "work"), {}), 1);
     EXPECT_FALSE(SafeFile(dir / "no-such-dir/a.keyset").IsOpen());
     EXPECT_FALSE(SafeFile(dir.path()).IsOpen()) << "a directory is not a file";
-    EXPECT_FALSE(SafeFile("").IsOpen());
 }
 
-// --- apply: two keysets named "mouth", the first over the whole face, the second on "lip"
-
-class ApplyTest : public ProjectTest {
-  protected:
-    void SetUp() override {
-        ProjectTest::SetUp();
-        ASSERT_EQ(BatchLoadKeyset(Data("face.kset", std::string("wire face.gltf\n") + kMouth +
-                                                        "begin keyset other\n key rest 0\n"
-                                                        " key wide 20\nend\n"
-                                                        "begin keyset mouth lip\n key rest 0\n"
-                                                        " key wide 20\nend\n")),
-                  1);
-        theImp.SetDuration(CueTime(0, 0, 4, 0, 0));
-        ghost.calls.clear();
-        theImp.OpenApplyWire((dir / "wire/face.gltf").c_str());
-        theImp.applyEvent->OpenWire();
-        target = theImp.applyEvent->wire.get();
-        ASSERT_TRUE(target && target->Valid());
-    }
-    void Key(int keyset, double frame, int shape, float value) {
-        theImp.GetKeyTrack(keyset)->InsertKey(shape, CueTime::FromFrames(frame),
-                                              theImp.GetKeySet(keyset)->GetKeyShape(shape), 1,
-                                              value);
-    }
-    int Apply(const char* keyset, const char* dag, KLWireSource* to) {
-        return theImp.ApplyWire(to, keyset, dag, CueTime(), theImp.duration, CueTime());
-    }
-    KLWireSource* target = nullptr;
-};
-
-TEST_F(ApplyTest, TheApplyEventCoversTheWholeWorkspace) {
-    EXPECT_STREQ(theImp.applyEvent->WireFile(), "face.gltf") << "held below the wire directory";
-    EXPECT_EQ(theImp.applyEvent->sourceIn, CueTime());
-    EXPECT_EQ(theImp.applyEvent->sourceOut.Ticks(), 24000);
-    EXPECT_EQ(theImp.applyEvent->destIn, CueTime());
-    EXPECT_EQ(theImp.applyEvent->destOut.Ticks(), 24000);
-    EXPECT_THAT(ghost.calls, ElementsAre("UpdateApplyDialog(face.gltf)"));
-    theImp.OpenApplyWire("/elsewhere/b.gltf");
-    EXPECT_STREQ(theImp.applyEvent->WireFile(), "/elsewhere/b.gltf");
-}
-
-TEST_F(ApplyTest, EveryKeysetOfTheNameIsAppliedInSlotOrder) {
-    Key(0, 0, 0, 1.0f);
-    Key(0, 6, 2, 1.0f);  // first "mouth": wide, lip TX 5, jaw TY 2
-    Key(2, 6, 1, 0.5f);  // second "mouth": half of wide on lip only, lip TX 2.5
-    Key(1, 3, 1, 1.0f);
-    EXPECT_EQ(Apply("other", "head", target), 1);
-    EXPECT_EQ(Apply("nobody", "head", target), 0);
-    EXPECT_EQ(Apply("mouth", "head", nullptr), 0);
+// Two keysets named "mouth", the first over the whole face, the second on "lip" only; every
+// keyset of the name is applied in slot order.
+TEST_F(ImpTest, ApplyCoversTheWorkspaceAndEveryKeysetOfTheName) {
+    ASSERT_EQ(BatchLoadKeyset(Data("face.kset", std::string("wire face.gltf\n") + kMouth +
+                                                    "begin keyset other\n key rest 0\nend\n"
+                                                    "begin keyset mouth lip\n key rest 0\n"
+                                                    " key wide 20\nend\n")),
+              1);
+    theImp.SetDuration(CueTime(0, 0, 4, 0, 0));
     ghost.calls.clear();
-    EXPECT_EQ(Apply("mouth", "nothere", target), 0);
+    theImp.OpenApplyWire((dir / "wire/face.gltf").c_str());
+    KLEdlEvent& event = *theImp.applyEvent;
+    EXPECT_STREQ(event.WireFile(), "face.gltf") << "held below the wire directory";
+    EXPECT_EQ(event.sourceOut.Ticks(), 24000);
+    EXPECT_EQ(event.destOut.Ticks(), 24000);
+    EXPECT_THAT(ghost.calls, ElementsAre("UpdateApplyDialog(face.gltf)"));
+    event.OpenWire();
+    KLWireSource* target = event.wire.get();
+    ASSERT_TRUE(target && target->Valid());
+
+    auto key = [](int keyset, int shape, float value) {
+        theImp.GetKeyTrack(keyset)->InsertKey(
+            shape, CueTime::FromFrames(6), theImp.GetKeySet(keyset)->GetKeyShape(shape), 1, value);
+    };
+    key(0, 2, 1.0f);  // first "mouth": wide, lip TX 5, jaw TY 2
+    key(2, 1, 0.5f);  // second "mouth": half of wide on lip only, lip TX 2.5
+    auto apply = [](const char* keyset, const char* dag, KLWireSource* to) {
+        return theImp.ApplyWire(to, keyset, dag, CueTime(), theImp.duration, CueTime());
+    };
+    EXPECT_EQ(apply("nobody", "head", target), 0);
+    EXPECT_EQ(apply("mouth", "head", nullptr), 0);
+    ghost.calls.clear();
+    EXPECT_EQ(apply("mouth", "nothere", target), 0);
     EXPECT_THAT(ghost.calls,
                 ElementsAre("Inform(Cannot find base dag [nothere] for apply ...|Dismiss)",
                             "Inform(Cannot find base dag [nothere] for apply ...|Dismiss)"));
-    EXPECT_EQ(Apply("mouth", "head", target), 1);
+    EXPECT_EQ(apply("mouth", "head", target), 1);
     EXPECT_EQ(KLWireSource::Active(), theImp.wireSource.get()) << "the workspace's scene again";
     const std::string out = dir / "wire/out.gltf";
-    ASSERT_EQ(theImp.applyEvent->StoreWire(out.c_str()), 1);
+    ASSERT_EQ(event.StoreWire(out.c_str()), 1);
     EXPECT_NEAR(*EvalChannel(out, "jaw", 1, 6), 2.0, 1e-4) << "from the first keyset";
     EXPECT_NEAR(*EvalChannel(out, "lip", 0, 6), 2.5, 1e-4) << "the second one wrote last";
+}
+
+// A process holding keysets (and a sound) that receives a fatal signal writes "_m.keyset" (and
+// "_m.track") in its working directory and ends with status -1.
+class EmergencySave : public ProjectTest, public ::testing::WithParamInterface<int> {
+  protected:
+    void SetUp() override {
+        ProjectTest::SetUp();
+        Data("face.kset", std::string("wire face.gltf\n") + kMouth +
+                              "begin shapeset \"the brow\" jaw 4\n key down 0\n key up 1\nend\n");
+        Data("t.track",
+             "begin keytrack mouth\n event 3 open Linear 0.5\n event 9 wide\nend\n"
+             "begin keytrack\t\"the brow\"\n event 4 up Smooth 2\nend\n");
+        WriteAiff(dir / "misc_data/d.aiff", 8000);
+    }
+
+    // Forks a process that loads what is asked and then receives `sig`; its wait status.
+    int Crash(int sig, bool keysets, bool sound) {
+        const pid_t pid = ::fork();
+        if (pid == 0) {
+            if (!std::freopen((dir / "child.err").c_str(), "w", stderr) ||
+                ::chdir((dir / "work").c_str()))
+                ::_exit(120);
+            theImp.batchMode = 1;
+            if ((keysets && (!theImp.LoadKeyset((dir / "misc_data/face.kset").c_str()) ||
+                             !theImp.LoadTrack((dir / "misc_data/t.track").c_str()))) ||
+                (sound && !theImp.LoadSound((dir / "misc_data/d.aiff").c_str())))
+                ::_exit(121);
+            ::raise(sig);
+            ::_exit(122);
+        }
+        int status = 0;
+        ::waitpid(pid, &status, 0);
+        return status;
+    }
+    std::vector<std::string> WorkFiles() const {
+        std::vector<std::string> names;
+        for (const auto& e : std::filesystem::directory_iterator(dir / "work"))
+            names.push_back(e.path().filename().string());
+        return names;
+    }
+};
+
+TEST_P(EmergencySave, WritesKeysetsAndTrackThatLoadBack) {
+    const int status = Crash(GetParam(), true, true);
+    ASSERT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(WEXITSTATUS(status), 255);
+    EXPECT_EQ(ReadFile(dir / "child.err"),
+              "EMERGENCY SAVE ON SIGNAL " + std::to_string(GetParam()) + " ... Done.\n");
+
+    theImp.batchMode = 1;
+    ASSERT_EQ(theImp.LoadKeyset((dir / "work/_m.keyset").c_str()), 1);
+    ASSERT_EQ(theImp.LoadTrack((dir / "work/_m.track").c_str()), 1);
+    ASSERT_EQ(theImp.keysetCount, 2);
+    EXPECT_STREQ(theImp.GetKeySet(1)->Name(), "the brow");
+    EXPECT_EQ(theImp.GetKeyTrack(0)->events.Count(), 2);
+    EXPECT_EQ(theImp.GetKeyTrack(0)->Duration(), CueTime::FromFrames(9));
+    EXPECT_EQ(theImp.GetKeyTrack(1)->events.Count(), 1);
+    EXPECT_EQ(theImp.soundFile, dir / "misc_data/d.aiff");
+}
+
+INSTANTIATE_TEST_SUITE_P(Signals, EmergencySave,
+                         ::testing::Values(SIGSEGV, SIGSYS, SIGTERM, SIGBUS, SIGFPE, SIGTRAP,
+                                           SIGABRT, SIGILL, SIGUSR2, SIGUSR1),
+                         [](const auto& info) { return std::string(sigabbrev_np(info.param)); });
+
+TEST_F(EmergencySave, WithoutKeysetsNothingIsSavedWithoutASoundNoTrack) {
+    int status = Crash(SIGTERM, false, true);
+    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGTERM)
+        << "the signal takes its course";
+    EXPECT_EQ(ReadFile(dir / "child.err"), "");
+    EXPECT_THAT(WorkFiles(), ::testing::IsEmpty());
+
+    WriteFile(dir / "work/_m.keyset", std::string(100000, 'x'));
+    status = Crash(SIGABRT, true, false);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 255);
+    const std::string saved = ReadFile(dir / "work/_m.keyset");
+    EXPECT_EQ(saved.rfind("wire face.gltf 0\n\nbegin keyset mouth\n", 0), 0u) << saved;
+    EXPECT_EQ(saved.find('x'), std::string::npos) << "an earlier save is replaced whole";
+    EXPECT_THAT(WorkFiles(), ::testing::ElementsAre("_m.keyset")) << "no track, no temporary";
 }
 
 }  // namespace

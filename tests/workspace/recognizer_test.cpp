@@ -1,11 +1,10 @@
 // Recognizer settings blocks, the plug-in catalogue with real shared objects, the shipped
-// Loudness plug-in, recognizer settings files read by the workspace, and recognizers in
-// keyset files and batch runs.
+// Loudness plug-in, settings files read by the workspace, and recognizers in keyset files and
+// batch runs.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <filesystem>
-#include <fstream>
 #include <memory>
 #include <sstream>
 
@@ -15,7 +14,6 @@
 #include "toolkit/CueSound.h"
 #include "workspace/Imp.h"
 
-namespace fs = std::filesystem;
 using namespace wstest;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
@@ -37,8 +35,7 @@ bool read(CueRecognizer& r, const std::string& text) {
     std::istringstream in(text);
     return r.GuardedReadSettings(in);
 }
-
-// A sound of one channel at 1000 frames per second: 100 frames of each amplitude in turn.
+// One channel at 1000 frames per second: 100 frames of a square wave of each amplitude.
 std::unique_ptr<CueSound> steps_of(std::initializer_list<float> amplitudes) {
     std::vector<float> samples;
     for (float a : amplitudes)
@@ -46,38 +43,11 @@ std::unique_ptr<CueSound> steps_of(std::initializer_list<float> amplitudes) {
             samples.push_back(i % 2 ? a : -a);
     return CueSound::FromSamples({samples}, 1000.0);
 }
-
 std::vector<int> target_indices(const CueRecognizer& r) {
     std::vector<int> out;
     for (const auto& result : r.results)
         out.push_back(result.targetIndex);
     return out;
-}
-
-// --- settings blocks
-
-TEST(RecognizerSettings, WriteReadsBackThroughAFreshRecognizer) {
-    VowelRecognizer r;
-    r.step = CueTime::FromFrames(2);
-    r.gain = 0.5f;
-    r.FindTarget("e")->pictureFile = "pix/open mouth.sgi";
-    r.FindTarget("e")->soundFile = "ee.aiff";
-    EXPECT_EQ(written(r),
-              "    step 2\n    target a\n"
-              "    target e picture \"pix/open mouth.sgi\" sound ee.aiff\n"
-              "    gain 0.5\n");
-    VowelRecognizer back;
-    ASSERT_TRUE(read(back, written(r) + "end\n"));
-    EXPECT_EQ(back.step, r.step);
-    EXPECT_EQ(back.gain, 0.5f);
-    EXPECT_EQ(written(back), written(r));
-
-    back.FindTarget("a")->keyShapeIndex = 3;
-    back.ResetSettings();
-    EXPECT_EQ(back.step, back.defaultStep);
-    EXPECT_EQ(back.gain, 1.0f);
-    EXPECT_EQ(back.FindTarget("a")->keyShapeIndex, 3) << "links are kept";
-    EXPECT_EQ(back.FindTarget("e")->pictureFile, "");
 }
 
 TEST(RecognizerSettings, ReadStopsAfterEndAndSkipsWhatItDoesNotKnow) {
@@ -102,17 +72,9 @@ TEST(RecognizerSettings, ReadStopsAfterEndAndSkipsWhatItDoesNotKnow) {
     EXPECT_EQ(r.gain, 4.0f);
 }
 
-// --- the catalogue and plug-in files
-
 class PluginCatalog : public ::testing::Test {
   protected:
-    // The "Level" recognizer of a catalogue that scanned the good plug-ins.
-    std::unique_ptr<CueRecognizer> Level() {
-        EXPECT_EQ(catalog.ScanDirectory(kGoodPlugins.c_str()), 1);
-        return std::unique_ptr<CueRecognizer>(catalog.FetchRecognizer("Level"));
-    }
-    TempDir tmp;
-    const fs::path dir{tmp.path()};
+    TempDir dir;
     Reports reports{0};
     CueRecognizerCatalog catalog;
 };
@@ -124,41 +86,35 @@ TEST_F(PluginCatalog, SearchPathPrefersTesselThenKlThenDefaultAndIsScannedOnFirs
               "./plugins:/usr/tesselbeta/plugins:/usr/tessel/plugins");
     ScopedEnv kl2("KL_PLUGIN_PATH", "/kl");
     EXPECT_EQ(CueRecognizerCatalog::SearchPath(), "/kl");
-    ScopedEnv tessel2("TESSEL_PLUGIN_PATH", (dir.string() + ":" + kGoodPlugins).c_str());
-    EXPECT_EQ(CueRecognizerCatalog::SearchPath(), dir.string() + ":" + kGoodPlugins);
+    ScopedEnv tessel2("TESSEL_PLUGIN_PATH", (dir.path() + ":" + kGoodPlugins).c_str());
+    EXPECT_EQ(CueRecognizerCatalog::SearchPath(), dir.path() + ":" + kGoodPlugins);
 
     std::unique_ptr<CueRecognizer> a(catalog.FetchRecognizer("Level"));
     std::unique_ptr<CueRecognizer> b(catalog.FetchRecognizer("Level"));
     ASSERT_TRUE(a && b);
     EXPECT_NE(a.get(), b.get());
-    EXPECT_STREQ(a->Name(), "Level");
-    ASSERT_EQ(a->targets.size(), 3u);
     EXPECT_EQ(a->targets[2].name, "loud");
     EXPECT_EQ(catalog.Count(), 1);
     EXPECT_EQ(catalog.FetchRecognizer("level"), nullptr);
-    EXPECT_EQ(catalog.FetchRecognizer(nullptr), nullptr);
     EXPECT_THAT(reports.text, IsEmpty());
 
     CueRecognizerCatalog scanned;
-    EXPECT_EQ(scanned.ScanDirectory(dir.c_str()), 0);
+    EXPECT_EQ(scanned.ScanDirectory(dir.path().c_str()), 0);
     EXPECT_EQ(scanned.FetchRecognizer("Level"), nullptr) << "a scanned catalogue is not rescanned";
 }
 
 TEST_F(PluginCatalog, RefusesAndReportsFilesThatAreNotPluginsOfThisInterface) {
-    std::ofstream(dir / "junk.so") << "not a shared object\n";
-    std::ofstream(dir / "notes.txt") << "plug-ins go here\n";
-    fs::create_directory(dir / "folder.so");
-    const std::string path = "::/does/not/exist:" + dir.string() + ":" + kBadPlugins;
-    EXPECT_EQ(catalog.ScanDirectory(path.c_str()), 0);
-    EXPECT_EQ(catalog.Count(), 0);
+    WriteFile(dir / "junk.so", "not a shared object\n");
+    WriteFile(dir / "notes.txt", "plug-ins go here\n");
+    std::filesystem::create_directory(dir / "folder.so");
+    EXPECT_EQ(catalog.ScanDirectory(("::/no/such:" + dir.path() + ":" + kBadPlugins).c_str()), 0);
     EXPECT_EQ(catalog.HeadKey(), nullptr);
     EXPECT_THAT(reports.text,
                 HasSubstr("[" + kBadPlugins + "/NotAPlugin.so] is not a chirrup plug-in"));
     EXPECT_THAT(reports.text,
                 HasSubstr("[" + kBadPlugins +
                           "/WrongAbi.so] was built for plug-in interface 42, this program uses 1"));
-    EXPECT_THAT(reports.text,
-                HasSubstr("[" + (dir / "junk.so").string() + "] could not be loaded: "));
+    EXPECT_THAT(reports.text, HasSubstr("[" + (dir / "junk.so") + "] could not be loaded: "));
     EXPECT_THAT(reports.text, Not(HasSubstr("notes.txt")));
     EXPECT_THAT(reports.text, Not(HasSubstr("folder.so")));
     EXPECT_FALSE(catalog.LoadPlugin((dir / "missing.so").c_str()));
@@ -172,26 +128,26 @@ TEST_F(PluginCatalog, FirstRecognizerOfANameWins) {
     ASSERT_STREQ(catalog.HeadKey(), "Vowel");
     EXPECT_STREQ(catalog.NextKey("Vowel"), "Level");
     EXPECT_EQ(catalog.NextKey("Level"), nullptr);
-    EXPECT_EQ(catalog.NextKey("Nobody"), nullptr);
 }
 
+// The plug-in's own settings, its recognition, and that its exceptions never leave a call.
 TEST_F(PluginCatalog, PluginSettingsAndRecognitionWorkAndItsExceptionsStayInside) {
-    std::unique_ptr<CueRecognizer> r = Level();
+    ASSERT_EQ(catalog.ScanDirectory(kGoodPlugins.c_str()), 1);
+    std::unique_ptr<CueRecognizer> r(catalog.FetchRecognizer("Level"));
     ASSERT_TRUE(read(*r, "threshold 0.25 0.75\nstep 4\ntarget loud sound shout.aiff\nend\n"));
     EXPECT_EQ(written(*r),
               "    step 4\n    target silent\n    target quiet\n"
               "    target loud sound shout.aiff\n    threshold 0.25 0.75\n");
     ASSERT_TRUE(r->GuardedResetSettings());
-    EXPECT_THAT(written(*r), HasSubstr("    threshold 0.01 0.5\n"));
-    EXPECT_THAT(written(*r), HasSubstr("    step 3\n"));  // 0.1 s at 30 frames per second
+    EXPECT_EQ(written(*r),
+              "    step 3\n    target silent\n    target quiet\n    target loud\n"
+              "    threshold 0.01 0.5\n");  // 0.1 s at 30 frames per second
 
     r->FindTarget("silent")->keyShapeIndex = 7;
-    r->FindTarget("loud")->keyShapeIndex = 2;
     ASSERT_TRUE(r->GuardedRecognize(*steps_of({0.0f, 0.1f, 0.9f, 0.0f})));
     EXPECT_THAT(target_indices(*r), ElementsAre(0, 1, 2, 0));
     EXPECT_EQ(r->results[0].shapeIndex, 7);
     EXPECT_EQ(r->results[1].shapeIndex, -1);
-    EXPECT_EQ(r->results[2].shapeIndex, 2);
 
     EXPECT_FALSE(read(*r, "throw\nend\n"));
     EXPECT_THAT(reports.text, HasSubstr("Recognizer [Level] failed: told to throw"));
@@ -212,16 +168,11 @@ TEST(PluginLifetime, RecognizersOutliveTheirCatalogue) {
     r.reset();  // runs the plug-in's destructor
 }
 
-// --- the shipped Loudness plug-in
-
 TEST_F(PluginCatalog, LoudnessMapsRmsLevelToClosedHalfOpen) {
     ASSERT_TRUE(catalog.LoadPlugin((kShippedPlugins + "/Loudness.so").c_str())) << reports.text;
     std::unique_ptr<CueRecognizer> r(catalog.FetchRecognizer("Loudness"));
     ASSERT_TRUE(r);
-    std::vector<std::string> names;
-    for (const auto& t : r->targets)
-        names.push_back(t.name);
-    EXPECT_THAT(names, ElementsAre("closed", "half", "open"));
+    EXPECT_THAT(written(*r), HasSubstr("target closed\n    target half\n    target open\n"));
     // Square waves: the RMS equals the amplitude. -40 dB, -30 dB, -20 dB, 0 dB and silence
     // against the default levels -36 and -24, one 0.1 s step (100 samples) each.
     r->step = CueTime::FromSeconds(0.1);
@@ -240,65 +191,61 @@ TEST_F(PluginCatalog, LoudnessMapsRmsLevelToClosedHalfOpen) {
     EXPECT_FALSE(r->GuardedRecognize(CueSound()));
 }
 
-// --- recognizer settings files read by the workspace
-
 class SettingsFile : public PluginCatalog {
   protected:
     std::string write(const std::string& text) {
-        std::ofstream(dir / "Vowel.config") << text;
-        return (dir / "Vowel.config").string();
+        WriteFile(dir / "Vowel.config", text);
+        return dir / "Vowel.config";
     }
     RecordingGhost ghost;
     GhostScope scope{&ghost};
     VowelRecognizer r;
 };
 
+// Configuring resets the settings (not the links) and reads only the recognizer's own block.
 TEST_F(SettingsFile, ReadsOnlyItsOwnBlockAfterAReset) {
     r.step = CueTime::FromFrames(9);
     r.gain = 5.0f;
+    r.FindTarget("a")->keyShapeIndex = 3;
+    r.FindTarget("a")->pictureFile = "a.sgi";
     const std::string file = write(
         "gain 11\nbegin recognizer Other\n    gain 12\nend\n"
         "begin recognizer Vowel extra\n    gain 13\nend\n"
         "begin recognizer Vowel\n    target e picture e.sgi\n    gain 0.25\nend\ngain 14\n");
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, file.c_str()), 1);
     EXPECT_EQ(r.gain, 0.25f);
-    EXPECT_EQ(r.step, r.defaultStep);  // reset, and not set by the file
+    EXPECT_EQ(r.step, r.defaultStep);
     EXPECT_EQ(r.FindTarget("e")->pictureFile, "e.sgi");
+    EXPECT_EQ(r.FindTarget("a")->pictureFile, "");
+    EXPECT_EQ(r.FindTarget("a")->keyShapeIndex, 3);
     EXPECT_THAT(ghost.calls, ElementsAre("ShowRecognizerGui()"));
 
     r.gain = 5.0f;
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, write("begin recognizer Other\nend\n").c_str()), 1);
     EXPECT_EQ(r.gain, 5.0f) << "without its block the settings stay";
-    EXPECT_EQ(ghost.calls.size(), 2u);
-}
 
-TEST_F(SettingsFile, UnreadableFileReturnsZeroSilently) {
+    ghost.calls.clear();
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, (dir / "missing.config").c_str()), 0);
-    EXPECT_EQ(theImp.ConfigureRecognizer(&r, dir.c_str()), 0);
+    EXPECT_EQ(theImp.ConfigureRecognizer(&r, dir.path().c_str()), 0);
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, nullptr), 0);
-    EXPECT_EQ(theImp.ConfigureRecognizer(nullptr, write("").c_str()), 0);
-    EXPECT_THAT(ghost.calls, IsEmpty());
+    EXPECT_EQ(theImp.ConfigureRecognizer(nullptr, file.c_str()), 0);
+    EXPECT_THAT(ghost.calls, IsEmpty()) << "an unreadable file is refused silently";
     EXPECT_THAT(reports.text, IsEmpty());
 }
 
-// --- recognizers in keyset files
-
-TEST_F(SettingsFile, PluginSettingsAndLinksRoundTripThroughConfigAndKeysetFiles) {
-    ScopedEnv project("TESSEL_PROJECT", dir.c_str());
+TEST_F(SettingsFile, PluginSettingsAndLinksRoundTripThroughKeysetFiles) {
+    ScopedEnv project("TESSEL_PROJECT", dir.path().c_str());
     ScopedEnv misc("TESSEL_MISC_DIR", nullptr);
-    fs::create_directories(dir / "misc_data");
+    std::filesystem::create_directories(dir / "misc_data");
     ResetWorkspace();
-    theImp.recognizers.ScanDirectory(kGoodPlugins.c_str());  // once per process is enough
+    theImp.recognizers.ScanDirectory(kGoodPlugins.c_str());
     std::unique_ptr<CueRecognizer> level(theImp.recognizers.FetchRecognizer("Level"));
     ASSERT_TRUE(level);
-    EXPECT_EQ(level->ConfigFileName(), (dir / "misc_data" / "Level.config").string());
+    EXPECT_EQ(level->ConfigFileName(), dir / "misc_data/Level.config");
     {
         ScopedEnv none("TESSEL_PROJECT", nullptr);
         EXPECT_EQ(level->ConfigFileName(), "./Level.config");
     }
-    std::ofstream(level->ConfigFileName()) << "begin recognizer Level\n threshold 0.125 0.6\nend\n";
-    EXPECT_EQ(theImp.ConfigureRecognizer(level.get(), level->ConfigFileName().c_str()), 1);
-    EXPECT_THAT(written(*level), HasSubstr("    threshold 0.125 0.6\n"));
 
     const std::string settings =
         "    step 6\n    target silent\n    target quiet\n"
@@ -306,7 +253,7 @@ TEST_F(SettingsFile, PluginSettingsAndLinksRoundTripThroughConfigAndKeysetFiles)
     const std::string links =
         "begin recognizer-links Level mouth\n    link silent to rest\n    link loud to wide\nend\n";
     WriteFile(dir / "face.gltf", FaceSceneJson());
-    WriteFile(dir / "face.keyset", "wire " + (dir / "face.gltf").string() + " 0\n" + kMouth +
+    WriteFile(dir / "face.keyset", "wire " + (dir / "face.gltf") + " 0\n" + kMouth +
                                        "begin recognizer Level mouth\n" + settings + "end\n" +
                                        links);
     for (const char* file : {"face.keyset", "saved.keyset"}) {
@@ -326,8 +273,8 @@ TEST_F(SettingsFile, PluginSettingsAndLinksRoundTripThroughConfigAndKeysetFiles)
     ResetWorkspace();
 }
 
-// The chirrup program itself loads the shipped plug-in in a batch run (its symbols are
-// exported to plug-ins, and the catalogue is scanned when the keyset file first asks).
+// The program exports its symbols to plug-ins and scans the catalogue when a keyset file
+// first asks for a recognizer.
 TEST(ProgramPlugins, BatchRunFindsTheShippedLoudnessPlugin) {
     TempDir dir;
     WriteFile(dir / "face.gltf", FaceSceneJson());
