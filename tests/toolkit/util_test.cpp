@@ -2,6 +2,7 @@
 #include <climits>
 #include <sstream>
 
+#include "toolkit/CuePrefs.h"
 #include "toolkit/CueStatement.h"
 #include "toolkit/KLFilePath.h"
 #include "toolkit/KLString.h"
@@ -23,6 +24,26 @@ TEST(KLFilePath, TrimHeadRemovesOnlyAWholeDirectory) {
     EXPECT_EQ(KLFilePath::TrimHead("/proj/pix", "/proj/pix"), "");
     EXPECT_EQ(KLFilePath::Directory("a.kset"), ".");
     EXPECT_EQ(KLFilePath::Directory("/a.kset"), "/");
+}
+
+// The data, scene and picture folders hang off the project; without one, names stay relative.
+TEST(CuePrefs, FoldersFollowTheProjectAndTheDataFolderVariable) {
+    ::setenv("TESSEL_MISC_DIR", "data", 1);
+    CuePrefs::SetProject("/proj//");
+    EXPECT_STREQ(CuePrefs::Project(), "/proj");
+    EXPECT_STREQ(CuePrefs::MiscDir(), "/proj/data");
+    EXPECT_STREQ(CuePrefs::WireDir(), "/proj/wire");
+    EXPECT_STREQ(CuePrefs::PixDir(), "/proj/pix");
+    ::setenv("TESSEL_MISC_DIR", "", 1);
+    CuePrefs::Refresh();
+    EXPECT_STREQ(CuePrefs::MiscDir(), "/proj/misc_data") << "an empty variable counts as unset";
+    CuePrefs::SetProject("");
+    EXPECT_EQ(CuePrefs::Project(), nullptr);
+    EXPECT_EQ(CuePrefs::MiscDir(), nullptr);
+    EXPECT_EQ(CuePrefs::PixDir(), nullptr);
+    EXPECT_NE(CuePrefs::Location(), nullptr);
+    ::unsetenv("TESSEL_MISC_DIR");
+    CuePrefs::Refresh();
 }
 
 TEST(CueTokenList, SplitsAtBlanksAndTabsAndGroupsQuotes) {
