@@ -136,6 +136,28 @@ TEST_F(KLKeySetTest, WriteGoldenAndReadBack) {
     EXPECT_TRUE(stored && stored->Width() == 160 && stored->Height() == 121);
 }
 
+// A picture made in the program stands before the one on file until it is cleared; each
+// comes with its own icon, and pictures are scaled to the fixed sizes.
+TEST_F(KLKeySetTest, ProgramPictureStandsBeforeTheFilePicture) {
+    ASSERT_TRUE(KLImageSGI(32, 24).Store(File("p.sgi").c_str()));
+    KLKey key(3, "a", "p.sgi"), bare(4, "b", nullptr), lost(5, "c", "gone.sgi");
+    CaptureStderr();
+    KLImageSGI* onFile = key.GetImage();
+    ASSERT_TRUE(onFile && onFile->Width() == 160 && onFile->Height() == 121);
+    EXPECT_EQ(key.GetImage(), onFile) << "loaded once";
+    KLImageSGI* fileIcon = key.GetIcon();
+    ASSERT_TRUE(fileIcon && fileIcon->Width() == 80 && fileIcon->Height() == 60);
+    key.SetImage(new KLImageSGI(300, 200));
+    EXPECT_TRUE(key.GetImage() != onFile && key.GetIcon() != fileIcon);
+    key.SetImage(nullptr);
+    EXPECT_NE(key.GetImage(), onFile) << "no picture changes nothing";
+    key.ClearImage();
+    EXPECT_TRUE(key.GetImage() == onFile && key.GetIcon() == fileIcon);
+    EXPECT_TRUE(!bare.GetImage() && !bare.GetIcon() && !lost.GetIcon());
+    EXPECT_EQ(GetCapturedStderr(),
+              "KLKey::SetImage() no image on input\nKLKey::GetImage() failed to get image\n");
+}
+
 // Only channels that change are kept and told; from a node: it and its later siblings. Two
 // nodes of one name fill each slot twice: the channel is incompletely filled and dropped.
 TEST_F(KLKeySetTest, ExtractKeys) {
