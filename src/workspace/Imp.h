@@ -94,6 +94,8 @@ class Imp : public KLStdImp {
     void DeletePlayblast();
     CueTime ReferenceEnd();
     CueTime PlayblastEnd();
+    // The picture shown at `t`: frame (t - offset).Frame() of the sequence at the workspace
+    // rate, truncated toward zero like every frame number; null outside [0, count).
     KLImageSGI* GetReference(CueTime t);
     KLImageSGI* GetPlayblast(CueTime t);
 
