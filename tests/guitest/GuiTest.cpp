@@ -1,0 +1,191 @@
+// GoogleTest first: the X headers define macros (None, Bool) that its names collide with.
+#include <gtest/gtest.h>
+
+#include "guitest/GuiTest.h"
+
+#include <X11/XKBlib.h>
+#include <X11/Xlib.h>
+#include <X11/extensions/XTest.h>
+#include <X11/keysym.h>
+#include <Xm/Xm.h>
+
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
+#include <thread>
+
+#include "toolkit/xm/KLXmGnome.h"
+
+namespace guitest {
+namespace {
+
+// Points DISPLAY at the fixture's display when the fixture file names one.
+void use_fixture_display() {
+    const char* file = getenv("CHIRRUP_DISPLAY_FILE");
+    if (!file) return;
+    std::ifstream in(file);
+    std::string display;
+    if (in >> display) setenv("DISPLAY", display.c_str(), 1);
+}
+
+void sync_and_process() {
+    XSync(GetDisplay(), False);
+    KLXmGnome::ProcessPending();
+}
+
+}  // namespace
+
+Widget Shell(const char* const* fallbackResources) {
+    static Widget shell = nullptr;
+    if (!shell) {
+        use_fixture_display();
+        static char name[] = "chirrup";
+        static char* argv[] = {name, nullptr};
+        int argc = 1;
+        shell = KLXmGnome::OpenApplication("chirrup", "Chirrup", &argc, argv, fallbackResources);
+    }
+    if (!shell) ADD_FAILURE() << "no display: run the window tests under the xvfb fixture";
+    return shell;
+}
+
+Display* GetDisplay() { return KLXmGnome::GetDisplay(); }
+
+bool WaitFor(const std::function<bool()>& done, double seconds) {
+    auto limit = std::chrono::steady_clock::now() + std::chrono::duration<double>(seconds);
+    XtAppContext context = KLXmGnome::AppContext();
+    while (true) {
+        if (done()) return true;
+        if (std::chrono::steady_clock::now() > limit) return done();
+        if (GetDisplay()) XFlush(GetDisplay());
+        if (context && XtAppPending(context)) {
+            XtAppProcessEvent(context, XtIMAll);
+        } else {
+            std::this_thread::sleep_for(std::chrono::milliseconds(2));
+        }
+    }
+}
+
+void Settle() {
+    for (int i = 0; i < 3; i++) {
+        sync_and_process();
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    sync_and_process();
+}
+
+bool WaitMapped(Widget widget, double seconds) {
+    return WaitFor(
+        [widget] {
+            if (!XtIsRealized(widget)) return false;
+            XWindowAttributes attributes;
+            return XGetWindowAttributes(XtDisplay(widget), XtWindow(widget), &attributes) &&
+                   attributes.map_state == IsViewable;
+        },
+        seconds);
+}
+
+void MoveTo(Widget widget, int x, int y) {
+    Dimension width = 0, height = 0;
+    XtVaGetValues(widget, XmNwidth, &width, XmNheight, &height, nullptr);
+    if (x < 0) x = width / 2;
+    if (y < 0) y = height / 2;
+    Position rootX = 0, rootY = 0;
+    XtTranslateCoords(widget, static_cast<Position>(x), static_cast<Position>(y), &rootX, &rootY);
+    XTestFakeMotionEvent(GetDisplay(), -1, rootX, rootY, CurrentTime);
+    Settle();
+}
+
+namespace {
+void modifier_keys(unsigned int modifiers, bool press) {
+    Display* d = GetDisplay();
+    const std::pair<unsigned int, KeySym> keys[] = {
+        {ShiftMask, XK_Shift_L}, {ControlMask, XK_Control_L}, {Mod1Mask, XK_Alt_L}};
+    for (auto& [mask, sym] : keys)
+        if (modifiers & mask) XTestFakeKeyEvent(d, XKeysymToKeycode(d, sym), press, CurrentTime);
+}
+}  // namespace
+
+void Press(int button, unsigned int modifiers) {
+    modifier_keys(modifiers, true);
+    XTestFakeButtonEvent(GetDisplay(), button, True, CurrentTime);
+    Settle();
+}
+
+void Release(int button, unsigned int modifiers) {
+    XTestFakeButtonEvent(GetDisplay(), button, False, CurrentTime);
+    modifier_keys(modifiers, false);
+    Settle();
+}
+
+void Click(Widget widget, int button, int x, int y, unsigned int modifiers) {
+    MoveTo(widget, x, y);
+    Press(button, modifiers);
+    Release(button, modifiers);
+}
+
+void DoubleClick(Widget widget, int button, int x, int y) {
+    MoveTo(widget, x, y);
+    Display* d = GetDisplay();
+    for (int i = 0; i < 2; i++) {
+        XTestFakeButtonEvent(d, button, True, CurrentTime);
+        XTestFakeButtonEvent(d, button, False, CurrentTime);
+    }
+    Settle();
+}
+
+void TypeKey(unsigned long keysym, unsigned int modifiers) {
+    Display* d = GetDisplay();
+    KeyCode code = XKeysymToKeycode(d, keysym);
+    if (code == 0) {
+        ADD_FAILURE() << "no key code for keysym " << keysym;
+        return;
+    }
+    // A keysym that is the shifted symbol of its key needs Shift.
+    if (XkbKeycodeToKeysym(d, code, 0, 0) != keysym && XkbKeycodeToKeysym(d, code, 0, 1) == keysym)
+        modifiers |= ShiftMask;
+    modifier_keys(modifiers, true);
+    XTestFakeKeyEvent(d, code, True, CurrentTime);
+    XTestFakeKeyEvent(d, code, False, CurrentTime);
+    modifier_keys(modifiers, false);
+    Settle();
+}
+
+void TypeText(const std::string& text) {
+    for (char c : text) {
+        KeySym sym = c == ' ' ? XK_space : c == '\n' ? XK_Return : static_cast<KeySym>(c);
+        if (c == '.') sym = XK_period;
+        if (c == '-') sym = XK_minus;
+        if (c == ':') sym = XK_colon;
+        TypeKey(sym);
+    }
+}
+
+unsigned long PixelAt(Widget widget, int x, int y) {
+    XSync(GetDisplay(), False);
+    XImage* image = XGetImage(XtDisplay(widget), XtWindow(widget), x, y, 1, 1, AllPlanes, ZPixmap);
+    if (!image) return ~0ul;
+    unsigned long pixel = XGetPixel(image, 0, 0);
+    XDestroyImage(image);
+    return pixel;
+}
+
+unsigned long NamedPixel(const char* colourName) {
+    Display* d = GetDisplay();
+    XColor exact, screen;
+    if (!XAllocNamedColor(d, DefaultColormap(d, DefaultScreen(d)), colourName, &screen, &exact))
+        return ~0ul;
+    return screen.pixel;
+}
+
+void Screenshot(const std::string& name) {
+    std::string dir = std::string(CHIRRUP_BINARY_DIR) + "/test-screens";
+    std::string command = "mkdir -p '" + dir + "' && import -display " +
+                          DisplayString(GetDisplay()) + " -window root '" + dir + "/" + name +
+                          ".png' 2>/dev/null";
+    XSync(GetDisplay(), False);
+    if (system(command.c_str()) != 0)
+        fprintf(stderr, "guitest: could not save the screenshot %s\n", name.c_str());
+}
+
+}  // namespace guitest
