@@ -1,0 +1,28 @@
+#pragma once
+
+#include "toolkit/CueTime.h"
+
+class CueSound;
+class KLTimer;
+
+// Sound output: plays a sound in step with a KLTimer, at a speed, forwards or backwards, and
+// scrubs. All static; one output stream per process. No X, no event loop: the device is fed
+// from its own thread.
+class KLSoundControl {
+  public:
+    // Speed of the next Play, 0.25 to 1.25 as the transport offers; pitch moves with speed.
+    static void PlaySpeed(float speed);
+    static float Speed();
+    // Plays `sound` from the timer's position (plus `offset`) for as long as the timer runs,
+    // forwards or backwards as the timer runs. Returns 1 when playing started, 0 when there
+    // is nothing to play or no output.
+    static int Play(CueSound* sound, KLTimer* timer, CueTime offset);
+    // Scrubbing: plays grains of `grainMs` milliseconds of `sound` at `*position` (a fraction
+    // 0..1 of the sound's length) whenever it moves, silent while it rests, until Stop or the
+    // timer stops.
+    static int PlayDrag(CueSound* sound, KLTimer* timer, int grainMs, const float* position);
+    // Stops whatever is playing.
+    static void Stop();
+    // Routes the audio library's own messages into the program's reports.
+    static void DisableAudioLibraryErrors();
+};
