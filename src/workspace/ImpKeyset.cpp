@@ -24,7 +24,7 @@
 #include "toolkit/KLString.h"
 #include "workspace/Ghost.h"
 #include "workspace/Imp.h"
-#include "workspace/SafeFile.h"
+#include "toolkit/SafeFile.h"
 
 namespace {
 

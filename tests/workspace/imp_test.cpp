@@ -19,7 +19,6 @@
 #include "scene/KLWireSource.h"
 #include "workspace/ConsoleGhost.h"
 #include "workspace/Imp.h"
-#include "workspace/SafeFile.h"
 
 using namespace wstest;
 using ::testing::ElementsAre;
@@ -109,28 +108,6 @@ TEST_F(ImpTest, TheConsoleAndBatchModeAnswerOnTheErrorStream) {
               "Could not locate [x].\nAssuming OK\n");
     EXPECT_EQ(answer, 1);
     EXPECT_THAT(ghost.calls, IsEmpty());
-}
-
-TEST_F(ImpTest, SafeFileReplacesOnCommitOnlyAndLeavesNoTemporaryFile) {
-    const std::string target = dir / "work/a.track";
-    WriteFile(target, "old\n");
-    ::chmod(target.c_str(), 0640);
-    SafeFile(target).Stream() << "abandoned";
-    EXPECT_EQ(ReadFile(target), "old\n");
-    {
-        SafeFile file(target);
-        ASSERT_TRUE(file.IsOpen());
-        file.Stream() << "new\n";
-        EXPECT_EQ(ReadFile(target), "old\n") << "nothing changes before Commit";
-        EXPECT_TRUE(file.Commit());
-    }
-    EXPECT_EQ(ReadFile(target), "new\n");
-    struct stat st;
-    ASSERT_EQ(::stat(target.c_str(), &st), 0);
-    EXPECT_EQ(st.st_mode & 0777, 0640u) << "the replaced file's permissions are kept";
-    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(dir / "work"), {}), 1);
-    EXPECT_FALSE(SafeFile(dir / "no-such-dir/a.keyset").IsOpen());
-    EXPECT_FALSE(SafeFile(dir.path()).IsOpen()) << "a directory is not a file";
 }
 
 // Two keysets named "mouth", the first over the whole face, the second on "lip" only; every
