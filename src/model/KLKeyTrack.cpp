@@ -244,7 +244,7 @@ void KLKeyTrack::Read(std::istream& in, KLKeySet* set) {
             break;
         if (n < 3 || !st.Matches("event") || !set)
             continue;
-        const CueTime t(st.ArgFloat(1), 0);
+        const CueTime t(st.ArgDouble(1), 0);
         const char* shapeName = st.ArgText(2);
         const int index = set->GetKeyShapeId(shapeName);
         KLKey* key = set->GetKeyShape(index);
