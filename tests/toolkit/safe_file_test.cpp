@@ -45,7 +45,9 @@ int InChild(F body) {
         body();
         ::_exit(0);
     }
-    int status = 0;
+    int status = -1;
+    if (pid < 0)
+        return status;
     ::waitpid(pid, &status, 0);
     return status;
 }
@@ -201,6 +203,7 @@ TEST_P(SafeFileTest, ASaveKilledWhileWritingLeavesNothingBehind) {
     int ready[2];
     ASSERT_EQ(::pipe(ready), 0);
     const pid_t pid = ::fork();
+    ASSERT_GE(pid, 0);  // never kill(-1): that would reach every process
     if (pid == 0) {
         SafeFile file(target_);
         const std::string block(1 << 16, 'w');
@@ -210,14 +213,16 @@ TEST_P(SafeFileTest, ASaveKilledWhileWritingLeavesNothingBehind) {
                 (void)!::write(ready[1], "x", 1);
         }
         ::pause();
+        ::_exit(0);
     }
+    ::close(ready[1]);
     char byte;
-    ASSERT_EQ(::read(ready[0], &byte, 1), 1);
-    ::kill(pid, SIGKILL);
+    const bool writing = ::read(ready[0], &byte, 1) == 1;
+    ::kill(pid, SIGKILL);  // pid > 0 here
     int status = 0;
     ::waitpid(pid, &status, 0);
     ::close(ready[0]);
-    ::close(ready[1]);
+    ASSERT_TRUE(writing);
     EXPECT_EQ(Slurp(target_), "old\n");
     if (GetParam()) {
         EXPECT_EQ(Listing(dir_), std::vector<std::string>{"a.track"});
