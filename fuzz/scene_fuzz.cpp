@@ -25,8 +25,8 @@ double walk(OrDagNode* node, int depth) {
         }
     }
     if (depth < 64 && node->asGroupNodePtr()) {
-        for (std::unique_ptr<OrDagNode> child(node->childNode()); child;
-             child.reset(child->nextNode())) {
+        for (std::unique_ptr<OrDagNode> child = node->childNode(); child;
+             child = child->nextNode()) {
             sum += walk(child.get(), depth + 1);
         }
     }
@@ -42,7 +42,7 @@ void run(const uint8_t* data, size_t size) {
     OrDagNode root(doc, -1);
     volatile double sink = walk(&root, 0);
     (void)sink;
-    std::unique_ptr<KLDagList> list(KLWire::BuildDagList(&root, 1));
+    std::unique_ptr<KLDagList> list = KLWire::BuildDagList(&root, 1);
     for (OrDagNode* n : list->nodes) {
         KLWire::UniqueDagName(&root, n->name());
     }

@@ -148,9 +148,9 @@ bool CueRecognizer::GuardedRecognize(const CueSound& sound) {
     return false;
 }
 
-CueRecognizer* CueRecognizer::GuardedClone() const {
-    CueRecognizer* copy = nullptr;
-    guard(*this, [&] { copy = Clone(); });
+std::unique_ptr<CueRecognizer> CueRecognizer::GuardedClone() const {
+    std::unique_ptr<CueRecognizer> copy;
+    guard(*this, [&] { copy.reset(Clone()); });
     return copy;
 }
 

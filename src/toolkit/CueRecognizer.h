@@ -1,6 +1,7 @@
 #pragma once
 
 #include <iosfwd>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -84,7 +85,7 @@ class CueRecognizer {
     bool GuardedWriteSettings(std::ostream& out) const;
     bool GuardedResetSettings();
     bool GuardedRecognize(const CueSound& sound);
-    CueRecognizer* GuardedClone() const;
+    std::unique_ptr<CueRecognizer> GuardedClone() const;
 
     // The recognizer's settings file "%s/%s.config": the data directory (CuePrefs::MiscDir)
     // when a project is set, else the current directory ".", and the recognizer's name.

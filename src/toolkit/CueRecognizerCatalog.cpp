@@ -144,7 +144,7 @@ const char* KLPlugCatalog::NextKey(const char* key) const {
     return nullptr;
 }
 
-CueRecognizer* CueRecognizerCatalog::FetchRecognizer(const char* name) const {
+std::unique_ptr<CueRecognizer> CueRecognizerCatalog::FetchRecognizer(const char* name) const {
     if (!name)
         return nullptr;
     if (!scanned_) {
@@ -155,11 +155,10 @@ CueRecognizer* CueRecognizerCatalog::FetchRecognizer(const char* name) const {
     const auto it = prototypes_.find(name);
     if (it == prototypes_.end())
         return nullptr;
-    CueRecognizer* copy = it->second->GuardedClone();
+    std::unique_ptr<CueRecognizer> copy = it->second->GuardedClone();
     if (copy && std::string(copy->Name()) != name) {
         // A clone of another kind would be filed under the wrong name in keyset files.
         KLWarning("Recognizer [%s] cloned itself as [%s]\n", name, copy->Name());
-        delete copy;
         return nullptr;
     }
     return copy;

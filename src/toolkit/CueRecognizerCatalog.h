@@ -11,7 +11,7 @@ class CueRecognizer;
 // exporting the entry symbols of CuePlugin.h. Keys are the recognizers' names in the order
 // found.
 class KLPlugCatalog {
-public:
+  public:
     KLPlugCatalog();
     virtual ~KLPlugCatalog();
 
@@ -27,7 +27,7 @@ public:
     const char* NextKey(const char* key) const;
     int Count() const { return int(order_.size()); }
 
-protected:
+  protected:
     struct Plugin;
     std::vector<std::string> order_;
     std::map<std::string, std::unique_ptr<CueRecognizer>> prototypes_;
@@ -36,11 +36,11 @@ protected:
 };
 
 class CueRecognizerCatalog : public KLPlugCatalog {
-public:
-    // A new recognizer of that name with default settings (the caller owns it), or null.
+  public:
+    // A new recognizer of that name with default settings, or null.
     // When no directory has been scanned yet, the default search path is scanned first, so
     // that keyset files name plug-ins in batch mode too.
-    CueRecognizer* FetchRecognizer(const char* name) const;
+    std::unique_ptr<CueRecognizer> FetchRecognizer(const char* name) const;
     // Adds a recognizer kind directly (built into the program, or for tests); takes
     // ownership of the prototype.
     void Register(std::unique_ptr<CueRecognizer> prototype);

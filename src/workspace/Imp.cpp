@@ -34,7 +34,7 @@ const int kCrashSignals[] = {SIGSEGV, SIGSYS,  SIGTERM, SIGBUS,  SIGFPE,
 Imp::Imp() {
     // The display settings reach the scene again at the next keyset clear or load, once the
     // entry has set the tesselation levels.
-    scene = make_scene(true);
+    scene = make_scene();
     duration = CueTime(0, 0, 5, 0, 0);
     for (int sig : kCrashSignals)
         OnSignal(sig, &Imp::save_on_crash, nullptr);
@@ -49,17 +49,13 @@ Imp::~Imp() {
     }
 }
 
-std::unique_ptr<KLScene> Imp::make_scene(bool deltaShape) {
+std::unique_ptr<KLScene> Imp::make_scene() {
     auto made = std::make_unique<KLScene>();
     if (evaluateDags)
         made->EvaluateDags();
     else
         made->DontEvaluateDags();
     made->SetDetail(tessU, tessV);
-    if (deltaShape)
-        made->DoDeltaShape();
-    made->HideTransparency();
-    made->HideShaders();
     return made;
 }
 

@@ -158,7 +158,7 @@ class Imp : public KLStdImp {
     void parse_recog_links(std::istream& in, const char* recognizer, const char* keyset);
     int read_wire_file(const char* name);
     // A new scene with the workspace's display settings.
-    std::unique_ptr<KLScene> make_scene(bool deltaShape);
+    std::unique_ptr<KLScene> make_scene();
     // Reports a load failure: Inform with "Dismiss" interactively, a line on the error
     // stream in batch mode.
     void report(const std::string& message);

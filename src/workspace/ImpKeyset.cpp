@@ -98,18 +98,20 @@ void Imp::parse_recog(std::istream& in, const char* recognizer, const char* keys
         report(KLFmt("Failed to find key set [%s].", keyset));
         return;  // the block is left to the top level, which skips its lines
     }
+    // A recognizer the keyset already holds is read again in place, not listed twice.
     CueRecognizer* r = set->GetRecognizer(recognizer);
-    const bool fetched = r == nullptr;
-    if (fetched)
-        r = recognizers.FetchRecognizer(recognizer);
+    std::unique_ptr<CueRecognizer> fetched;
+    if (!r) {
+        fetched = recognizers.FetchRecognizer(recognizer);
+        r = fetched.get();
+    }
     if (!r) {
         report(KLFmt("Failed to find recognizer plugin [%s].", recognizer));
         return;
     }
     r->GuardedReadSettings(in);
-    // A recognizer the keyset already holds is read again in place, not listed twice.
     if (fetched)
-        set->AddRecognizer(r);
+        set->AddRecognizer(std::move(fetched));
 }
 
 void Imp::parse_recog_links(std::istream& in, const char* recognizer, const char* keyset) {
@@ -152,7 +154,7 @@ int Imp::read_wire_file(const char* name) {
         return 0;
     }
     wireSource = std::move(source);
-    std::unique_ptr<OrDagNode> root(wireSource->RootNode());
+    std::unique_ptr<OrDagNode> root = wireSource->RootNode();
     KLWire::NukeBlendSurfaces(root.get());
 
     // The scene frames of the key shapes of all frame keysets, in keyset and key-shape order;
@@ -168,9 +170,8 @@ int Imp::read_wire_file(const char* name) {
         }
         KLInform("KEYSET %s.\n", set->Name());
         if (set->sourceFile) {
-            std::unique_ptr<OrDagNode> node(
-                KLWire::FetchDagNode(root.get(), set->sourceFile->c_str()));
-            if (node)
+            if (std::unique_ptr<OrDagNode> node =
+                    KLWire::FetchDagNode(root.get(), set->sourceFile->c_str()))
                 set->ExtractKeys(node.get());
             else
                 KLWarning("Keyset [%s]: no node [%s] in the wire file, no key channels.\n",
@@ -306,12 +307,12 @@ int Imp::VerifyKeysets() {
     // Every ordered pair of keysets: a clash is reported once from each side.
     for (int i = 0; i < keysetCount; ++i) {
         KLKeySet* a = keySets[i].get();
-        for (KLKeyChannel* ca : a->keyChannels) {
+        for (const auto& ca : a->keyChannels) {
             for (int j = 0; j < keysetCount; ++j) {
                 if (j == i)
                     continue;
                 KLKeySet* b = keySets[j].get();
-                for (KLKeyChannel* cb : b->keyChannels) {
+                for (const auto& cb : b->keyChannels) {
                     if (ca->channel != cb->channel || !ca->name || !cb->name ||
                         *ca->name != *cb->name)
                         continue;
@@ -339,7 +340,7 @@ void Imp::clear_keyset_data() {
     }
     keysetCount = 0;
     markTrack = std::make_unique<KLMarkTrack>();
-    scene = make_scene(false);
+    scene = make_scene();
     wireSource.reset();
     wireFile.clear();
     KLWire::EmptyDumpster();
@@ -371,7 +372,7 @@ int Imp::SaveKeyset(const char* name) {
         out << "end\n\n";
         // Oldest first, so that reading the file back (each one put first) keeps the order.
         for (auto it = set->recognizers.rbegin(); it != set->recognizers.rend(); ++it) {
-            CueRecognizer* r = *it;
+            const CueRecognizer* r = it->get();
             const std::string rName = KLQuote(r->Name());
             out << "begin recognizer " << rName << " " << setName << "\n";
             r->GuardedWriteSettings(out);

@@ -62,9 +62,9 @@ TEST_F(KLKeySetTest, Lookups) {
               (std::vector<int>{1, -1, 1, -1, -1}));
     EXPECT_TRUE(set.GetKeyShapeFrame(2) == 20.0f && set.GetKeyShapeFrame(4) == -1.0f);
     EXPECT_TRUE(!set.GetKeyShape(-1) && !set.GetKeyShapeName(4) && !set.GetKeyShapeImage(4));
-    auto* later = new KLKeyChannel("jaw", 3, 2);
-    for (auto* c : {new KLKeyChannel("jaw", 3, 2), new KLKeyChannel("jaw", 4, 2), later})
-        set.AddKeyChannel(c);
+    set.AddKeyChannel(std::make_unique<KLKeyChannel>("jaw", 3, 2));
+    set.AddKeyChannel(std::make_unique<KLKeyChannel>("jaw", 4, 2));
+    KLKeyChannel* later = set.AddKeyChannel(std::make_unique<KLKeyChannel>("jaw", 3, 2));
     EXPECT_EQ(set.GetKeyChannel("jaw", 3), later);
     EXPECT_TRUE(!set.GetKeyChannel("jaw", 5) && !set.GetKeyChannel("lip", 3));
 }

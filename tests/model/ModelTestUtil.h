@@ -84,7 +84,7 @@ class ModelTest : public ::testing::Test {
     void OpenFace() {
         wire = std::make_unique<KLWireSource>(File("face.gltf").c_str());
         ASSERT_TRUE(wire->Valid()) << wire->ErrorText();
-        root.reset(wire->RootNode());
+        root = wire->RootNode();
     }
     OrDagNode* Node(const char* name) {
         nodes.emplace_back(KLWire::FetchDagNode(root.get(), name));

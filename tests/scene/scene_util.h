@@ -97,13 +97,13 @@ struct OpenScene {
         KLWire::Initialize();
         CueTime::default_fps = 30;
         source = std::make_unique<KLWireSource>(path.c_str());
-        root.reset(source->RootNode());  // null when the file is not a valid scene
+        root = source->RootNode();  // null when the file is not a valid scene
         return source->Valid() ? ::testing::AssertionSuccess()
                                : ::testing::AssertionFailure() << source->ErrorText();
     }
     // The node named `name` at or below `below` (the root when null); null when not found.
     Node Fetch(const char* name, OrDagNode* below = nullptr) const {
-        return Node(KLWire::FetchDagNode(below ? below : root.get(), name));
+        return KLWire::FetchDagNode(below ? below : root.get(), name);
     }
     // Channel `channel` of node `name` at `frame`; a failure and NaN when there is none.
     double Eval(const char* name, int channel, double frame) const {

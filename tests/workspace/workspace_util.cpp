@@ -201,8 +201,8 @@ std::optional<double> EvalChannel(const std::string& path, const char* node, int
     KLWireSource source(path.c_str());
     if (!source.Valid())
         return std::nullopt;
-    std::unique_ptr<OrDagNode> root(source.RootNode());
-    std::unique_ptr<OrDagNode> found(KLWire::FetchDagNode(root.get(), node));
+    std::unique_ptr<OrDagNode> root = source.RootNode();
+    std::unique_ptr<OrDagNode> found = KLWire::FetchDagNode(root.get(), node);
     OrChannel* c = found ? KLWire::FindChannel(found.get(), channel) : nullptr;
     return c ? std::optional<double>(c->eval(frame)) : std::nullopt;
 }
