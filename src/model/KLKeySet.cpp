@@ -193,7 +193,7 @@ void KLKeySet::read_block(std::istream& in) {
 std::string KLKeySet::picture_path(int i, const char* pixDir) const {
     const int number = kind == 1 ? whole_frame(keyShapes[i]->frame) : i;
     const std::string file = KLFmt("%s.%04d.sgi", Name() ? Name() : "", number);
-    return pixDir ? std::string(pixDir) + "/" + file : file;
+    return KLFilePath::Join(pixDir, file.c_str());
 }
 
 // Writes "    key <name> <frame> <picture>" per key shape, names quoted when they hold a blank

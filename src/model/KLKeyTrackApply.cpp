@@ -10,6 +10,7 @@
 #include "model/KLKeyTrack.h"
 #include "scene/KLChannel.h"
 #include "scene/KLKeyFrameList.h"
+#include "scene/KLSplineChannel.h"
 #include "scene/KLWire.h"
 #include "scene/KLWireSetting.h"
 #include "scene/KLWireSource.h"

@@ -7,6 +7,7 @@
 #include "toolkit/CuePrefs.h"
 #include "toolkit/CueStatement.h"
 #include "toolkit/KLErrHandler.h"
+#include "toolkit/KLFilePath.h"
 #include "toolkit/KLString.h"
 
 namespace {
@@ -156,5 +157,5 @@ std::unique_ptr<CueRecognizer> CueRecognizer::GuardedClone() const {
 
 std::string CueRecognizer::ConfigFileName() const {
     const char* dir = CuePrefs::MiscDir();
-    return KLFmt("%s/%s.config", dir ? dir : ".", Name());
+    return KLFilePath::Join(dir ? dir : ".", KLFmt("%s.config", Name()).c_str());
 }

@@ -51,7 +51,7 @@ class CueRecognizer {
     int shown = 0;  // 1 while the settings panel is up
     // Time between two results; ResetSettings restores defaultStep (one frame at 30 frames
     // per second unless the plug-in sets another).
-    CueTime defaultStep = CueTime::FromTicks(CueTime::kTicksPerSecond / 30);
+    CueTime defaultStep = CueTime::FromTicks(CueTime::kTicksPerSecond / CueTime::kDefaultFps);
     CueTime step = defaultStep;
     std::vector<Result> results;
     std::vector<Target> targets;

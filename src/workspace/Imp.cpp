@@ -13,7 +13,6 @@
 #include "scene/KLKeyFrameList.h"
 #include "scene/KLScene.h"
 #include "scene/KLWireSource.h"
-#include "toolkit/CuePrefs.h"
 #include "toolkit/CueSound.h"
 #include "toolkit/KLImageSGI.h"
 #include "toolkit/OnSignal.h"
@@ -59,16 +58,6 @@ std::unique_ptr<KLScene> Imp::make_scene() {
     return made;
 }
 
-const char* Imp::GetPixDirectory() {
-    return CuePrefs::PixDir();
-}
-const char* Imp::GetWireDirectory() {
-    return CuePrefs::WireDir();
-}
-const char* Imp::GetDataDirectory() {
-    return CuePrefs::MiscDir();
-}
-
 void Imp::Inform(const char* message, const char* button) {
     if (batchMode)
         ConsoleGhost::Instance().Inform(message, button);
@@ -90,7 +79,7 @@ void Imp::report(const std::string& message) {
 }
 
 void Imp::SetFps(int n) {
-    fps = n > 0 ? n : 30;
+    fps = n > 0 ? n : CueTime::kDefaultFps;
     CueTime::default_fps = fps;
 }
 

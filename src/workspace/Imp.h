@@ -47,10 +47,7 @@ class Imp : public KLStdImp {
     Imp();
     ~Imp() override;
 
-    // --- KLStdImp
-    const char* GetPixDirectory() override;
-    const char* GetWireDirectory() override;
-    const char* GetDataDirectory() override;
+    // --- KLStdImp (the directories are the base's: the preference directories)
     float DefaultKeyFrame() override { return wireFrame; }
     void SetTrackModified() override { trackModified = 1; }
     int KeyFramePreparation() override { return geometryActive; }
