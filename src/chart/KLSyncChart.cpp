@@ -151,6 +151,8 @@ KLSyncChart::KLSyncChart(Widget parent, const char* name) : KLFiend(parent, name
     font = std::make_unique<KLChartText>(form, &found);
     if (!found)
         std::cerr << "Font failed" << std::endl;
+    // The pan bar shows the whole chart from the start, not the scroll bar's own default.
+    set_scrollbar_values();
 }
 
 KLSyncChart::~KLSyncChart() {
