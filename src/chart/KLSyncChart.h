@@ -7,6 +7,7 @@
 #include <X11/Xlib.h>
 
 #include "chart/KLChartGeometry.h"
+#include "chart/KLKeyDrawing.h"
 #include "chart/KLWaveSummary.h"
 #include "toolkit/CueTime.h"
 #include "toolkit/xm/KLFiend.h"
@@ -112,6 +113,7 @@ class KLSyncChart : public KLFiend {
     long sampleCount = 0;
     float peak = 0.0f;
     KLWaveSummary waveSummary;  // min/max summaries of `samples`
+    KLKeyDrawing keyDrawing;    // the key layer of the last redraw
     KLFiendCallback showKeyframeCallback, showKeyframeImageCallback, showReferenceImageCallback;
     std::unique_ptr<KLChartText> font;  // the chart's text font
 
@@ -142,11 +144,8 @@ class KLSyncChart : public KLFiend {
     void draw_grid();
     void draw_sound();
     void draw_keys();
-    void draw_key_curve(Drawable d, const KLKeyEvent* previous, int px, const KLKeyEvent* event,
-                        int x);
     void draw_marks();
     void draw_indicator();
-    void draw_key_letter(Drawable d, const KLKeyEvent* event, int x);
     void full_expose() { expose(nullptr); }
     bool drawable() const { return window && chartPixmap && gc; }
 
