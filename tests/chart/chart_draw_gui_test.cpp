@@ -5,6 +5,7 @@
 
 #include <cmath>
 
+#include "chart/KLKeyDrawing.h"
 #include "model/InterpEase.h"
 
 using charttest::ChartWindow;
@@ -180,7 +181,44 @@ TEST_F(ChartDraw, ZoomButtonsAndPanBarMoveTheVisiblePart) {
         [this] { return chart->geometry.zoomStart == 0.0f && chart->geometry.zoomEnd == 1.0f; }));
 }
 
+// The sticks and ticks are filled as rectangles: they must cover exactly the pixels of the
+// 3-pixel-wide butt-capped lines they stand for.
+TEST_F(ChartDraw, StickRectanglesAreTheWideLines) {
+    Display* d = guitest::GetDisplay();
+    const auto& g = chart->geometry;
+    Pixmap lines = XCreatePixmap(d, XtWindow(chart->drawingArea), 60, g.height, 1);
+    Pixmap rects = XCreatePixmap(d, XtWindow(chart->drawingArea), 60, g.height, 1);
+    GC gc = XCreateGC(d, lines, 0, nullptr);
+    for (float value : {0.0f, 0.3f, 1.0f, 1.7f, 2.0f}) {
+        for (Pixmap p : {lines, rects}) {
+            XSetForeground(d, gc, 0);
+            XFillRectangle(d, p, gc, 0, 0, 60, g.height);
+        }
+        XSetForeground(d, gc, 1);
+        XSetLineAttributes(d, gc, 3, LineSolid, CapButt, JoinRound);
+        const int x = 30, t = g.TickRow(value);
+        XDrawLine(d, lines, gc, x, g.lowerBandTop, x, g.textBaseline);
+        XDrawLine(d, lines, gc, x - 4, t, x + 5, t);
+        std::vector<KLChartRect> list;
+        KLKeyDrawing::StickRects(g, x, value, list);
+        XFillRectangles(d, rects, gc, reinterpret_cast<XRectangle*>(list.data()), int(list.size()));
+        XImage* a = XGetImage(d, lines, 0, 0, 60, g.height, 1, XYPixmap);
+        XImage* b = XGetImage(d, rects, 0, 0, 60, g.height, 1, XYPixmap);
+        int differ = 0;
+        for (int y = 0; y < int(g.height); y++)
+            for (int i = 0; i < 60; i++)
+                differ += XGetPixel(a, i, y) != XGetPixel(b, i, y);
+        EXPECT_EQ(differ, 0) << "value " << value;
+        XDestroyImage(a);
+        XDestroyImage(b);
+    }
+    XFreeGC(d, gc);
+    XFreePixmap(d, lines);
+    XFreePixmap(d, rects);
+}
+
 TEST(ChartResources, ColoursComeFromTheResourceDatabase) {
+    ASSERT_TRUE(guitest::Shell());
     XrmDatabase db = XtDatabase(guitest::GetDisplay());
     XrmPutLineResource(&db, "*colourChart.keyColor: #00ff00");
     XrmPutLineResource(&db, "*colourChart.regionColor: #0000ff");
