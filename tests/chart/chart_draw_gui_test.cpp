@@ -181,6 +181,18 @@ TEST_F(ChartDraw, ZoomButtonsAndPanBarMoveTheVisiblePart) {
         [this] { return chart->geometry.zoomStart == 0.0f && chart->geometry.zoomEnd == 1.0f; }));
 }
 
+TEST_F(ChartDraw, ShrinkingAndGrowingRepaintAtTheNewSize) {
+    track->InsertKey(1, Seconds(5), keyset->GetKeyShape(1), 1, 1.0f);
+    chart->SetKeyTrack(track.get());
+    for (int width : {500, 700}) {
+        XtVaSetValues(window->shell, XmNwidth, width, nullptr);
+        ASSERT_TRUE(guitest::WaitFor(
+            [&] { return chart->geometry.width == unsigned(width) && !chart->needRedraw; }));
+        EXPECT_EQ(chart->waveSegments.size(), size_t(width));
+        EXPECT_EQ(Pixel(width / 2, 170), chart->keyColor) << width;
+    }
+}
+
 // The sticks and ticks are filled as rectangles: they must cover exactly the pixels of the
 // 3-pixel-wide butt-capped lines they stand for.
 TEST_F(ChartDraw, StickRectanglesAreTheWideLines) {

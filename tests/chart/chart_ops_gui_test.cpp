@@ -222,6 +222,11 @@ TEST_F(ChartOps, SoundsThatAreOddStillShow) {
         EXPECT_TRUE(std::isfinite(chart->peak));
     }
     EXPECT_EQ(chart->waveSegmentCount, 0);
+    // Longer than the time line holds (2^31 ticks is about 99 hours): the duration saturates.
+    auto endless = charttest::Sound(std::vector<float>(400000, 0.5f), 1.0);
+    chart->SetSound(endless.get());
+    EXPECT_EQ(chart->geometry.duration, CueTime::FromTicks(INT32_MAX));
+    EXPECT_EQ(chart->waveSegmentCount, int(chart->geometry.width));
     chart->SetSound(nullptr);
 }
 
