@@ -156,10 +156,10 @@ KLSyncChart::KLSyncChart(Widget parent, const char* name) : KLFiend(parent, name
 }
 
 KLSyncChart::~KLSyncChart() {
-    if (scrubTimer && dragMode == 4)
-        scrub(0, 2);
-    if (hitKey && keyTrack)
-        hitKey = nullptr;
+    // A chart that goes while scrubbing stops the sound without drawing (its window is gone).
+    if (dragMode == 4)
+        stop_scrub();
+    hitKey = nullptr;
     hitMark = nullptr;
     font.reset();
     free_pixmaps();

@@ -152,6 +152,7 @@ class KLSyncChart : public KLFiend {
     // Pointer and keyboard (KLSyncChartInput.cpp).
     void input(XEvent* event);
     void scrub(int x, int phase);
+    void stop_scrub();
     void drag_1(int x, int phase);
     void drag_key(int x, int phase);
     void drag_keystick(int y, int phase);
@@ -182,7 +183,7 @@ class KLSyncChart : public KLFiend {
     static CueTime lastTypedTime;  // time of the last typed mark
     static int lastTypedX;         // indicator column when it was typed (-2: none yet)
     static float scrubPosition;    // play position while scrubbing, 0..1 of the sound
-    static KLTimer* scrubTimer;    // the scrub's timer (owned while scrubbing)
+    static std::unique_ptr<KLTimer> scrubTimer;  // the scrub's timer, while scrubbing
 
     int dragX_ = -1;        // column of the object drawn while dragging, -1 none
     int regionAnchor_ = 0;  // column where the region sweep started
