@@ -119,6 +119,17 @@ int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, Cu
     if (!keySet)
         return 1;
     const size_t eventCount = size_t(events.Count());
+    // glTF has no time before 0: the scene cuts every stored curve there.
+    int early = 0;
+    for (const KLKeyEvent* event : events) {
+        if (event->time >= start && event->time <= end && (event->time + offset).Ticks() < 0)
+            ++early;
+    }
+    if (early > 0)
+        KLWarning(
+            "Keyset [%s]: %d key%s before time 0 dropped; each curve starts at 0 with its "
+            "value there.\n",
+            keySet->Name() ? keySet->Name() : "", early, early == 1 ? "" : "s");
 
     if (keySet->kind == 1) {
         for (KLKeyChannel* kc : keySet->keyChannels) {

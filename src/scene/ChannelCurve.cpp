@@ -191,3 +191,45 @@ void ChannelCurve::Merge(const Key& key) {
         keys_.insert(it, key);
     }
 }
+
+size_t ChannelCurve::TrimBefore(double seconds) {
+    size_t first = 0;
+    while (first < keys_.size() && keys_[first].time < seconds - kSameTime) {
+        ++first;
+    }
+    if (first == 0) {
+        return 0;
+    }
+    if (first == keys_.size()) {  // every key is earlier: the curve holds its last value
+        Key hold = keys_.back();
+        hold.time = seconds;
+        hold.in = hold.out = kLinear;
+        keys_.assign(1, hold);
+        return first;
+    }
+    // The kept keys' slopes as they are now, before their neighbours change.
+    Key& next = keys_[first];
+    double in = InSlope(first), out = OutSlope(first);
+    next.in = kExplicit;
+    next.inSlope = in;
+    if (next.out == kSmooth || (next.out == kLinear && first + 1 == keys_.size())) {
+        next.out = kExplicit;
+        next.outSlope = out;
+    }
+    bool atCut = std::fabs(next.time - seconds) <= kSameTime;
+    Key cut;
+    if (!atCut) {
+        cut.time = seconds;
+        cut.value = Evaluate(seconds);
+        cut.in = kExplicit;
+        cut.inSlope = SlopeAt(seconds, false);
+        bool step = keys_[first - 1].out == kStep;
+        cut.out = step ? kStep : kExplicit;
+        cut.outSlope = step ? 0.0 : SlopeAt(seconds, true);
+    }
+    keys_.erase(keys_.begin(), keys_.begin() + long(first));
+    if (!atCut) {
+        keys_.insert(keys_.begin(), cut);
+    }
+    return first;
+}

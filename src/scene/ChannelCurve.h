@@ -54,6 +54,10 @@ class ChannelCurve : public OrChannel {
 
     // Inserts the key or replaces the one at the same time (within half a microsecond).
     void Merge(const Key& key);
+    // Cuts the curve at `seconds`: keys before it are dropped and, when there were some, a key
+    // at `seconds` holds the curve's value there; the curve from `seconds` on is unchanged
+    // (slopes that depended on a dropped key are made explicit). Returns the keys dropped.
+    size_t TrimBefore(double seconds);
 
   private:
     double segment(size_t i, double seconds) const;  // inside the segment from key i to i + 1

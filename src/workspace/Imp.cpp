@@ -15,6 +15,7 @@
 #include "scene/KLWireSource.h"
 #include "toolkit/CuePrefs.h"
 #include "toolkit/CueSound.h"
+#include "toolkit/KLErrHandler.h"
 #include "toolkit/KLImageSGI.h"
 #include "toolkit/OnSignal.h"
 #include "workspace/ConsoleGhost.h"
@@ -94,6 +95,11 @@ void Imp::report(const std::string& message) {
 }
 
 void Imp::SetFps(int n) {
+    if (n > kMaxFps) {
+        KLWarning("Frame rate %d is above the highest supported, %d: %d is used.\n", n, kMaxFps,
+                  kMaxFps);
+        n = kMaxFps;
+    }
     fps = n > 0 ? n : 30;
     CueTime::default_fps = fps;
 }
