@@ -126,10 +126,11 @@ int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, Cu
             ++early;
     }
     if (early > 0)
-        KLWarning(
-            "Keyset [%s]: %d key%s before time 0 dropped; each curve starts at 0 with its "
-            "value there.\n",
-            keySet->Name() ? keySet->Name() : "", early, early == 1 ? "" : "s");
+        imp.Inform(KLFmt("Keyset [%s]: %d key%s before time 0 dropped; each curve starts at 0 "
+                         "with its value there.",
+                         keySet->Name() ? keySet->Name() : "", early, early == 1 ? "" : "s")
+                       .c_str(),
+                   "Dismiss");
 
     if (keySet->kind == 1) {
         for (KLKeyChannel* kc : keySet->keyChannels) {

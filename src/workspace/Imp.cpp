@@ -15,8 +15,9 @@
 #include "scene/KLWireSource.h"
 #include "toolkit/CuePrefs.h"
 #include "toolkit/CueSound.h"
-#include "toolkit/KLErrHandler.h"
 #include "toolkit/KLImageSGI.h"
+#include "toolkit/KLString.h"
+#include "toolkit/KLString.h"
 #include "toolkit/OnSignal.h"
 #include "workspace/ConsoleGhost.h"
 #include "workspace/Ghost.h"
@@ -96,8 +97,12 @@ void Imp::report(const std::string& message) {
 
 void Imp::SetFps(int n) {
     if (n > kMaxFps) {
-        KLWarning("Frame rate %d is above the highest supported, %d: %d is used.\n", n, kMaxFps,
-                  kMaxFps);
+        const std::string message = KLFmt(
+            "Frame rate %d is above the highest supported, %d: %d is used.", n, kMaxFps, kMaxFps);
+        if (batchMode || !theGhost)
+            std::cerr << message << std::endl;
+        else
+            report(message);
         n = kMaxFps;
     }
     fps = n > 0 ? n : 30;
