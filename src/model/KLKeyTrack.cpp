@@ -248,7 +248,7 @@ void KLKeyTrack::Read(std::istream& in, KLKeySet* set) {
             continue;
         // Times beyond what a CueTime holds (about +-99 hours) are reported and skipped, not
         // clamped onto the end of the range.
-        const double frames = st.ArgFloat(1);
+        const double frames = st.ArgDouble(1);
         const int rate = CueTime::default_fps > 0 ? CueTime::default_fps : 30;
         const double ticks = frames * CueTime::kTicksPerSecond / rate;
         if (!(std::fabs(ticks) < double(std::numeric_limits<int32_t>::max()))) {

@@ -57,7 +57,7 @@ void KLMarkTrack::Read(std::istream& in) {
         const char label = st.ArgText(2)[0];
         if (label == '\0')
             continue;
-        InsertMark(CueTime(st.ArgFloat(1), 0), label);
+        InsertMark(CueTime(st.ArgDouble(1), 0), label);
     }
 }
 

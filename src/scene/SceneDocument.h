@@ -53,7 +53,7 @@ class SceneDocument {
     double RestValue(int node, int channel) const;
 
     // Writes the scene to `path` (.glb by that ending, else .gltf with embedded buffers)
-    // through a temporary file in the same directory renamed into place.
+    // through a SafeFile: the old file or the whole new one, never half of it.
     bool Store(const std::string& path, std::string* error);
 
     const std::string& path() const { return path_; }

@@ -1,13 +1,9 @@
 #include "scene/SceneSerializer.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <cstring>
-#include <fstream>
+#include <cctype>
 #include <vector>
+
+#include "toolkit/SafeFile.h"
 
 namespace {
 bool write_image_bytes(const std::string*, const std::string*, const tinygltf::Image* image, bool,
@@ -21,46 +17,23 @@ bool write_image_bytes(const std::string*, const std::string*, const tinygltf::I
     return true;
 }
 
-// Serialises `model` into a temporary file beside `path`, flushed to disk, then renamed over
-// `path`; on any failure the temporary file is removed and `path` is left as it was.
-bool write_atomically(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binary,
-                      const std::string& path, std::string* error) {
-    std::string tmpl = path + ".XXXXXX";
-    std::vector<char> name(tmpl.begin(), tmpl.end());
-    name.push_back('\0');
-    int fd = mkstemp(name.data());
-    if (fd < 0) {
-        *error = "Cannot write scene file [" + path + "]: " + std::strerror(errno);
+// Serialises `model` through a SafeFile: `path` is either the old file or the whole new one.
+bool write_safely(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binary,
+                  const std::string& path, std::string* error) {
+    SafeFile file(path);
+    if (!file.IsOpen()) {
+        *error = "Cannot write scene file [" + path + "]: " + file.ErrorText();
         return false;
     }
-    mode_t mask = umask(0);
-    umask(mask);
-    fchmod(fd, 0666 & ~mask);
-    bool ok;
-    {
-        std::ofstream out(name.data(), std::ios::binary | std::ios::trunc);
-        ok = out.is_open() && writer->WriteGltfSceneToStream(model, out, !binary, binary);
-        out.flush();
-        ok = ok && out.good();
+    if (!writer->WriteGltfSceneToStream(model, file.Stream(), !binary, binary)) {
+        *error = "Cannot write scene file [" + path + "]: the scene could not be serialised";
+        return false;  // the SafeFile removes what was written
     }
-    int saved = ok ? 0 : (errno ? errno : EIO);
-    if (ok && fsync(fd) != 0) {
-        ok = false;
-        saved = errno;
+    if (!file.Commit()) {
+        *error = "Cannot write scene file [" + path + "]: " + file.ErrorText();
+        return false;
     }
-    if (::close(fd) != 0 && ok) {
-        ok = false;
-        saved = errno;
-    }
-    if (ok && std::rename(name.data(), path.c_str()) != 0) {
-        ok = false;
-        saved = errno;
-    }
-    if (!ok) {
-        ::unlink(name.data());
-        *error = "Cannot write scene file [" + path + "]: " + std::strerror(saved ? saved : EIO);
-    }
-    return ok;
+    return true;
 }
 }  // namespace
 
@@ -120,5 +93,5 @@ bool SceneSerializer::Write(tinygltf::Model& model, const std::string& path, std
     }
     tinygltf::TinyGLTF writer;
     writer.SetImageWriter(write_image_bytes, nullptr);
-    return write_atomically(&writer, &model, IsBinaryPath(path), path, error);
+    return write_safely(&writer, &model, IsBinaryPath(path), path, error);
 }

@@ -7,8 +7,8 @@
 // Serialises a model into a glTF file: `path` ending in ".glb" (any case) gives a binary file
 // whose buffer 0 is the binary chunk, anything else a .gltf with its buffers embedded as data
 // URIs. Images read as bytes are written back as the same bytes; images named by a file keep
-// their uri. The file is written through a temporary file in the same directory, flushed to
-// disk and renamed into place, so that `path` is either the old file or the whole new one.
+// their uri. The file is written through a SafeFile, so that `path` is either the old file or
+// the whole new one and no temporary file is left behind.
 class SceneSerializer {
   public:
     static bool IsBinaryPath(const std::string& path);

@@ -28,7 +28,7 @@ class SceneWriter {
   public:
     explicit SceneWriter(SceneDocument& doc);
     // `path` ending in ".glb" gives a binary file, anything else a .gltf with embedded
-    // buffers; written to a temporary file in the same directory and renamed into place. False
+    // buffers; written through a SafeFile (the old file or the whole new one, never half). False
     // with `error` set (naming the file, and the node when a curve cannot be written), and the
     // file untouched, on failure.
     bool Write(const std::string& path, std::string* error);

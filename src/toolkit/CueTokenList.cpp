@@ -68,5 +68,10 @@ float CueTokenList::ArgFloat(int i) const {
         return FLT_MAX;
     if (v < -FLT_MAX)
         return -FLT_MAX;
-    return float(v);
+    if (v == 0.0)
+        return float(v);  // also what is not a number at all
+    // Read as a float straight away: going through a double can round twice and miss the
+    // float that the text was written from.
+    const float f = std::strtof(ArgText(i), nullptr);
+    return std::isinf(f) ? std::copysign(FLT_MAX, f) : f;
 }

@@ -1,12 +1,12 @@
 #include "toolkit/KLImageSGI.h"
 
-#include <unistd.h>
-
 #include <OpenImageIO/imagebuf.h>
 #include <OpenImageIO/imagebufalgo.h>
 #include <OpenImageIO/imageio.h>
 #include <algorithm>
 #include <cstdio>
+
+#include "toolkit/SafeFile.h"
 
 namespace {
 
@@ -142,9 +142,11 @@ bool KLImageSGI::Store(const char* path, std::string* error) const {
         set_error(error, prefix + "the picture is empty");
         return false;
     }
-    // Written beside the target and renamed over it, so that a failed write never leaves a
-    // half-written picture under the real name.
-    const std::string temp = name + ".tmp" + std::to_string(getpid());
+    SafeFile file(name);
+    if (!file.IsOpen()) {
+        set_error(error, prefix + file.ErrorText());
+        return false;
+    }
     auto out = OIIO::ImageOutput::create("sgi");
     if (!out) {
         set_error(error, prefix + oiio_message(OIIO::geterror(), "no SGI writer"));
@@ -152,16 +154,16 @@ bool KLImageSGI::Store(const char* path, std::string* error) const {
     }
     OIIO::ImageSpec layout(width_, height_, 4, OIIO::TypeDesc::UINT8);
     layout.alpha_channel = 3;
-    bool ok = out->open(temp, layout) && out->write_image(OIIO::TypeDesc::UINT8, pixels_.data());
+    // The image library writes only to a named file: it writes into the SafeFile's own.
+    bool ok = out->open(file.DescriptorPath(), layout) &&
+              out->write_image(OIIO::TypeDesc::UINT8, pixels_.data());
     ok = out->close() && ok;
     if (!ok) {
         set_error(error, prefix + oiio_message(out->geterror(), "write error"));
-        std::remove(temp.c_str());
         return false;
     }
-    if (std::rename(temp.c_str(), name.c_str()) != 0) {
-        set_error(error, prefix + "cannot rename the written file into place");
-        std::remove(temp.c_str());
+    if (!file.Commit()) {
+        set_error(error, prefix + file.ErrorText());
         return false;
     }
     return true;

@@ -178,8 +178,13 @@ void Imp::UIClearErrorFlag() {
 }
 
 void Imp::save_on_crash(int signal, void* /*data*/) {
-    if (::theImp.keysetCount == 0)
-        return;  // nothing to save: the signal takes its course
+    // One save at a time: a second call (a second signal, a fault inside the save) returns,
+    // and its signal ends the program. The files are written through SafeFile, so that an
+    // interrupted save leaves each of them complete or absent.
+    static volatile std::sig_atomic_t saving = 0;
+    if (saving || ::theImp.keysetCount == 0)
+        return;  // the signal takes its course
+    saving = 1;
     std::cerr << "EMERGENCY SAVE ON SIGNAL " << signal << " ... " << std::flush;
     ::theImp.SaveKeyset("_m.keyset");
     if (::theImp.sound)

@@ -6,6 +6,7 @@
 #include <iostream>
 #include <vector>
 
+#include "model/FloatText.h"
 #include "model/KLKeySet.h"
 #include "model/KLKeyTrack.h"
 #include "model/KLMarkTrack.h"
@@ -22,9 +23,9 @@
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLFilePath.h"
 #include "toolkit/KLString.h"
+#include "toolkit/SafeFile.h"
 #include "workspace/Ghost.h"
 #include "workspace/Imp.h"
-#include "workspace/SafeFile.h"
 
 namespace {
 
@@ -350,15 +351,15 @@ int Imp::SaveKeyset(const char* name) {
         return 0;
     std::ostream& out = file.Stream();
 
-    out << "wire " << KLFilePath::TrimHead(wireFile.c_str(), GetWireDirectory()) << " " << wireFrame
-        << "\n\n";
+    out << "wire " << KLQuote(KLFilePath::TrimHead(wireFile.c_str(), GetWireDirectory())) << " "
+        << FloatText(wireFrame) << "\n\n";
     for (int i = 0; i < keysetCount; ++i) {
         KLKeySet* set = keySets[i].get();
         const std::string setName = KLQuote(set->Name());
         if (set->kind == 2) {
             out << "begin shapeset " << setName << " "
                 << KLQuote(set->nodeName ? set->nodeName->c_str() : "") << " " << set->channelIndex
-                << " " << set->lowValue << " " << set->highValue << "\n";
+                << " " << FloatText(set->lowValue) << " " << FloatText(set->highValue) << "\n";
             set->Write(out);
             out << "end\n\n";
             continue;

@@ -13,7 +13,7 @@
 #include "toolkit/KLString.h"
 #include "workspace/Ghost.h"
 #include "workspace/Imp.h"
-#include "workspace/SafeFile.h"
+#include "toolkit/SafeFile.h"
 
 namespace {
 

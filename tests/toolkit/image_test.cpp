@@ -3,6 +3,8 @@
 
 #include <OpenImageIO/imageio.h>
 #include <fstream>
+#include <optional>
+#include <sstream>
 
 #include "toolkit/KLImageSGI.h"
 #include "toolkit_test_util.h"
@@ -26,6 +28,11 @@ class ImageTest : public TempDirTest {
         EXPECT_TRUE(out && out->open(path, layout) &&
                     out->write_image(OIIO::TypeDesc::UINT8, pixels.data()) && out->close());
         return path;
+    }
+    static std::string Slurp(const std::string& path) {
+        std::ostringstream bytes;
+        bytes << std::ifstream(path, std::ios::binary).rdbuf();
+        return bytes.str();
     }
     static Bytes Rgba(const KLImageSGI& image) {
         return Bytes(image.Pixels(), image.Pixels() + size_t(image.Width() * image.Height()) * 4);
@@ -103,17 +110,33 @@ TEST_F(ImageTest, StoreFailureSaysWhyAndLeavesNoFile) {
     EXPECT_FALSE(fs::exists(Path("empty.sgi")));
 }
 
-// Files that are not pictures (null content: no file at all) each give null and a one-line
-// message naming the file.
+// Files that are not pictures (no content: no file at all) each give null and a one-line
+// message naming the file. The cut PNG files are a real PNG cut inside its pixel data and one
+// cut inside its header; contents are written byte for byte (they hold NUL bytes).
 TEST_F(ImageTest, NotAnImageGivesNullAndAMessage) {
-    for (auto [leaf, content] : {std::pair<const char*, const char*>{"text.sgi", "begin keyset\n"},
-                                 {"empty.png", ""},
-                                 {"cut.png", "\x89PNG\r\n\x1a\n\0\0\0\rIHDR"},
-                                 {"missing.sgi", nullptr},
-                                 {"face.0001", "\x01\xDA\x01"}}) {
+    Bytes noise;  // does not compress: the pixel data is most of the file
+    uint32_t seed = 1;
+    for (int i = 0; i < 48 * 48 * 3; ++i)
+        noise.push_back(uint8_t((seed = seed * 1664525u + 1013904223u) >> 24));
+    const std::string png = Slurp(Write("whole.png", 48, 48, 3, noise));
+    ASSERT_GT(png.size(), 6000u);
+    ASSERT_NE(KLImageSGI::Load(Path("whole.png").c_str()), nullptr) << "the uncut file reads";
+    const std::string signature("\x89PNG\r\n\x1a\n", 8);
+    ASSERT_EQ(png.substr(0, 8), signature);
+    const std::vector<std::pair<const char*, std::optional<std::string>>> cases = {
+        {"text.sgi", "begin keyset\n"},
+        {"empty.png", ""},
+        {"cut.png", png.substr(0, png.size() / 2)},
+        {"header.png", signature + std::string("\0\0\0\rIHDR\0\0", 10)},
+        {"missing.sgi", std::nullopt},
+        {"face.0001", "\x01\xDA\x01"},
+    };
+    for (const auto& [leaf, content] : cases) {
         const std::string path = Path(leaf);
-        if (content)
-            std::ofstream(path) << content;
+        if (content) {
+            std::ofstream(path, std::ios::binary).write(content->data(), content->size());
+            ASSERT_EQ(fs::file_size(path), content->size()) << leaf;
+        }
         std::string error;
         EXPECT_EQ(KLImageSGI::Load(path.c_str(), &error), nullptr) << leaf;
         const std::string head = "Could not read image [" + path + "]: ";

@@ -1,8 +1,9 @@
 // The workspace's small operations, the error log and its viewer, the console window
-// interface, saving through a temporary file, apply inside the program, and the emergency
+// interface, apply inside the program, and the emergency
 // save on a fatal signal.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -17,9 +18,9 @@
 #include "model/KLKeyTrack.h"
 #include "scene/KLScene.h"
 #include "scene/KLWireSource.h"
+#include "toolkit/SafeFile.h"
 #include "workspace/ConsoleGhost.h"
 #include "workspace/Imp.h"
-#include "workspace/SafeFile.h"
 
 using namespace wstest;
 using ::testing::ElementsAre;
@@ -111,28 +112,6 @@ TEST_F(ImpTest, TheConsoleAndBatchModeAnswerOnTheErrorStream) {
     EXPECT_THAT(ghost.calls, IsEmpty());
 }
 
-TEST_F(ImpTest, SafeFileReplacesOnCommitOnlyAndLeavesNoTemporaryFile) {
-    const std::string target = dir / "work/a.track";
-    WriteFile(target, "old\n");
-    ::chmod(target.c_str(), 0640);
-    SafeFile(target).Stream() << "abandoned";
-    EXPECT_EQ(ReadFile(target), "old\n");
-    {
-        SafeFile file(target);
-        ASSERT_TRUE(file.IsOpen());
-        file.Stream() << "new\n";
-        EXPECT_EQ(ReadFile(target), "old\n") << "nothing changes before Commit";
-        EXPECT_TRUE(file.Commit());
-    }
-    EXPECT_EQ(ReadFile(target), "new\n");
-    struct stat st;
-    ASSERT_EQ(::stat(target.c_str(), &st), 0);
-    EXPECT_EQ(st.st_mode & 0777, 0640u) << "the replaced file's permissions are kept";
-    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(dir / "work"), {}), 1);
-    EXPECT_FALSE(SafeFile(dir / "no-such-dir/a.keyset").IsOpen());
-    EXPECT_FALSE(SafeFile(dir.path()).IsOpen()) << "a directory is not a file";
-}
-
 // Two keysets named "mouth", the first over the whole face, the second on "lip" only; every
 // keyset of the name is applied in slot order.
 TEST_F(ImpTest, ApplyCoversTheWorkspaceAndEveryKeysetOfTheName) {
@@ -177,9 +156,17 @@ TEST_F(ImpTest, ApplyCoversTheWorkspaceAndEveryKeysetOfTheName) {
     EXPECT_NEAR(*EvalChannel(out, "lip", 0, 6), 2.5, 1e-4) << "the second one wrote last";
 }
 
+struct SecondSignal {
+    int signal;
+    int file;          // 1: while the keyset is written, 2: while the track is
+    bool fromOutside;  // sent by another process rather than raised by the save itself
+};
+SecondSignal second;
+int second_sent_fd = -1;  // the child tells the test process here that the save is under way
+
 // A process holding keysets (and a sound) that receives a fatal signal writes "_m.keyset" (and
 // "_m.track") in its working directory and ends with status -1.
-class EmergencySave : public ProjectTest, public ::testing::WithParamInterface<int> {
+class EmergencySaveTest : public ProjectTest {
   protected:
     void SetUp() override {
         ProjectTest::SetUp();
@@ -192,9 +179,18 @@ class EmergencySave : public ProjectTest, public ::testing::WithParamInterface<i
     }
 
     // Forks a process that loads what is asked and then receives `sig`; its wait status.
-    int Crash(int sig, bool keysets, bool sound) {
+    // `hook`, when given, watches the saves of the child; with `sendDuringSave`, this process
+    // sends that signal to the child once the hook has written to second_sent_fd.
+    int Crash(int sig, bool keysets, bool sound, SafeFile::StageHook hook = nullptr,
+              int sendDuringSave = 0) {
+        int told[2];
+        if (::pipe(told) != 0)
+            return -1;
+        second_sent_fd = told[1];
         const pid_t pid = ::fork();
         if (pid == 0) {
+            struct rlimit noCore = {0, 0};  // a second fault must not leave a core file
+            ::setrlimit(RLIMIT_CORE, &noCore);
             if (!std::freopen((dir / "child.err").c_str(), "w", stderr) ||
                 ::chdir((dir / "work").c_str()))
                 ::_exit(120);
@@ -203,11 +199,21 @@ class EmergencySave : public ProjectTest, public ::testing::WithParamInterface<i
                              !theImp.LoadTrack((dir / "misc_data/t.track").c_str()))) ||
                 (sound && !theImp.LoadSound((dir / "misc_data/d.aiff").c_str())))
                 ::_exit(121);
+            SafeFile::SetStageHook(hook);
             ::raise(sig);
             ::_exit(122);
         }
-        int status = 0;
-        ::waitpid(pid, &status, 0);
+        ::close(told[1]);
+        int status = -1;
+        if (pid > 0) {
+            char byte;
+            // Only a child that really was made gets a signal (kill(-1) would reach every
+            // process); the read ends when the child does, having told or not.
+            if (sendDuringSave && ::read(told[0], &byte, 1) == 1)
+                ::kill(pid, sendDuringSave);
+            ::waitpid(pid, &status, 0);
+        }
+        ::close(told[0]);
         return status;
     }
     std::vector<std::string> WorkFiles() const {
@@ -217,6 +223,8 @@ class EmergencySave : public ProjectTest, public ::testing::WithParamInterface<i
         return names;
     }
 };
+
+class EmergencySave : public EmergencySaveTest, public ::testing::WithParamInterface<int> {};
 
 TEST_P(EmergencySave, WritesKeysetsAndTrackThatLoadBack) {
     const int status = Crash(GetParam(), true, true);
@@ -240,6 +248,55 @@ INSTANTIATE_TEST_SUITE_P(Signals, EmergencySave,
                          ::testing::Values(SIGSEGV, SIGSYS, SIGTERM, SIGBUS, SIGFPE, SIGTRAP,
                                            SIGABRT, SIGILL, SIGUSR2, SIGUSR1),
                          [](const auto& info) { return std::string(sigabbrev_np(info.param)); });
+
+// A second fatal signal while the emergency save is writing ends the program at once, by that
+// signal: no second save starts, and the file being written is absent, not half-written.
+void SecondSignalDuringSave(SafeFile::Stage stage) {
+    static int files = 0;
+    if (stage != SafeFile::Stage::Written || ++files != second.file)
+        return;
+    if (!second.fromOutside) {
+        ::raise(second.signal);
+        return;  // survived: the save goes on, and the test says so
+    }
+    (void)!::write(second_sent_fd, "w", 1);
+    for (;;)
+        ::pause();  // a slow save
+}
+
+class EmergencySaveInterrupted : public EmergencySaveTest,
+                                 public ::testing::WithParamInterface<SecondSignal> {};
+
+TEST_P(EmergencySaveInterrupted, EndsAtOnceLeavingCompleteFilesOnly) {
+    second = GetParam();
+    const int status =
+        Crash(SIGTERM, true, true, SecondSignalDuringSave, second.fromOutside ? second.signal : 0);
+    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == second.signal)
+        << (WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status)) : "signal");
+    EXPECT_EQ(ReadFile(dir / "child.err"), "EMERGENCY SAVE ON SIGNAL 15 ... ")
+        << "one save, not finished";
+    if (second.file == 1) {
+        EXPECT_THAT(WorkFiles(), ::testing::IsEmpty());
+    } else {
+        EXPECT_THAT(WorkFiles(), ::testing::ElementsAre("_m.keyset"));
+        theImp.batchMode = 1;
+        EXPECT_EQ(theImp.LoadKeyset((dir / "work/_m.keyset").c_str()), 1);
+        EXPECT_EQ(theImp.keysetCount, 2);
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Signals, EmergencySaveInterrupted,
+                         ::testing::Values(SecondSignal{SIGSEGV, 1, false},
+                                           SecondSignal{SIGTERM, 1, false},
+                                           SecondSignal{SIGABRT, 2, false},
+                                           SecondSignal{SIGTERM, 1, true},
+                                           SecondSignal{SIGUSR1, 2, true}),
+                         [](const auto& info) {
+                             const SecondSignal& p = info.param;
+                             return std::string(sigabbrev_np(p.signal)) +
+                                    (p.file == 1 ? "_InKeyset" : "_InTrack") +
+                                    (p.fromOutside ? "_Sent" : "_Raised");
+                         });
 
 TEST_F(EmergencySave, WithoutKeysetsNothingIsSavedWithoutASoundNoTrack) {
     int status = Crash(SIGTERM, false, true);

@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cmath>
 #include <filesystem>
 
 #include "WorkspaceTestUtil.h"
@@ -244,6 +245,32 @@ TEST_F(KeysetTest, SaveLoadSaveIsByteIdenticalAndAFailedSaveKeepsTheChanges) {
     EXPECT_THAT(ghost.calls, IsEmpty()) << "refused silently";
 }
 
+// A scene name with a blank, and numbers whose six-digit form reads back as another float:
+// saved, loaded and saved again, the file is the same and so is every value.
+TEST_F(KeysetTest, AwkwardNamesAndNumbersReadBackAsSaved) {
+    std::filesystem::copy_file(dir / "wire/face.gltf", dir / "wire/my face.gltf");
+    ASSERT_EQ(BatchLoadKeyset(Data("face.kset", "wire \"my face.gltf\" 0.1234567\n" +
+                                                    std::string(kMouth) +
+                                                    "begin shapeset lid lip 8 1e-7 123456.7\n"
+                                                    " key shut -0.0\n key half 0.1234567\n"
+                                                    " key far 123456.7\n key tiny 1e-7\nend\n")),
+              1);
+    const std::string first = Saved("first.kset");
+    ASSERT_EQ(BatchLoadKeyset(dir / "misc_data/first.kset"), 1) << first;
+    EXPECT_EQ(theImp.wireFile, "my face.gltf");
+    EXPECT_EQ(theImp.wireFrame, 0.1234567f);
+    const KLKeySet* lid = theImp.GetKeySet("lid");
+    ASSERT_NE(lid, nullptr);
+    EXPECT_EQ(lid->lowValue, 1e-7f);
+    EXPECT_EQ(lid->highValue, 123456.7f);
+    std::vector<float> frames;
+    for (const auto& key : lid->keyShapes)
+        frames.push_back(key->frame);
+    EXPECT_THAT(frames, ElementsAre(0.0f, 0.1234567f, 123456.7f, 1e-7f));
+    EXPECT_TRUE(std::signbit(frames[0])) << "-0 stays negative zero";
+    EXPECT_EQ(Saved("second.kset"), first);
+}
+
 // Damaged descriptions load what they can and never leave a keyset without its track.
 TEST_F(KeysetTest, DamagedDescriptionsLoadWhatTheyCan) {
     static const char binary[] = "\0\x01\xff\"begin keyset\t\"\n";
@@ -423,6 +450,40 @@ TEST_F(TrackTest, DurationIsTheLongestOfItsCandidatesAndNeverBelowOneSecond) {
     EXPECT_EQ(theImp.duration.Ticks(), 18000);
     EXPECT_EQ(theImp.requestedDuration.Ticks(), 100);
     EXPECT_THAT(ghost.calls, ElementsAre("DisplayDuration(18000)"));
+}
+
+// Times and values whose six-digit form is another tick or float read back as saved.
+TEST_F(TrackTest, AwkwardTimesAndValuesReadBackAsSaved) {
+    ASSERT_EQ(Load("begin marktrack\n mark 0.1234567 \"a\"\n mark 123456.7 \"b\"\nend\n"
+                   "begin keytrack mouth\n event 0.1234567 rest Ease 0.1234567\n"
+                   " event 3 open Linear 1e-7\n event 123456.7 wide Smooth 123456.7\n"
+                   " event 98765.43 rest Ease -0.0\nend\n"),
+              1);
+    struct Event {
+        int ticks;
+        float value;
+        bool operator==(const Event& o) const {
+            return ticks == o.ticks && value == o.value &&
+                   std::signbit(value) == std::signbit(o.value);
+        }
+    };
+    auto events = [] {
+        std::vector<Event> list;
+        for (const KLKeyEvent* e : theImp.GetKeyTrack(0)->events)
+            list.push_back({e->time.Ticks(), e->value});
+        for (const KLMarkEvent* m : theImp.markTrack->marks)
+            list.push_back({m->time.Ticks(), 0.0f});
+        return list;
+    };
+    const std::vector<Event> loaded = events();
+    ASSERT_EQ(loaded.size(), 6u);
+    EXPECT_EQ(loaded[1].value, 1e-7f);
+    EXPECT_EQ(loaded[3].value, 123456.7f);  // events in time order, then the marks
+    EXPECT_EQ(loaded[3].ticks, CueTime(123456.7, 0).Ticks());
+    const std::string first = SavedText();
+    ASSERT_EQ(theImp.LoadTrack((dir / "saved.track").c_str()), 1);
+    EXPECT_TRUE(events() == loaded) << first;
+    EXPECT_EQ(SavedText(), first);
 }
 
 TEST_F(TrackTest, DamagedTracksLoadWhatTheyCan) {

@@ -1,0 +1,32 @@
+#pragma once
+
+#include <cstddef>
+#include <streambuf>
+#include <vector>
+
+// A stream buffer that writes into an open file descriptor (which it borrows, never closes).
+// Every write(2) is checked: the first failure is kept in Error(), and from then on the
+// buffer refuses everything, so that the stream that uses it goes bad and stays bad.
+class FdStreamBuffer : public std::streambuf {
+  public:
+    explicit FdStreamBuffer(int fd, size_t capacity = 1 << 16);
+    FdStreamBuffer(const FdStreamBuffer&) = delete;
+    FdStreamBuffer& operator=(const FdStreamBuffer&) = delete;
+
+    // The errno of the first failed write, 0 when every write so far succeeded.
+    int Error() const { return error_; }
+
+  protected:
+    int_type overflow(int_type c) override;
+    std::streamsize xsputn(const char* s, std::streamsize n) override;
+    int sync() override;
+
+  private:
+    // Writes [data, data + size) in full, retrying short and interrupted writes.
+    bool writeAll(const char* data, size_t size);
+    bool drain();
+
+    int fd_;
+    int error_ = 0;
+    std::vector<char> buffer_;
+};

@@ -1,0 +1,248 @@
+// SafeFile: the target is its old self or the complete new content, whatever happens to the
+// process on the way, and no temporary file outlives the save. Saves that must be stopped
+// part-way run in a child process that is killed (SIGKILL: nothing runs on the way out).
+
+#include <signal.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <fstream>
+#include <sstream>
+
+#include "toolkit/SafeFile.h"
+#include "toolkit_test_util.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+using Stage = SafeFile::Stage;
+
+std::string Slurp(const std::string& path) {
+    std::ifstream in(path, std::ios::binary);
+    std::ostringstream text;
+    text << in.rdbuf();
+    return text.str();
+}
+
+// The names in `dir`, sorted.
+std::vector<std::string> Listing(const fs::path& dir) {
+    std::vector<std::string> names;
+    for (const auto& entry : fs::directory_iterator(dir))
+        names.push_back(entry.path().filename().string());
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+// Runs `body` in a child process; its wait status.
+template <typename F>
+int InChild(F body) {
+    const pid_t pid = ::fork();
+    if (pid == 0) {
+        body();
+        ::_exit(0);
+    }
+    int status = -1;
+    if (pid < 0)
+        return status;
+    ::waitpid(pid, &status, 0);
+    return status;
+}
+
+Stage kill_at;  // the stage at which the child's save is killed
+void KillAtStage(Stage stage) {
+    if (stage == kill_at)
+        ::raise(SIGKILL);
+}
+
+// Every case runs with unnamed files (the usual way on Linux) and with named temporary files
+// (file systems without them).
+class SafeFileTest : public TempDirTest, public ::testing::WithParamInterface<bool> {
+  protected:
+    void SetUp() override {
+        TempDirTest::SetUp();
+        SafeFile::SetUnnamedFilesAllowed(GetParam());
+        target_ = Path("a.track");
+    }
+    void TearDown() override {
+        SafeFile::SetUnnamedFilesAllowed(true);
+        TempDirTest::TearDown();
+    }
+    std::string target_;
+};
+
+TEST_P(SafeFileTest, ReplacesOnCommitOnlyKeepingThePermissions) {
+    std::ofstream(target_) << "old\n";
+    ::chmod(target_.c_str(), 0604);
+    {
+        SafeFile abandoned(target_);
+        ASSERT_TRUE(abandoned.IsOpen()) << abandoned.ErrorText();
+        abandoned.Stream() << "abandoned";
+    }
+    EXPECT_EQ(Slurp(target_), "old\n");
+    EXPECT_EQ(Listing(dir_), std::vector<std::string>{"a.track"});
+    {
+        SafeFile file(target_);
+        ASSERT_TRUE(file.IsOpen());
+        file.Stream() << "new\n";
+        EXPECT_TRUE(file.Write("\0bytes", 6));
+        EXPECT_EQ(Slurp(target_), "old\n") << "nothing changes before Commit";
+        EXPECT_TRUE(file.Commit()) << file.ErrorText();
+        EXPECT_FALSE(file.IsOpen());
+        EXPECT_FALSE(file.Commit()) << "a SafeFile commits once";
+    }
+    EXPECT_EQ(Slurp(target_), std::string("new\n\0bytes", 10));
+    struct stat st;
+    ASSERT_EQ(::stat(target_.c_str(), &st), 0);
+    EXPECT_EQ(st.st_mode & 07777, 0604u) << "the replaced file's permissions are kept";
+    EXPECT_EQ(Listing(dir_), std::vector<std::string>{"a.track"});
+}
+
+TEST_P(SafeFileTest, NewFileGetsTheUsualPermissionsAndLargeContent) {
+    const mode_t old = ::umask(027);
+    std::string big(3 << 20, 'x');  // larger than the stream's buffer
+    big[12345] = '\n';
+    SafeFile file(target_);
+    file.Stream() << "head ";
+    file.Stream().write(big.data(), std::streamsize(big.size()));
+    const bool committed = file.Commit();
+    ::umask(old);
+    ASSERT_TRUE(committed) << file.ErrorText();
+    EXPECT_EQ(Slurp(target_), "head " + big);
+    struct stat st;
+    ASSERT_EQ(::stat(target_.c_str(), &st), 0);
+    EXPECT_EQ(st.st_mode & 07777, 0640u);
+}
+
+TEST_P(SafeFileTest, ANameThatCannotBeWrittenSaysWhy) {
+    for (const std::string& path : {Path("no-such-dir/a.keyset"), dir_.string(), std::string()}) {
+        SafeFile file(path);
+        EXPECT_FALSE(file.IsOpen()) << path;
+        EXPECT_FALSE(file.ErrorText().empty()) << path;
+        file.Stream() << "lost";  // harmless
+        EXPECT_FALSE(file.Write("x", 1));
+        EXPECT_FALSE(file.Commit());
+    }
+    EXPECT_TRUE(Listing(dir_).empty());
+}
+
+TEST_P(SafeFileTest, AFailedWriteFailsTheCommitAndLeavesTheTargetAlone) {
+    std::ofstream(target_) << "old\n";
+    // A file-size limit makes the writes fail part-way (EFBIG instead of the signal).
+    const int status = InChild([&] {
+        ::signal(SIGXFSZ, SIG_IGN);
+        struct rlimit limit = {1 << 16, 1 << 16};
+        ::setrlimit(RLIMIT_FSIZE, &limit);
+        SafeFile file(target_);
+        file.Stream() << std::string(1 << 18, 'y');
+        const bool committed = file.Commit();
+        const bool named = file.ErrorText().find("could not write all of") == 0;
+        ::_exit(committed ? 1 : named ? 0 : 2);
+    });
+    ASSERT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(WEXITSTATUS(status), 0) << "1: committed anyway, 2: no reason given";
+    EXPECT_EQ(Slurp(target_), "old\n");
+    EXPECT_EQ(Listing(dir_), std::vector<std::string>{"a.track"});
+}
+
+TEST_P(SafeFileTest, AWriterThatNeedsAFileNameWritesThroughTheDescriptorPath) {
+    SafeFile file(target_);
+    FILE* f = std::fopen(file.DescriptorPath().c_str(), "wb");
+    ASSERT_NE(f, nullptr);
+    std::fputs("by name\n", f);
+    ASSERT_EQ(std::fclose(f), 0);
+    ASSERT_TRUE(file.Commit()) << file.ErrorText();
+    EXPECT_EQ(Slurp(target_), "by name\n");
+    EXPECT_EQ(Listing(dir_), std::vector<std::string>{"a.track"});
+}
+
+// A save killed part-way, over an existing file and into a new one: the target is complete
+// (old or new) and, once another save of it has begun, nothing else is in the directory.
+// With unnamed files nothing else is there even straight after the kill, up to the link.
+TEST_P(SafeFileTest, AKilledSaveLeavesTheOldOrTheNewFileAndNoOther) {
+    const std::string fresh = Path("b.track");
+    std::ofstream(target_) << "old\n";
+    const std::string content(1 << 20, 'n');
+    for (Stage stage :
+         {Stage::Opened, Stage::Written, Stage::Synced, Stage::Linked, Stage::Renamed}) {
+        SCOPED_TRACE(int(stage));
+        for (const std::string& path : {target_, fresh}) {
+            const std::string before = fs::exists(path) ? Slurp(path) : "";
+            kill_at = stage;
+            const int status = InChild([&] {
+                SafeFile::SetStageHook(KillAtStage);
+                SafeFile file(path);
+                file.Stream() << content;
+                file.Commit();
+            });
+            ASSERT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL) << path;
+            const std::string now = fs::exists(path) ? Slurp(path) : "";
+            // A new file with unnamed files needs no temporary name: the link puts it in place.
+            const bool placed =
+                stage == Stage::Renamed || (stage == Stage::Linked && GetParam() && path == fresh);
+            EXPECT_EQ(now, placed ? content : before) << path;
+            const size_t files = fs::exists(target_) + fs::exists(fresh);
+            if (GetParam() && stage < Stage::Linked) {
+                EXPECT_EQ(Listing(dir_).size(), files) << "nothing left by the killed save";
+            }
+            SafeFile next(path);  // removes what the killed save left
+            EXPECT_EQ(Listing(dir_).size(), files + !GetParam());
+        }
+        EXPECT_EQ(Slurp(target_), stage == Stage::Renamed ? content : "old\n");
+        std::ofstream(target_) << "old\n";
+        fs::remove(fresh);
+    }
+}
+
+// Killed at no chosen point: while the content is being written.
+TEST_P(SafeFileTest, ASaveKilledWhileWritingLeavesNothingBehind) {
+    std::ofstream(target_) << "old\n";
+    int ready[2];
+    ASSERT_EQ(::pipe(ready), 0);
+    const pid_t pid = ::fork();
+    ASSERT_GE(pid, 0);  // never kill(-1): that would reach every process
+    if (pid == 0) {
+        SafeFile file(target_);
+        const std::string block(1 << 16, 'w');
+        for (int i = 0; i < 512; ++i) {  // 32 MB at the most, then wait for the end
+            file.Write(block.data(), block.size());
+            if (i == 8)
+                (void)!::write(ready[1], "x", 1);
+        }
+        ::pause();
+        ::_exit(0);
+    }
+    ::close(ready[1]);
+    char byte;
+    const bool writing = ::read(ready[0], &byte, 1) == 1;
+    ::kill(pid, SIGKILL);  // pid > 0 here
+    int status = 0;
+    ::waitpid(pid, &status, 0);
+    ::close(ready[0]);
+    ASSERT_TRUE(writing);
+    EXPECT_EQ(Slurp(target_), "old\n");
+    if (GetParam()) {
+        EXPECT_EQ(Listing(dir_), std::vector<std::string>{"a.track"});
+    }
+    SafeFile next(target_);
+    EXPECT_EQ(Listing(dir_).size(), GetParam() ? 1u : 2u) << "only the next save's own file";
+}
+
+TEST_P(SafeFileTest, TemporaryFilesOfLiveProcessesAndOtherFilesStay) {
+    std::ofstream(target_) << "old\n";
+    const std::string mine = Path(".a.track.tmp-" + std::to_string(::getpid()) + "-abcdef");
+    const std::string other = Path(".b.track.tmp-999999999-abcdef");
+    std::ofstream(mine) << "in use";
+    std::ofstream(other) << "another target's";
+    SafeFile file(target_);
+    EXPECT_TRUE(fs::exists(mine)) << "a save still running owns it";
+    EXPECT_TRUE(fs::exists(other)) << "another target's files are its own saves' business";
+}
+
+INSTANTIATE_TEST_SUITE_P(Unnamed, SafeFileTest, ::testing::Values(true));
+INSTANTIATE_TEST_SUITE_P(Named, SafeFileTest, ::testing::Values(false));
+
+}  // namespace
