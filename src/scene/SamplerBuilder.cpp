@@ -12,24 +12,17 @@ float stored(double v) {
     return float(v) + 0.0f;
 }
 
-// The fewest of the points 0..n-1 (first and last always among them) such that every point
-// between two kept ones fits the straight piece between them: `fits(i, k, j)` says whether
-// point k lies within tolerance of the piece from i to j. Each piece is grown by doubling and
-// then narrowed by bisection, so the cost is about n log n checks for long pieces.
-template <class Fits>
-std::vector<size_t> reduce(size_t n, const Fits& fits) {
+// Few of the points 0..n-1 (first and last always among them) such that every point between
+// two kept ones fits the straight piece between them: `piece_fits(i, j)` says whether every
+// point strictly between i and j lies within tolerance of the piece from i to j. Each piece is
+// grown by doubling and then narrowed by bisection, so the cost is about n log n point checks
+// for long pieces, and one check per point where no point can be left out.
+template <class PieceFits>
+std::vector<size_t> reduce(size_t n, const PieceFits& piece_fits) {
     std::vector<size_t> kept;
     if (n == 0) {
         return kept;
     }
-    auto piece_fits = [&](size_t i, size_t j) {
-        for (size_t k = i + 1; k < j; ++k) {
-            if (!fits(i, k, j)) {
-                return false;
-            }
-        }
-        return true;
-    };
     size_t i = 0;
     kept.push_back(0);
     while (i + 1 < n) {
@@ -63,6 +56,56 @@ std::vector<size_t> reduce(size_t n, const Fits& fits) {
         i = good;
     }
     return kept;
+}
+// Whether values[k] for i < k < j lie within `tolerance` of the straight line from i to j.
+bool line_fits(const std::vector<double>& times, const std::vector<double>& values, size_t i,
+               size_t j, double tolerance) {
+    double t0 = times[i], v0 = values[i];
+    double slope = (values[j] - v0) / (times[j] - t0);
+    for (size_t k = i + 1; k < j; ++k) {
+        if (std::fabs(v0 + slope * (times[k] - t0) - values[k]) > tolerance) {
+            return false;
+        }
+    }
+    return true;
+}
+
+// Whether q[k] for i < k < j lies within `chord` (the chord between unit quaternions of the
+// tolerance angle) of the spherical interpolation from q[i] to q[j], as players interpolate.
+bool slerp_fits(const std::vector<double>& times, const std::vector<EulerRotation::Quat>& q,
+                size_t i, size_t j, double chord) {
+    const EulerRotation::Quat& a = q[i];
+    const EulerRotation::Quat& b = q[j];
+    double dot = a[0] * b[0] + a[1] * b[1] + a[2] * b[2] + a[3] * b[3];
+    double sign = dot < 0 ? -1.0 : 1.0;
+    dot *= sign;
+    double angle = dot < 0.9999999 ? std::acos(dot) : 0.0, s = std::sin(angle);
+    double limit = chord * chord;
+    for (size_t k = i + 1; k < j; ++k) {
+        double u = (times[k] - times[i]) / (times[j] - times[i]);
+        double wa = 1 - u, wb = u;
+        if (angle > 0) {
+            wa = std::sin((1 - u) * angle) / s;
+            wb = std::sin(u * angle) / s;
+        }
+        EulerRotation::Quat m;
+        double n = 0;
+        for (size_t c = 0; c < 4; ++c) {
+            m[c] = wa * a[c] + wb * sign * b[c];
+            n += m[c] * m[c];
+        }
+        n = 1 / std::sqrt(n);
+        double same = 0, opposite = 0;
+        for (size_t c = 0; c < 4; ++c) {
+            double x = m[c] * n;
+            same += (x - q[k][c]) * (x - q[k][c]);
+            opposite += (x + q[k][c]) * (x + q[k][c]);
+        }
+        if (std::min(same, opposite) > limit) {
+            return false;
+        }
+    }
+    return true;
 }
 }  // namespace
 
@@ -130,11 +173,9 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
     }
     std::vector<double> axis[3];
     evaluate(times, axis);
-    auto fits = [&](size_t i, size_t k, size_t j) {
-        double u = (times[k] - times[i]) / (times[j] - times[i]);
+    auto fits = [&](size_t i, size_t j) {
         for (int a = 0; a < 3; ++a) {
-            double line = axis[a][i] + (axis[a][j] - axis[a][i]) * u;
-            if (std::fabs(line - axis[a][k]) > kVectorTolerance * 0.5) {
+            if (!line_fits(times, axis[a], i, j, kVectorTolerance * 0.5)) {
                 return false;
             }
         }
@@ -162,28 +203,60 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     }
     std::vector<double> axis[3];
     evaluate(times, axis);
-    std::vector<EulerRotation::Quat> q(times.size());
-    for (size_t k = 0; k < times.size(); ++k) {
-        q[k] = EulerRotation::ToQuaternion({axis[0][k], axis[1][k], axis[2][k]});
-        if (k > 0) {  // stay on the hemisphere of the previous sample: shortest way round
-            const EulerRotation::Quat& p = q[k - 1];
-            if (q[k][0] * p[0] + q[k][1] * p[1] + q[k][2] * p[2] + q[k][3] * p[3] < 0) {
-                for (double& v : q[k]) {
-                    v = -v;
-                }
+    auto quaternion = [&](size_t k) {
+        return EulerRotation::ToQuaternion({axis[0][k], axis[1][k], axis[2][k]});
+    };
+    // Float storage moves a quaternion by about 1e-5 degrees: well inside the margin.
+    const double tolerance = kRotationToleranceDegrees * 0.5;
+    std::vector<size_t> kept;
+    std::vector<EulerRotation::Quat> q;
+    int moving = -1, movingAxes = 0;
+    for (int a = 0; a < 3; ++a) {
+        if (curves_[a] && !curves_[a]->Constant()) {
+            moving = a;
+            ++movingAxes;
+        }
+    }
+    if (movingAxes <= 1) {
+        // One axis turning between fixed ones: the rotation is a fixed one, a turn about that
+        // axis, and another fixed one, and interpolation commutes with fixed rotations on either
+        // side, so the angle by which a piece misses is the angle its straight line misses by.
+        int a = moving < 0 ? 0 : moving;
+        kept = reduce(times.size(), [&](size_t i, size_t j) {
+            return std::fabs(axis[a][j] - axis[a][i]) < 180 &&
+                   line_fits(times, axis[a], i, j, tolerance);
+        });
+        for (size_t k : kept) {
+            q.push_back(quaternion(k));
+        }
+    } else {
+        q.resize(times.size());
+        for (size_t k = 0; k < times.size(); ++k) {
+            q[k] = quaternion(k);
+        }
+        const double chord = 2 * std::sin(tolerance * 3.14159265358979323846 / 180 / 4);
+        kept = reduce(times.size(),
+                      [&](size_t i, size_t j) { return slerp_fits(times, q, i, j, chord); });
+        for (size_t n = 0; n < kept.size(); ++n) {
+            q[n] = q[kept[n]];
+        }
+        q.resize(kept.size());
+    }
+    for (size_t n = 1; n < q.size(); ++n) {
+        // Each sample on the hemisphere of the one before: players take the shortest way round.
+        const EulerRotation::Quat& p = q[n - 1];
+        if (q[n][0] * p[0] + q[n][1] * p[1] + q[n][2] * p[2] + q[n][3] * p[3] < 0) {
+            for (double& v : q[n]) {
+                v = -v;
             }
         }
     }
-    // Float storage moves a quaternion by about 1e-5 degrees: well inside the margin.
-    auto fits = [&](size_t i, size_t k, size_t j) {
-        double u = (times[k] - times[i]) / (times[j] - times[i]);
-        return EulerRotation::AngleBetween(EulerRotation::Slerp(q[i], q[j], u), q[k]) <=
-               kRotationToleranceDegrees * 0.5;
-    };
     out->interpolation = "LINEAR";
-    for (size_t k : reduce(times.size(), fits)) {
-        out->times.push_back(stored(times[k]));
-        for (double v : q[k]) {
+    out->times.reserve(kept.size());
+    out->values.reserve(kept.size() * 4);
+    for (size_t n = 0; n < kept.size(); ++n) {
+        out->times.push_back(stored(times[kept[n]]));
+        for (double v : q[n]) {
             out->values.push_back(stored(v));
         }
     }
@@ -217,30 +290,43 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     // each axis exact, with the slope on either side of every cut.
     out->interpolation = "CUBICSPLINE";
     std::vector<double> times = unionTimes();
-    std::vector<double> axis[3];
+    std::vector<double> axis[3], in[3], leave[3];
     evaluate(times, axis);
+    for (int a = 0; a < 3; ++a) {
+        if (curves_[a]) {
+            curves_[a]->SlopesSorted(times, false, &in[a]);
+            curves_[a]->SlopesSorted(times, true, &leave[a]);
+        } else {
+            in[a].assign(times.size(), 0.0);
+            leave[a].assign(times.size(), 0.0);
+        }
+    }
+    out->times.reserve(times.size());
+    out->values.reserve(times.size() * 9);
     for (size_t k = 0; k < times.size(); ++k) {
         out->times.push_back(stored(times[k]));
-        for (int part = 0; part < 3; ++part) {
+        for (const std::vector<double>* part : {in, axis, leave}) {
             for (int a = 0; a < 3; ++a) {
-                const ChannelCurve* c = curves_[a];
-                double v = part == 1 ? axis[a][k] : (c ? c->SlopeAt(times[k], part == 2) : 0.0);
-                out->values.push_back(stored(v));
+                out->values.push_back(stored(part[a][k]));
             }
         }
     }
 }
 
 std::vector<double> SamplerBuilder::unionTimes() const {
-    std::vector<double> all;
+    std::vector<double> all, one, merged;
     for (const ChannelCurve* c : curves_) {
-        if (c) {
-            for (const ChannelCurve::Key& k : c->keys()) {
-                all.push_back(k.time);
-            }
+        if (!c) {
+            continue;
         }
+        one.clear();
+        for (const ChannelCurve::Key& k : c->keys()) {
+            one.push_back(k.time);
+        }
+        merged.resize(all.size() + one.size());
+        std::merge(all.begin(), all.end(), one.begin(), one.end(), merged.begin());
+        all.swap(merged);
     }
-    std::sort(all.begin(), all.end());
     std::vector<double> out;
     out.reserve(all.size());
     for (double t : all) {
@@ -251,35 +337,40 @@ std::vector<double> SamplerBuilder::unionTimes() const {
     return out;
 }
 
-bool SamplerBuilder::stillBetween(double from, double to) const {
-    double mid = (from + to) / 2;
+std::vector<char> SamplerBuilder::stillSpans(const std::vector<double>& keys) const {
+    std::vector<char> still(keys.empty() ? 0 : keys.size() - 1, 1);
     for (const ChannelCurve* c : curves_) {
         if (!c) {
             continue;
         }
-        const auto& keys = c->keys();
-        auto it = std::upper_bound(keys.begin(), keys.end(), mid,
-                                   [](double s, const ChannelCurve::Key& k) { return s < k.time; });
-        if (it == keys.begin() || it == keys.end()) {
-            continue;  // held before the first key or after the last
-        }
-        size_t i = size_t(it - keys.begin()) - 1;
-        if (keys[i].value != keys[i + 1].value) {
-            return false;
-        }
-        if (keys[i].out != ChannelCurve::kStep && (c->OutSlope(i) != 0 || c->InSlope(i + 1) != 0)) {
-            return false;
+        const auto& own = c->keys();
+        size_t after = 0;  // the first of the curve's keys after the span's middle
+        for (size_t k = 0; k < still.size(); ++k) {
+            double mid = (keys[k] + keys[k + 1]) / 2;
+            while (after < own.size() && own[after].time <= mid) {
+                ++after;
+            }
+            if (after == 0 || after == own.size()) {
+                continue;  // held before the first key or after the last
+            }
+            size_t i = after - 1;
+            if (own[i].value != own[i + 1].value ||
+                (own[i].out != ChannelCurve::kStep &&
+                 (c->OutSlope(i) != 0 || c->InSlope(i + 1) != 0))) {
+                still[k] = 0;
+            }
         }
     }
-    return true;
+    return still;
 }
 
 bool SamplerBuilder::candidateTimes(std::vector<double>* out, std::string* why) const {
     std::vector<double> keys = unionTimes();
+    std::vector<char> still = stillSpans(keys);
     // Count first, so that a curve that would need too many samples costs no memory.
     double count = double(keys.size());
     for (size_t k = 0; k + 1 < keys.size(); ++k) {
-        if (!stillBetween(keys[k], keys[k + 1])) {
+        if (!still[k]) {
             count += std::max(0.0, std::floor(keys[k + 1] * fps_) - std::ceil(keys[k] * fps_) + 1);
         }
     }
@@ -292,7 +383,7 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, std::string* why) 
     out->reserve(size_t(count));
     for (size_t k = 0; k < keys.size(); ++k) {
         out->push_back(keys[k]);
-        if (k + 1 == keys.size() || stillBetween(keys[k], keys[k + 1])) {
+        if (k + 1 == keys.size() || still[k]) {
             continue;
         }
         for (double f = std::ceil(keys[k] * fps_); f / fps_ < keys[k + 1]; ++f) {
@@ -307,8 +398,10 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, std::string* why) 
 
 void SamplerBuilder::evaluate(const std::vector<double>& times, std::vector<double> axis[3]) const {
     for (int a = 0; a < 3; ++a) {
-        if (curves_[a]) {
+        if (curves_[a] && !curves_[a]->Constant()) {
             curves_[a]->EvaluateSorted(times, &axis[a]);
+        } else if (curves_[a]) {
+            axis[a].assign(times.size(), curves_[a]->keys().front().value);
         } else {
             axis[a].assign(times.size(), rest_[a]);
         }

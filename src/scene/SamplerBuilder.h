@@ -53,7 +53,9 @@ class SamplerBuilder {
     // The union key times plus the whole frames inside every span where some axis moves; false
     // when that is more than kMaxSampledFrames.
     bool candidateTimes(std::vector<double>* times, std::string* why) const;
-    bool stillBetween(double from, double to) const;
+    // For each span between consecutive `keys` (the union key times), whether every axis holds
+    // still across it.
+    std::vector<char> stillSpans(const std::vector<double>& keys) const;
     void evaluate(const std::vector<double>& times, std::vector<double> axis[3]) const;
 
     const ChannelCurve* curves_[3];

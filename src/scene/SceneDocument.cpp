@@ -415,6 +415,11 @@ size_t SceneDocument::SetCurve(int node, int channel, const std::vector<ChannelC
     if (clearFirst || !slot) {
         slot = std::make_unique<ChannelCurve>();
     }
+    if (slot->empty()) {
+        // Keys in time order, as the scene interface gives them, are taken as they are; of
+        // two at one time the later wins, as Merge would have it.
+        slot->keys().reserve(keys.size());
+    }
     for (const ChannelCurve::Key& k : keys) {
         slot->Merge(k);
     }

@@ -139,7 +139,17 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets) {
         if (m_.buffers.empty()) {
             m_.buffers.emplace_back();
         }
+        // One buffer view at the end of buffer 0, grown once to its final size.
+        size_t bytes = 0;
+        for (const Target& t : *targets) {
+            bytes += (t.sampler.times.size() + t.sampler.values.size()) * sizeof(float);
+        }
+        std::vector<unsigned char>& data = m_.buffers[0].data;
+        data.reserve(((data.size() + 3) & ~size_t(3)) + bytes);
+        data.resize((data.size() + 3) & ~size_t(3), 0);
         view_ = int(m_.bufferViews.size());
+        viewStart_ = data.size();
+        m_.accessors.reserve(m_.accessors.size() + 2 * targets->size());
         for (Target& t : *targets) {
             if (t.sampler.times.empty()) {
                 continue;
@@ -159,18 +169,13 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets) {
             channel.target_path = kPaths[t.path];
             anim.samplers.push_back(sampler);
             anim.channels.push_back(channel);
-            t.sampler = BuiltSampler();  // its bytes are in data_ now
+            t.sampler = BuiltSampler();  // its bytes are in the buffer now
         }
-        tinygltf::Buffer& buffer = m_.buffers[0];
-        buffer.data.resize((buffer.data.size() + 3) & ~size_t(3), 0);
         tinygltf::BufferView view;
         view.buffer = 0;
-        view.byteOffset = buffer.data.size();
-        view.byteLength = data_.size();
-        buffer.data.insert(buffer.data.end(), data_.begin(), data_.end());
+        view.byteOffset = viewStart_;
+        view.byteLength = data.size() - viewStart_;
         m_.bufferViews.push_back(view);
-        data_.clear();
-        data_.shrink_to_fit();
     }
     // A clip left without channels is no longer a valid animation.
     m_.animations.erase(
@@ -193,22 +198,22 @@ void SceneWriter::makeNodeTrs(int node) {
     n.scale.assign(s.begin(), s.end());
 }
 
-int SceneWriter::appendAccessor(const std::vector<float>& data, int type, size_t count,
+int SceneWriter::appendAccessor(const std::vector<float>& values, int type, size_t count,
                                 bool withMinMax) {
+    std::vector<unsigned char>& data = m_.buffers[0].data;
     tinygltf::Accessor a;
     a.bufferView = view_;
-    a.byteOffset = data_.size();
+    a.byteOffset = data.size() - viewStart_;
     a.componentType = TINYGLTF_COMPONENT_TYPE_FLOAT;
     a.type = type;
     a.count = count;
-    if (withMinMax && !data.empty()) {
-        auto mm = std::minmax_element(data.begin(), data.end());
+    if (withMinMax && !values.empty()) {
+        auto mm = std::minmax_element(values.begin(), values.end());
         a.minValues = {double(*mm.first) + 0.0};
         a.maxValues = {double(*mm.second) + 0.0};
     }
-    size_t at = data_.size();
-    data_.resize(at + data.size() * sizeof(float));
-    std::memcpy(data_.data() + at, data.data(), data.size() * sizeof(float));
-    m_.accessors.push_back(a);
+    const unsigned char* bytes = reinterpret_cast<const unsigned char*>(values.data());
+    data.insert(data.end(), bytes, bytes + values.size() * sizeof(float));
+    m_.accessors.push_back(std::move(a));
     return int(m_.accessors.size()) - 1;
 }

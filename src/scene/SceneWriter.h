@@ -48,11 +48,12 @@ class SceneWriter {
     // first; returns the accessors of the samplers that nothing uses any more.
     std::set<int> removeOldChannels(std::vector<Target>* targets);
     void appendSamplers(std::vector<Target>* targets);
-    int appendAccessor(const std::vector<float>& data, int type, size_t count, bool withMinMax);
+    // Appends `values` to buffer 0 (already reserved) as a float accessor of the new view.
+    int appendAccessor(const std::vector<float>& values, int type, size_t count, bool withMinMax);
     void makeNodeTrs(int node);
 
     SceneDocument& doc_;
     tinygltf::Model& m_;
-    std::vector<unsigned char> data_;  // new animation bytes, one buffer view in buffer 0
-    int view_ = -1;
+    int view_ = -1;         // the buffer view of the new animation bytes, at the end of buffer 0
+    size_t viewStart_ = 0;  // its offset in buffer 0
 };
