@@ -165,7 +165,6 @@ void ModelCompactor::compactBuffers(const std::set<int>& buffers) {
             k = j;
         }
         bytes.resize((written + 3) & ~size_t(3), 0);
-        bytes.shrink_to_fit();
     }
 }
 
