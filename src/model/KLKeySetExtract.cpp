@@ -1,30 +1,41 @@
 // Key-shape extraction: the key channels of a kind-1 keyset sampled from its scene.
+#include <algorithm>
 #include <memory>
+#include <vector>
 
 #include "model/KLKeySet.h"
 #include "scene/KLWire.h"
 #include "scene/OrDagNode.h"
 #include "toolkit/KLErrHandler.h"
 
-void KLKeySet::extract_dag(CueTime t, int index, OrDagNode* node) {
-    if (!node)
+void KLKeySet::extract_dag(CueTime t, int index, OrDagNode* top) {
+    if (!top)
         return;
     const double frame = t.Frames();
-    const char* nodeName = KLWire::NodeName(node);
-    for (int c = KLKeyChannel::kTX; c <= KLKeyChannel::kSZ; ++c) {
-        OrChannel* channel = KLWire::FindChannel(node, c);
-        if (!channel)
-            continue;
-        const double value = channel->eval(frame);
-        KLKeyChannel* kc = GetKeyChannel(nodeName, c);
-        if (!kc)
-            kc = AddKeyChannel(std::make_unique<KLKeyChannel>(nodeName, c, keyShapeCount));
-        kc->Set(index, float(value));
-    }
-    if (node->asGroupNodePtr()) {
-        for (std::unique_ptr<OrDagNode> child = node->childNode(); child;
-             child = child->nextNode()) {
-            extract_dag(t, index, child.get());
+    // Depth first, parents before children, with an explicit stack: a scene's hierarchy may be
+    // deeper than the call stack.
+    std::vector<std::unique_ptr<OrDagNode>> stack;
+    stack.push_back(std::make_unique<OrDagNode>(top->documentPtr(), top->index()));
+    while (!stack.empty()) {
+        std::unique_ptr<OrDagNode> node = std::move(stack.back());
+        stack.pop_back();
+        const char* nodeName = KLWire::NodeName(node.get());
+        for (int c = KLKeyChannel::kTX; c <= KLKeyChannel::kSZ; ++c) {
+            OrChannel* channel = KLWire::FindChannel(node.get(), c);
+            if (!channel)
+                continue;
+            const double value = channel->eval(frame);
+            KLKeyChannel* kc = GetKeyChannel(nodeName, c);
+            if (!kc)
+                kc = AddKeyChannel(std::make_unique<KLKeyChannel>(nodeName, c, keyShapeCount));
+            kc->Set(index, float(value));
+        }
+        if (node->asGroupNodePtr()) {
+            const size_t at = stack.size();
+            for (std::unique_ptr<OrDagNode> child = node->childNode(); child;
+                 child = child->nextNode())
+                stack.push_back(std::make_unique<OrDagNode>(child->documentPtr(), child->index()));
+            std::reverse(stack.begin() + long(at), stack.end());  // first child on top
         }
     }
 }
@@ -54,4 +65,7 @@ void KLKeySet::ExtractKeys(OrDagNode* scene) {
             ++it;
         }
     }
+    if (keyChannels.empty() && keyShapeCount > 1)
+        KLWarning("Keyset [%s]: its key shapes differ in no channel, so it has no key channels.\n",
+                  Name() ? Name() : "");
 }

@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdint>
 #include <iostream>
+#include <limits>
 #include <new>
 
 #include "model/FloatText.h"
@@ -244,7 +246,21 @@ void KLKeyTrack::Read(std::istream& in, KLKeySet* set) {
             break;
         if (n < 3 || !st.Matches("event") || !set)
             continue;
-        const CueTime t(st.ArgDouble(1), 0);
+        // Times beyond what a CueTime holds (about +-99 hours) are reported and skipped, not
+        // clamped onto the end of the range.
+        const double frames = st.ArgDouble(1);
+        const int rate = CueTime::default_fps > 0 ? CueTime::default_fps : 30;
+        const double ticks = frames * CueTime::kTicksPerSecond / rate;
+        if (!(std::fabs(ticks) < double(std::numeric_limits<int32_t>::max()))) {
+            KLStdImp::Workspace().Inform(
+                KLFmt("Event at frame %s in keyset [%s] is beyond the supported time range, "
+                      "skipped.",
+                      st.ArgText(1), set->Name() ? set->Name() : "")
+                    .c_str(),
+                "Dismiss");
+            continue;
+        }
+        const CueTime t(frames, 0);
         const char* shapeName = st.ArgText(2);
         const int index = set->GetKeyShapeId(shapeName);
         KLKey* key = set->GetKeyShape(index);

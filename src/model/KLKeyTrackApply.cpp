@@ -120,6 +120,18 @@ int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, Cu
     if (!keySet)
         return 1;
     const size_t eventCount = size_t(events.Count());
+    // glTF has no time before 0: the scene cuts every stored curve there.
+    int early = 0;
+    for (const KLKeyEvent* event : events) {
+        if (event->time >= start && event->time <= end && (event->time + offset).Ticks() < 0)
+            ++early;
+    }
+    if (early > 0)
+        imp.Inform(KLFmt("Keyset [%s]: %d key%s before time 0 dropped; each curve starts at 0 "
+                         "with its value there.",
+                         keySet->Name() ? keySet->Name() : "", early, early == 1 ? "" : "s")
+                       .c_str(),
+                   "Dismiss");
 
     if (keySet->kind == 1) {
         for (const auto& kc : keySet->keyChannels) {

@@ -100,17 +100,39 @@ double ChannelCurve::segment(size_t i, double seconds) const {
 }
 
 double ChannelCurve::SlopeAt(double seconds, bool outgoing) const {
-    size_t n = keys_.size();
-    if (n < 2 || std::isnan(seconds)) {
+    if (keys_.size() < 2 || std::isnan(seconds)) {
         return 0.0;
     }
     double eps = 1e-9 + std::fabs(seconds) * 1.2e-7;
     auto it = std::upper_bound(keys_.begin(), keys_.end(), seconds + eps,
                                [](double s, const Key& k) { return s < k.time; });
-    if (it == keys_.begin()) {
+    return slopeAfter(size_t(it - keys_.begin()), seconds, eps, outgoing);
+}
+
+void ChannelCurve::SlopesSorted(const std::vector<double>& times, bool outgoing,
+                                std::vector<double>* out) const {
+    out->resize(times.size());
+    size_t n = keys_.size(), i = 0;  // keys before i lie at or before the current time
+    for (size_t k = 0; k < times.size(); ++k) {
+        double seconds = times[k];
+        if (n < 2 || std::isnan(seconds)) {
+            (*out)[k] = 0.0;
+            continue;
+        }
+        double eps = 1e-9 + std::fabs(seconds) * 1.2e-7;
+        while (i < n && keys_[i].time <= seconds + eps) {
+            ++i;
+        }
+        (*out)[k] = slopeAfter(i, seconds, eps, outgoing);
+    }
+}
+
+double ChannelCurve::slopeAfter(size_t after, double seconds, double eps, bool outgoing) const {
+    size_t n = keys_.size();
+    if (after == 0) {
         return 0.0;  // held before the first key
     }
-    size_t i = size_t(it - keys_.begin()) - 1;  // the last key at or before `seconds`
+    size_t i = after - 1;  // the last key at or before `seconds`
     if (std::fabs(seconds - keys_[i].time) <= eps) {
         // At key i: the segment leaving it, or the one arriving at it.
         if (outgoing) {
@@ -132,6 +154,16 @@ double ChannelCurve::SlopeAt(double seconds, bool outgoing) const {
     return ((6 * u * u - 6 * u) * (a.value - b.value) + (3 * u * u - 4 * u + 1) * m0 +
             (3 * u * u - 2 * u) * m1) /
            dt;
+}
+
+bool ChannelCurve::Constant() const {
+    for (size_t i = 0; i + 1 < keys_.size(); ++i) {
+        if (keys_[i].value != keys_[i + 1].value ||
+            (keys_[i].out != kStep && (OutSlope(i) != 0 || InSlope(i + 1) != 0))) {
+            return false;
+        }
+    }
+    return true;
 }
 
 void ChannelCurve::EvaluateSorted(const std::vector<double>& times,
@@ -183,6 +215,10 @@ bool ChannelCurve::AllStep() const {
 }
 
 void ChannelCurve::Merge(const Key& key) {
+    if (keys_.empty() || key.time > keys_.back().time + kSameTime) {
+        keys_.push_back(key);  // the usual case: keys given in time order
+        return;
+    }
     auto it = std::lower_bound(keys_.begin(), keys_.end(), key.time - kSameTime,
                                [](const Key& k, double t) { return k.time < t; });
     if (it != keys_.end() && std::fabs(it->time - key.time) <= kSameTime) {
@@ -190,4 +226,46 @@ void ChannelCurve::Merge(const Key& key) {
     } else {
         keys_.insert(it, key);
     }
+}
+
+size_t ChannelCurve::TrimBefore(double seconds) {
+    size_t first = 0;
+    while (first < keys_.size() && keys_[first].time < seconds - kSameTime) {
+        ++first;
+    }
+    if (first == 0) {
+        return 0;
+    }
+    if (first == keys_.size()) {  // every key is earlier: the curve holds its last value
+        Key hold = keys_.back();
+        hold.time = seconds;
+        hold.in = hold.out = kLinear;
+        keys_.assign(1, hold);
+        return first;
+    }
+    // The kept keys' slopes as they are now, before their neighbours change.
+    Key& next = keys_[first];
+    double in = InSlope(first), out = OutSlope(first);
+    next.in = kExplicit;
+    next.inSlope = in;
+    if (next.out == kSmooth || (next.out == kLinear && first + 1 == keys_.size())) {
+        next.out = kExplicit;
+        next.outSlope = out;
+    }
+    bool atCut = std::fabs(next.time - seconds) <= kSameTime;
+    Key cut;
+    if (!atCut) {
+        cut.time = seconds;
+        cut.value = Evaluate(seconds);
+        cut.in = kExplicit;
+        cut.inSlope = SlopeAt(seconds, false);
+        bool step = keys_[first - 1].out == kStep;
+        cut.out = step ? kStep : kExplicit;
+        cut.outSlope = step ? 0.0 : SlopeAt(seconds, true);
+    }
+    keys_.erase(keys_.begin(), keys_.begin() + long(first));
+    if (!atCut) {
+        keys_.insert(keys_.begin(), cut);
+    }
+    return first;
 }

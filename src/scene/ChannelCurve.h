@@ -48,17 +48,28 @@ class ChannelCurve : public OrChannel {
     // The curve's derivative (units per second) at `seconds`, from the right (`outgoing`) or
     // from the left; zero where the curve holds, and at a step.
     double SlopeAt(double seconds, bool outgoing) const;
+    // SlopeAt at each of `times` (seconds, ascending), into `out`, in one pass over the keys.
+    void SlopesSorted(const std::vector<double>& times, bool outgoing,
+                      std::vector<double>* out) const;
+    // True when the curve has the same value everywhere.
+    bool Constant() const;
     // True when every segment is a straight line (both ends linear) or every one a step.
     bool AllLinear() const;
     bool AllStep() const;
 
     // Inserts the key or replaces the one at the same time (within half a microsecond).
     void Merge(const Key& key);
+    // Cuts the curve at `seconds`: keys before it are dropped and, when there were some, a key
+    // at `seconds` holds the curve's value there; the curve from `seconds` on is unchanged
+    // (slopes that depended on a dropped key are made explicit). Returns the keys dropped.
+    size_t TrimBefore(double seconds);
 
   private:
     double segment(size_t i, double seconds) const;  // inside the segment from key i to i + 1
     double smoothSlope(size_t i) const;
     double segmentSlope(size_t i) const;  // of the straight line from key i to key i + 1
+    // SlopeAt, given the index of the first key after `seconds` (plus `eps`, the rounding).
+    double slopeAfter(size_t after, double seconds, double eps, bool outgoing) const;
 
     std::vector<Key> keys_;
 };

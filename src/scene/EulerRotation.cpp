@@ -1,5 +1,6 @@
 #include "scene/EulerRotation.h"
 
+#include <algorithm>
 #include <cmath>
 
 namespace {
@@ -116,4 +117,37 @@ void EulerRotation::Decompose(const double* mat, Vec3* t, Quat* r, Vec3* s) {
         }
     }
     *r = matrix_quat(m);
+}
+
+EulerRotation::Quat EulerRotation::Slerp(const Quat& a, const Quat& b, double u) {
+    double dot = a[0] * b[0] + a[1] * b[1] + a[2] * b[2] + a[3] * b[3];
+    double sign = dot < 0 ? -1.0 : 1.0;
+    dot *= sign;
+    double wa = 1 - u, wb = u;
+    if (dot < 0.9999999) {
+        double angle = std::acos(dot), s = std::sin(angle);
+        wa = std::sin((1 - u) * angle) / s;
+        wb = std::sin(u * angle) / s;
+    }
+    Quat q;
+    for (size_t i = 0; i < 4; ++i) {
+        q[i] = wa * a[i] + wb * sign * b[i];
+    }
+    double n = std::sqrt(q[0] * q[0] + q[1] * q[1] + q[2] * q[2] + q[3] * q[3]);
+    for (double& v : q) {
+        v /= n;
+    }
+    return q;
+}
+
+double EulerRotation::AngleBetween(const Quat& a, const Quat& b) {
+    // The chord between the nearer of b and -b and a is 2 sin(angle / 4): accurate for the
+    // tiny angles that tolerances are about, where acos of the dot product is not.
+    double same = 0, opposite = 0;
+    for (size_t i = 0; i < 4; ++i) {
+        same += (a[i] - b[i]) * (a[i] - b[i]);
+        opposite += (a[i] + b[i]) * (a[i] + b[i]);
+    }
+    double chord = std::sqrt(std::min(same, opposite));
+    return 4 * std::asin(std::min(1.0, chord / 2)) * kDeg;
 }

@@ -17,5 +17,10 @@ class EulerRotation {
     // `degrees` moved by whole turns per axis to lie as near as possible to `previous`.
     static Vec3 Unwrap(const Vec3& previous, const Vec3& degrees);
     // Translation, rotation (quaternion) and scale of a column-major matrix without shear.
+    // The spherical linear interpolation from `a` to `b` at `u` (0..1), as a glTF player
+    // interpolates LINEAR rotation samples; `a` and `b` are unit quaternions.
+    static Quat Slerp(const Quat& a, const Quat& b, double u);
+    // The angle in degrees of the rotation that takes `a` to `b` (unit quaternions).
+    static double AngleBetween(const Quat& a, const Quat& b);
     static void Decompose(const double* matrix16, Vec3* translation, Quat* rotation, Vec3* scale);
 };

@@ -15,16 +15,23 @@ namespace {
 bool demangle = false;
 
 // Calls `visit` on `index` and every node below it, depth first, parents before children;
-// stops as soon as `visit` returns true and then returns that node (else -2).
+// stops as soon as `visit` returns true and then returns that node (else -2). Iterative: a
+// hierarchy may be deeper than the call stack.
 int walk(const SceneDocument& doc, int index, const std::function<bool(int)>& visit) {
     if (visit(index)) {
         return index;
     }
-    for (int c = doc.FirstChild(index); c >= 0; c = doc.NextSibling(c)) {
-        int found = walk(doc, c, visit);
-        if (found != -2) {
-            return found;
+    int at = doc.FirstChild(index);
+    while (at >= 0) {
+        if (visit(at)) {
+            return at;
         }
+        int next = doc.FirstChild(at);
+        // Without children: the next sibling of the nearest node on the way back up to `index`.
+        for (int up = at; next < 0 && up >= 0 && up != index; up = doc.Parent(up)) {
+            next = doc.NextSibling(up);
+        }
+        at = next;
     }
     return -2;
 }

@@ -17,6 +17,7 @@ const char* const kPaths[3] = {"translation", "rotation", "scale"};
 // Key times beyond the workspace's time range (a CueTime reaches about 99 hours) are refused:
 // nothing could address them, and storing samples every frame up to them would never end.
 constexpr double kMaxSeconds = 360000.0;
+const char* const kNotRegular = " is not a regular file";
 
 uint32_t read_u32(const unsigned char* p) {
     return uint32_t(p[0]) | uint32_t(p[1]) << 8 | uint32_t(p[2]) << 16 | uint32_t(p[3]) << 24;
@@ -48,6 +49,20 @@ bool no_file_read(std::vector<unsigned char>*, std::string* err, const std::stri
 }
 bool no_file_write(std::string*, const std::string&, const std::vector<unsigned char>&, void*) {
     return false;
+}
+
+// Buffers and images named by a uri are read only from regular files: a directory, a device or
+// a pipe is reported as unreadable instead of being read as bytes.
+bool read_regular_file(std::vector<unsigned char>* out, std::string* err, const std::string& path,
+                       void* data) {
+    struct stat st;
+    if (::stat(path.c_str(), &st) != 0 || !S_ISREG(st.st_mode)) {
+        if (err) {
+            *err += "file " + path + kNotRegular + "\n";
+        }
+        return false;
+    }
+    return tinygltf::ReadWholeFile(out, err, path, data);
 }
 
 // Checks the .glb container so that the loader never reads past the bytes it is given.
@@ -137,7 +152,10 @@ std::shared_ptr<SceneDocument> SceneDocument::parse(const unsigned char* data, s
     std::shared_ptr<SceneDocument> doc(new SceneDocument());
     tinygltf::TinyGLTF loader;
     loader.SetImageLoader(keep_image_bytes, nullptr);
-    if (!allowFiles) {
+    if (allowFiles) {
+        loader.SetFsCallbacks({tinygltf::FileExists, tinygltf::ExpandFilePath, read_regular_file,
+                               tinygltf::WriteWholeFile, nullptr});
+    } else {
         loader.SetFsCallbacks({no_file_exists, same_path, no_file_read, no_file_write, nullptr});
     }
     std::string err, warn;
@@ -156,6 +174,14 @@ std::shared_ptr<SceneDocument> SceneDocument::parse(const unsigned char* data, s
     }
     if (!ok) {
         return bad(err.empty() ? "it does not parse as glTF" : err);
+    }
+    // An image that could not be read is only a warning to the loader; one named by something
+    // other than a file is an error here, as it is for a buffer.
+    size_t notFile = warn.find(kNotRegular);
+    if (notFile != std::string::npos) {
+        size_t from = warn.rfind('\n', notFile);
+        from = from == std::string::npos ? 0 : from + 1;
+        return bad(warn.substr(from, warn.find('\n', notFile) - from));
     }
     std::string why;
     if (!SceneChecker::Check(doc->model_, &why) || !doc->buildHierarchy(&why)) {
@@ -250,7 +276,7 @@ void SceneDocument::buildNames() {
     }
     curves_.clear();
     curves_.resize(n);
-    touched_.assign(n, false);
+    touched_.assign(n, 0);
 }
 
 bool SceneDocument::readAnimations(std::string* why) {
@@ -266,89 +292,95 @@ bool SceneDocument::readAnimations(std::string* why) {
             if (path < 0 || ch.target_node < 0 || curves_[size_t(ch.target_node)][path * 3]) {
                 continue;  // weights, extension targets, or already given by an earlier one
             }
-            const tinygltf::AnimationSampler& s = anim.samplers[size_t(ch.sampler)];
-            std::string where = "animation " + std::to_string(ai) + ": ";
-            bool cubic = s.interpolation == "CUBICSPLINE";
-            bool step = s.interpolation == "STEP";
-            if (!cubic && !step && s.interpolation != "LINEAR" && !s.interpolation.empty()) {
-                *why = where + "unknown interpolation \"" + s.interpolation + "\"";
-                return false;
-            }
-            int width = path == 1 ? 4 : 3;
-            std::vector<float> times, values;
-            if (!SceneChecker::ReadFloats(model_, s.input, 1, &times, why) ||
-                !SceneChecker::ReadFloats(model_, s.output, width, &values, why)) {
-                *why = where + *why;
-                return false;
-            }
-            size_t n = times.size();
-            if (values.size() != n * size_t(width) * (cubic ? 3 : 1)) {
-                *why = where + "sampler output count does not match its input count";
-                return false;
-            }
-            for (size_t k = 0; k < n; ++k) {
-                if (std::fabs(times[k]) > kMaxSeconds) {
-                    *why = where + "a key time lies outside +-100 hours";
-                    return false;
-                }
-                if (k > 0 && !(times[k] > times[k - 1])) {
-                    *why = where + "key times are not strictly increasing";
-                    return false;
-                }
-            }
             std::array<std::vector<ChannelCurve::Key>, 3> keys;
-            EulerRotation::Vec3 previous = {0, 0, 0};
-            for (size_t k = 0; k < n; ++k) {
-                const float* v = values.data() + (cubic ? (3 * k + 1) : k) * size_t(width);
-                const float* in = cubic ? v - width : nullptr;
-                const float* out = cubic ? v + width : nullptr;
-                double val[3], inSlope[3] = {0, 0, 0}, outSlope[3] = {0, 0, 0};
-                if (path == 1) {
-                    EulerRotation::Quat q = {v[0], v[1], v[2], v[3]};
-                    EulerRotation::Vec3 e = EulerRotation::ToEuler(q);
-                    if (k > 0) {
-                        e = EulerRotation::Unwrap(previous, e);
-                    }
-                    previous = e;
-                    for (int a = 0; a < 3; ++a) {
-                        val[a] = e[a];
-                    }
-                    if (cubic) {  // the Euler slope of a quaternion tangent, by a small step
-                        const double h = 1e-4;
-                        for (int side = 0; side < 2; ++side) {
-                            const float* t = side ? out : in;
-                            EulerRotation::Quat qs = {v[0] + h * t[0], v[1] + h * t[1],
-                                                      v[2] + h * t[2], v[3] + h * t[3]};
-                            EulerRotation::Vec3 es =
-                                EulerRotation::Unwrap(e, EulerRotation::ToEuler(qs));
-                            for (int a = 0; a < 3; ++a) {
-                                (side ? outSlope : inSlope)[a] = (es[a] - e[a]) / h;
-                            }
-                        }
-                    }
-                } else {
-                    for (int a = 0; a < 3; ++a) {
-                        val[a] = v[a];
-                        inSlope[a] = cubic ? in[a] : 0;
-                        outSlope[a] = cubic ? out[a] : 0;
-                    }
-                }
-                for (int a = 0; a < 3; ++a) {
-                    ChannelCurve::Key key;
-                    key.time = times[k];
-                    key.value = val[a];
-                    key.in = cubic ? ChannelCurve::kExplicit : ChannelCurve::kLinear;
-                    key.out = cubic ? ChannelCurve::kExplicit
-                                    : (step ? ChannelCurve::kStep : ChannelCurve::kLinear);
-                    key.inSlope = inSlope[a];
-                    key.outSlope = outSlope[a];
-                    keys[size_t(a)].push_back(key);
-                }
+            if (!readSampler(anim.samplers[size_t(ch.sampler)], path, &keys, why)) {
+                *why = "animation " + std::to_string(ai) + ": " + *why;
+                return false;
             }
             for (int a = 0; a < 3; ++a) {
                 curves_[size_t(ch.target_node)][path * 3 + a] =
                     std::make_unique<ChannelCurve>(std::move(keys[size_t(a)]));
             }
+        }
+    }
+    return true;
+}
+
+bool SceneDocument::readSampler(const tinygltf::AnimationSampler& s, int path,
+                                std::array<std::vector<ChannelCurve::Key>, 3>* keys,
+                                std::string* why) const {
+    bool cubic = s.interpolation == "CUBICSPLINE";
+    bool step = s.interpolation == "STEP";
+    if (!cubic && !step && s.interpolation != "LINEAR" && !s.interpolation.empty()) {
+        *why = "unknown interpolation \"" + s.interpolation + "\"";
+        return false;
+    }
+    int width = path == 1 ? 4 : 3;
+    std::vector<float> times, values;
+    if (!SceneChecker::ReadFloats(model_, s.input, 1, &times, why) ||
+        !SceneChecker::ReadFloats(model_, s.output, width, &values, why)) {
+        return false;
+    }
+    size_t n = times.size();
+    if (values.size() != n * size_t(width) * (cubic ? 3 : 1)) {
+        *why = "sampler output count does not match its input count";
+        return false;
+    }
+    for (size_t k = 0; k < n; ++k) {
+        if (std::fabs(times[k]) > kMaxSeconds) {
+            *why = "a key time lies outside +-100 hours";
+            return false;
+        }
+        if (k > 0 && !(times[k] > times[k - 1])) {
+            *why = "key times are not strictly increasing";
+            return false;
+        }
+    }
+    EulerRotation::Vec3 previous = {0, 0, 0};
+    for (size_t k = 0; k < n; ++k) {
+        const float* v = values.data() + (cubic ? (3 * k + 1) : k) * size_t(width);
+        const float* in = cubic ? v - width : nullptr;
+        const float* out = cubic ? v + width : nullptr;
+        double val[3], inSlope[3] = {0, 0, 0}, outSlope[3] = {0, 0, 0};
+        if (path == 1) {
+            EulerRotation::Quat q = {v[0], v[1], v[2], v[3]};
+            EulerRotation::Vec3 e = EulerRotation::ToEuler(q);
+            if (k > 0) {
+                e = EulerRotation::Unwrap(previous, e);
+            }
+            previous = e;
+            for (int a = 0; a < 3; ++a) {
+                val[a] = e[a];
+            }
+            if (cubic) {  // the Euler slope of a quaternion tangent, by a small step
+                const double h = 1e-4;
+                for (int side = 0; side < 2; ++side) {
+                    const float* t = side ? out : in;
+                    EulerRotation::Quat qs = {v[0] + h * t[0], v[1] + h * t[1], v[2] + h * t[2],
+                                              v[3] + h * t[3]};
+                    EulerRotation::Vec3 es = EulerRotation::Unwrap(e, EulerRotation::ToEuler(qs));
+                    for (int a = 0; a < 3; ++a) {
+                        (side ? outSlope : inSlope)[a] = (es[a] - e[a]) / h;
+                    }
+                }
+            }
+        } else {
+            for (int a = 0; a < 3; ++a) {
+                val[a] = v[a];
+                inSlope[a] = cubic ? in[a] : 0;
+                outSlope[a] = cubic ? out[a] : 0;
+            }
+        }
+        for (int a = 0; a < 3; ++a) {
+            ChannelCurve::Key key;
+            key.time = times[k];
+            key.value = val[a];
+            key.in = cubic ? ChannelCurve::kExplicit : ChannelCurve::kLinear;
+            key.out = cubic ? ChannelCurve::kExplicit
+                            : (step ? ChannelCurve::kStep : ChannelCurve::kLinear);
+            key.inSlope = inSlope[a];
+            key.outSlope = outSlope[a];
+            (*keys)[size_t(a)].push_back(key);
         }
     }
     return true;
@@ -377,19 +409,26 @@ ChannelCurve* SceneDocument::Curve(int node, int channel) const {
     return curves_[size_t(node)][size_t(channel)].get();
 }
 
-void SceneDocument::SetCurve(int node, int channel, const std::vector<ChannelCurve::Key>& keys,
-                             bool clearFirst) {
+size_t SceneDocument::SetCurve(int node, int channel, const std::vector<ChannelCurve::Key>& keys,
+                               bool clearFirst) {
     auto& slot = curves_[size_t(node)][size_t(channel)];
     if (clearFirst || !slot) {
         slot = std::make_unique<ChannelCurve>();
     }
+    if (slot->empty()) {
+        // Keys in time order, as the scene interface gives them, are taken as they are; of
+        // two at one time the later wins, as Merge would have it.
+        slot->keys().reserve(keys.size());
+    }
     for (const ChannelCurve::Key& k : keys) {
         slot->Merge(k);
     }
+    size_t dropped = slot->TrimBefore(0.0);
     if (slot->empty()) {
         slot.reset();
     }
-    touched_[size_t(node)] = true;
+    touched_[size_t(node)] |= 1u << channel;
+    return dropped;
 }
 
 double SceneDocument::RestValue(int node, int channel) const {
@@ -421,7 +460,7 @@ double SceneDocument::RestValue(int node, int channel) const {
 }
 
 void SceneDocument::ClearTouched() {
-    touched_.assign(touched_.size(), false);
+    touched_.assign(touched_.size(), 0);
 }
 
 bool SceneDocument::Store(const std::string& path, std::string* error) {

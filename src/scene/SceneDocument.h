@@ -39,15 +39,21 @@ class SceneDocument {
     // The key curve of one channel, null when the node does not animate it.
     ChannelCurve* Curve(int node, int channel) const;
     // Replaces (or with `clearFirst` false, merges keys into) one channel's curve and marks the
-    // node for rewriting at the next Store. An empty key list removes the curve.
-    void SetCurve(int node, int channel, const std::vector<ChannelCurve::Key>& keys,
-                  bool clearFirst);
-    bool Touched(int node) const { return touched_[size_t(node)]; }
+    // channel for rewriting at the next Store. An empty key list removes the curve. glTF has no
+    // time before 0: the curve is cut at time 0 (TrimBefore); returns the keys that dropped.
+    size_t SetCurve(int node, int channel, const std::vector<ChannelCurve::Key>& keys,
+                    bool clearFirst);
+    // Whether any channel of the node, or of its path (0 translation, 1 rotation, 2 scale),
+    // was set since the last Store.
+    bool Touched(int node) const { return touched_[size_t(node)] != 0; }
+    bool TouchedPath(int node, int path) const {
+        return (touched_[size_t(node)] >> (3 * path) & 7u) != 0;
+    }
     // The channel's value in the node's rest transform (its TRS or decomposed matrix).
     double RestValue(int node, int channel) const;
 
     // Writes the scene to `path` (.glb by that ending, else .gltf with embedded buffers)
-    // through a temporary file in the same directory renamed into place.
+    // through a SafeFile: the old file or the whole new one, never half of it.
     bool Store(const std::string& path, std::string* error);
 
     const std::string& path() const { return path_; }
@@ -63,6 +69,9 @@ class SceneDocument {
     bool buildHierarchy(std::string* why);
     void buildNames();
     bool readAnimations(std::string* why);
+    // The curves of one sampler driving `path` (0 translation, 1 rotation, 2 scale).
+    bool readSampler(const tinygltf::AnimationSampler& s, int path,
+                     std::array<std::vector<ChannelCurve::Key>, 3>* keys, std::string* why) const;
 
     tinygltf::Model model_;
     std::string path_;
@@ -72,5 +81,5 @@ class SceneDocument {
     std::vector<int> next_;  // next sibling under the same parent (or among the roots)
     std::vector<int> roots_;
     std::vector<std::array<std::unique_ptr<ChannelCurve>, kChannels>> curves_;
-    std::vector<bool> touched_;
+    std::vector<unsigned> touched_;  // per node, one bit per channel
 };

@@ -6,48 +6,54 @@
 
 #include <tiny_gltf.h>
 
+#include "scene/SamplerBuilder.h"
+
 class SceneDocument;
 
-// Writes an open scene back to a glTF file. The translation, rotation and scale animation of
-// every node whose channels were stored into is rewritten in the scene's first animation (or a
-// new one named "chirrup"); everything else in the model is written as it was read. The
-// document's model is updated in place, so that it matches what was written.
+// Writes an open scene back to a glTF file. Only the node paths (translation, rotation, scale)
+// whose channels were set since the last store are rewritten; everything else in the model,
+// other paths of the same node included, is written as it was read.
+//
+// A rewritten path ends up animated by one channel in one clip: the first animation (clip) that
+// animated that node path when the scene was read receives the new channel, or when none did,
+// the scene's first animation, or a new one named "chirrup" when the scene has none. Channels on
+// that path in every other clip are removed (with their samplers, accessors, buffer views and
+// the bytes only they used); a clip left without channels is removed, and so is a buffer left
+// without views. A path whose three channels were all removed ends up unanimated. Key times
+// before 0 never reach the file (the document cuts every set curve at 0). How each path's
+// sampler is written (exact keys, cubic pieces, or samples within a tolerance) is described at
+// SamplerBuilder. A .glb is written with every buffer and every embedded image in its binary
+// chunk. The document's model is updated in place, so that it matches what was written.
 class SceneWriter {
   public:
     explicit SceneWriter(SceneDocument& doc);
     // `path` ending in ".glb" gives a binary file, anything else a .gltf with embedded
-    // buffers; written to a temporary file in the same directory and renamed into place.
+    // buffers; written through a SafeFile (the old file or the whole new one, never half). False
+    // with `error` set (naming the file, and the node when a curve cannot be written), and the
+    // file untouched, on failure.
     bool Write(const std::string& path, std::string* error);
 
   private:
-    struct NewSampler {
+    struct Target {
         int node;
-        const char* path;
-        std::string interpolation;
-        std::vector<float> times;   // seconds
-        std::vector<float> values;  // width floats per element
-        int width;
+        int path;       // 0 translation, 1 rotation, 2 scale
+        int clip = -1;  // the animation receiving the new channel
+        BuiltSampler sampler;
     };
 
-    void rewriteAnimation();
-    std::set<int> removeTouchedChannels(tinygltf::Animation* anim);
-    void collectGarbage(const std::set<int>& freedAccessors);
-    void compactBuffers(const std::set<int>& buffers);
-    void sampleTranslationScale(int node, int firstChannel, const char* path);
-    void sampleRotation(int node);
-    // Every key time of the node's three channels from `firstChannel` and, with `frames`,
-    // every whole frame between the first and last key, ascending, one per distinct float.
-    std::vector<double> sampleTimes(int node, int firstChannel, bool frames) const;
-    // The three channels from `first` at `times` (seconds, ascending); an unanimated axis
-    // holds its rest value.
-    void evaluateAxes(int node, int first, const std::vector<double>& times,
-                      std::vector<double> axis[3]) const;
-    int appendAccessor(const std::vector<float>& data, int type, size_t count, bool withMinMax);
+    // The rewritten paths with their built samplers; false (nothing changed yet) when one
+    // cannot be built.
+    bool buildTargets(std::vector<Target>* targets, std::string* why);
+    // Removes every channel on a rewritten path from every clip, choosing each path's clip
+    // first; returns the accessors of the samplers that nothing uses any more.
+    std::set<int> removeOldChannels(std::vector<Target>* targets);
+    void appendSamplers(std::vector<Target>* targets);
+    // Appends `values` to buffer 0 (already reserved) as a float accessor of the new view.
+    int appendAccessor(const std::vector<float>& values, int type, size_t count, bool withMinMax);
     void makeNodeTrs(int node);
 
     SceneDocument& doc_;
     tinygltf::Model& m_;
-    std::vector<NewSampler> samplers_;
-    std::vector<unsigned char> data_;  // new animation bytes, one buffer view in buffer 0
-    int view_ = -1;
+    int view_ = -1;         // the buffer view of the new animation bytes, at the end of buffer 0
+    size_t viewStart_ = 0;  // its offset in buffer 0
 };

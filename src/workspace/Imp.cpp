@@ -15,6 +15,7 @@
 #include "scene/KLWireSource.h"
 #include "toolkit/CueSound.h"
 #include "toolkit/KLImageSGI.h"
+#include "toolkit/KLString.h"
 #include "toolkit/OnSignal.h"
 #include "workspace/ConsoleGhost.h"
 #include "workspace/Ghost.h"
@@ -79,6 +80,15 @@ void Imp::report(const std::string& message) {
 }
 
 void Imp::SetFps(int n) {
+    if (n > kMaxFps) {
+        const std::string message = KLFmt(
+            "Frame rate %d is above the highest supported, %d: %d is used.", n, kMaxFps, kMaxFps);
+        if (batchMode || !theGhost)
+            std::cerr << message << std::endl;
+        else
+            report(message);
+        n = kMaxFps;
+    }
     fps = n > 0 ? n : CueTime::kDefaultFps;
     CueTime::default_fps = fps;
 }

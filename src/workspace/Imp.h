@@ -27,6 +27,9 @@ class KLWireSource;
 class Imp : public KLStdImp {
   public:
     static constexpr int kMaxKeysets = 10;
+    // The highest frame rate accepted (a frame must stay several ticks long); above it the
+    // rate is clamped with a warning.
+    static constexpr int kMaxFps = 1000;
 
     // The error log: a file that collects the toolkit's reports, opened and closed for every
     // message so that it is complete on disk at every moment.

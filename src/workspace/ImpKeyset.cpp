@@ -149,10 +149,8 @@ void Imp::parse_recog_links(std::istream& in, const char* recognizer, const char
 int Imp::read_wire_file(const char* name) {
     const std::string path = KLFilePath::Join(GetWireDirectory(), name);
     auto source = std::make_unique<KLWireSource>(path.c_str());
-    if (!source->Valid()) {
-        KLError("%s\n", source->ErrorText().c_str());
-        return 0;
-    }
+    if (!source->Valid())
+        return 0;  // the caller tells that the scene could not be read
     wireSource = std::move(source);
     std::unique_ptr<OrDagNode> root = wireSource->RootNode();
     KLWire::NukeBlendSurfaces(root.get());
@@ -237,9 +235,9 @@ int Imp::LoadKeyset(const char* name) {
     }
     const std::string wirePath = KLFilePath::Join(GetWireDirectory(), wireFile.c_str());
     const std::string written = wireFile;
-    bool readable = KLFilePath::Exists(wirePath.c_str()) &&
-                    KLFilePath::IsReadable(wirePath.c_str()) &&
-                    KLWire::IsWireFile(wirePath.c_str());
+    // Parsed once, by read_wire_file.
+    bool readable =
+        KLFilePath::Exists(wirePath.c_str()) && KLFilePath::IsReadable(wirePath.c_str());
     if (readable) {
         KLStatus("Reading wire file [%s].", written.c_str());
         readable = read_wire_file(written.c_str());

@@ -15,14 +15,12 @@
 #include "scene/KLWire.h"
 #include "scene/KLWireSource.h"
 #include "scene/OrDagNode.h"
+#include "scene/SceneSerializer.h"
 #include "toolkit/CueTime.h"
 
 enum SceneFormat { kEmbedded, kSideCar, kBinary };
 using Node = std::unique_ptr<OrDagNode>;
 
-namespace tinygltf {
-std::string base64_encode(unsigned char const* bytes, unsigned int len);
-}
 
 // The face scene's buffer: each accessor's floats in turn, at the byte offsets in FaceSceneJson.
 // clang-format off
@@ -64,8 +62,8 @@ inline std::string FaceSceneJson(const std::vector<float>& data = kFaceData) {
 {"input":5,"output":6,"interpolation":"CUBICSPLINE"}]},{"name":"other","channels":[{"sampler":0,
 "target":{"node":4,"path":"translation"}}],"samplers":[{"input":7,"output":8,"interpolation":
 "LINEAR"}]}],"buffers":[{"byteLength":236,"uri":"data:application/octet-stream;base64,)" +
-           tinygltf::base64_encode(reinterpret_cast<const unsigned char*>(data.data()),
-                                   unsigned(data.size() * 4)) +
+           SceneSerializer::Base64(reinterpret_cast<const unsigned char*>(data.data()),
+                                   data.size() * 4) +
            "\"}]}";
 }
 

@@ -1,0 +1,253 @@
+#include "scene/ModelCompactor.h"
+
+#include <algorithm>
+#include <cstring>
+#include <vector>
+
+namespace {
+// The image type of bytes from their signature (the mimeType a buffer-view image needs).
+std::string sniff_mime(const std::vector<unsigned char>& b) {
+    if (b.size() >= 3 && b[0] == 0xFF && b[1] == 0xD8 && b[2] == 0xFF) {
+        return "image/jpeg";
+    }
+    if (b.size() >= 12 && std::memcmp(b.data(), "RIFF", 4) == 0 &&
+        std::memcmp(b.data() + 8, "WEBP", 4) == 0) {
+        return "image/webp";
+    }
+    return "image/png";
+}
+
+template <class F>
+void each_accessor_ref(tinygltf::Model& m, F f) {
+    for (tinygltf::Mesh& mesh : m.meshes) {
+        for (tinygltf::Primitive& p : mesh.primitives) {
+            f(p.indices);
+            for (auto& kv : p.attributes) {
+                f(kv.second);
+            }
+            for (auto& t : p.targets) {
+                for (auto& kv : t) {
+                    f(kv.second);
+                }
+            }
+        }
+    }
+    for (tinygltf::Skin& s : m.skins) {
+        f(s.inverseBindMatrices);
+    }
+    for (tinygltf::Animation& a : m.animations) {
+        for (tinygltf::AnimationSampler& s : a.samplers) {
+            f(s.input);
+            f(s.output);
+        }
+    }
+}
+
+template <class F>
+void each_view_ref(tinygltf::Model& m, F f) {
+    for (tinygltf::Accessor& a : m.accessors) {
+        f(a.bufferView);
+        if (a.sparse.isSparse) {
+            f(a.sparse.indices.bufferView);
+            f(a.sparse.values.bufferView);
+        }
+    }
+    for (tinygltf::Image& image : m.images) {
+        f(image.bufferView);
+    }
+}
+}  // namespace
+
+bool ModelCompactor::RenumberingSafe() const {
+    static const char* const kSafe[] = {"KHR_texture_transform",  "KHR_lights_punctual",
+                                        "KHR_mesh_quantization",  "KHR_texture_basisu",
+                                        "KHR_materials_variants", "KHR_xmp_json_ld"};
+    for (const std::string& e : m_.extensionsUsed) {
+        bool ok = e.rfind("KHR_materials_", 0) == 0;
+        for (const char* s : kSafe) {
+            ok = ok || e == s;
+        }
+        if (!ok) {
+            return false;
+        }
+    }
+    return true;
+}
+
+void ModelCompactor::RemoveUnusedAccessors(const std::set<int>& candidates) {
+    if (candidates.empty() || !RenumberingSafe()) {
+        return;
+    }
+    std::vector<char> live(m_.accessors.size(), 0);
+    each_accessor_ref(m_, [&](int& i) {
+        if (i >= 0) {
+            live[size_t(i)] = 1;
+        }
+    });
+    std::vector<int> remap(m_.accessors.size());
+    std::set<int> freedViews;
+    int next = 0;
+    for (size_t i = 0; i < m_.accessors.size(); ++i) {
+        bool dead = candidates.count(int(i)) && !live[i];
+        remap[i] = dead ? -1 : next++;
+        if (dead && m_.accessors[i].bufferView >= 0) {
+            freedViews.insert(m_.accessors[i].bufferView);
+        }
+    }
+    if (next == int(m_.accessors.size())) {
+        return;
+    }
+    each_accessor_ref(m_, [&](int& i) { i = i >= 0 ? remap[size_t(i)] : i; });
+    std::vector<tinygltf::Accessor> accessors;
+    accessors.reserve(size_t(next));
+    for (size_t i = 0; i < m_.accessors.size(); ++i) {
+        if (remap[i] >= 0) {
+            accessors.push_back(std::move(m_.accessors[i]));
+        }
+    }
+    m_.accessors = std::move(accessors);
+
+    // Views freed with them, unless something else still refers to them.
+    each_view_ref(m_, [&](int& v) { freedViews.erase(v); });
+    if (freedViews.empty()) {
+        return;
+    }
+    std::vector<int> viewMap(m_.bufferViews.size());
+    std::set<int> shrunk;
+    std::vector<tinygltf::BufferView> views;
+    for (size_t i = 0; i < m_.bufferViews.size(); ++i) {
+        if (freedViews.count(int(i))) {
+            viewMap[i] = -1;
+            shrunk.insert(m_.bufferViews[i].buffer);
+        } else {
+            viewMap[i] = int(views.size());
+            views.push_back(std::move(m_.bufferViews[i]));
+        }
+    }
+    m_.bufferViews = std::move(views);
+    each_view_ref(m_, [&](int& v) { v = v >= 0 ? viewMap[size_t(v)] : v; });
+    compactBuffers(shrunk);
+}
+
+void ModelCompactor::compactBuffers(const std::set<int>& buffers) {
+    for (int b : buffers) {
+        // Byte ranges still covered by a view, merged where they overlap, are moved down
+        // keeping their offset modulo 16 so that every alignment rule still holds.
+        std::vector<size_t> order;
+        for (size_t i = 0; i < m_.bufferViews.size(); ++i) {
+            if (m_.bufferViews[i].buffer == b) {
+                order.push_back(i);
+            }
+        }
+        std::sort(order.begin(), order.end(), [&](size_t x, size_t y) {
+            return m_.bufferViews[x].byteOffset < m_.bufferViews[y].byteOffset;
+        });
+        std::vector<unsigned char>& bytes = m_.buffers[size_t(b)].data;
+        size_t written = 0;  // moved down in place: every range goes to or below where it was
+        size_t k = 0;
+        while (k < order.size()) {
+            size_t start = m_.bufferViews[order[k]].byteOffset;
+            size_t end = start + m_.bufferViews[order[k]].byteLength;
+            size_t j = k + 1;
+            while (j < order.size() && m_.bufferViews[order[j]].byteOffset < end) {
+                const tinygltf::BufferView& v = m_.bufferViews[order[j]];
+                end = std::max(end, size_t(v.byteOffset + v.byteLength));
+                ++j;
+            }
+            size_t at = written + (start % 16 + 16 - written % 16) % 16;
+            std::fill(bytes.begin() + long(written), bytes.begin() + long(at), 0);
+            std::memmove(bytes.data() + at, bytes.data() + start, end - start);
+            for (size_t v = k; v < j; ++v) {
+                m_.bufferViews[order[v]].byteOffset =
+                    m_.bufferViews[order[v]].byteOffset - start + at;
+            }
+            written = at + (end - start);
+            k = j;
+        }
+        bytes.resize((written + 3) & ~size_t(3), 0);
+    }
+}
+
+void ModelCompactor::RemoveUnusedBuffers() {
+    if (!RenumberingSafe()) {
+        return;
+    }
+    std::vector<char> used(m_.buffers.size(), 0);
+    for (const tinygltf::BufferView& v : m_.bufferViews) {
+        if (v.buffer >= 0 && size_t(v.buffer) < used.size()) {
+            used[size_t(v.buffer)] = 1;
+        }
+    }
+    std::vector<int> remap(m_.buffers.size(), -1);
+    std::vector<tinygltf::Buffer> buffers;
+    for (size_t i = 0; i < m_.buffers.size(); ++i) {
+        if (used[i]) {
+            remap[i] = int(buffers.size());
+            buffers.push_back(std::move(m_.buffers[i]));
+        }
+    }
+    if (buffers.size() == m_.buffers.size()) {
+        m_.buffers = std::move(buffers);
+        return;
+    }
+    m_.buffers = std::move(buffers);
+    for (tinygltf::BufferView& v : m_.bufferViews) {
+        v.buffer = remap[size_t(v.buffer)];
+    }
+}
+
+size_t ModelCompactor::appendToFirst(const std::vector<unsigned char>& bytes) {
+    std::vector<unsigned char>& data = m_.buffers[0].data;
+    size_t at = (data.size() + 15) & ~size_t(15);
+    data.resize(at, 0);
+    data.insert(data.end(), bytes.begin(), bytes.end());
+    return at;
+}
+
+void ModelCompactor::PackIntoFirstBuffer() {
+    bool images = false;
+    for (const tinygltf::Image& image : m_.images) {
+        images = images || (image.bufferView < 0 && !image.image.empty() &&
+                            (image.uri.empty() || image.uri.rfind("data:", 0) == 0));
+    }
+    if (m_.buffers.empty() && !images) {
+        return;
+    }
+    if (m_.buffers.empty()) {
+        m_.buffers.emplace_back();
+    }
+    m_.buffers[0].uri.clear();
+    if (!RenumberingSafe()) {
+        return;  // buffer 0 still travels in the binary chunk; the others stay as they are
+    }
+    std::vector<size_t> base(m_.buffers.size(), 0);
+    for (size_t b = 1; b < m_.buffers.size(); ++b) {
+        base[b] = appendToFirst(m_.buffers[b].data);
+        m_.buffers[b].data.clear();
+        m_.buffers[b].data.shrink_to_fit();
+    }
+    for (tinygltf::BufferView& v : m_.bufferViews) {
+        if (v.buffer > 0) {
+            v.byteOffset += base[size_t(v.buffer)];
+            v.buffer = 0;
+        }
+    }
+    m_.buffers.resize(1);
+    for (tinygltf::Image& image : m_.images) {
+        if (image.bufferView >= 0 || image.image.empty() ||
+            !(image.uri.empty() || image.uri.rfind("data:", 0) == 0)) {
+            continue;
+        }
+        tinygltf::BufferView view;
+        view.buffer = 0;
+        view.byteOffset = appendToFirst(image.image);
+        view.byteLength = image.image.size();
+        if (image.mimeType.empty()) {
+            image.mimeType = sniff_mime(image.image);
+        }
+        image.bufferView = int(m_.bufferViews.size());
+        image.uri.clear();
+        image.image.clear();
+        m_.bufferViews.push_back(view);
+    }
+}

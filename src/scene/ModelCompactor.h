@@ -1,0 +1,34 @@
+#pragma once
+
+#include <set>
+
+#include <tiny_gltf.h>
+
+// The index bookkeeping of a model whose animation was rewritten: accessors, buffer views and
+// buffers that nothing refers to any more are removed and every reference renumbered, and for a
+// .glb every buffer and every image held as bytes is moved into buffer 0, the binary chunk.
+// Works on the model in place (borrowed).
+class ModelCompactor {
+  public:
+    explicit ModelCompactor(tinygltf::Model& model) : m_(model) {}
+
+    // True when every extension in use is known not to refer to accessors, buffer views or
+    // buffers by index, so that renumbering them cannot break one; otherwise nothing is
+    // renumbered and unused objects stay in place (still valid, merely unused).
+    bool RenumberingSafe() const;
+    // Removes those of `candidates` (accessor indices) that nothing uses any more, then the
+    // buffer views only they used, and moves the remaining bytes of their buffers together.
+    void RemoveUnusedAccessors(const std::set<int>& candidates);
+    // Removes every buffer that no buffer view uses.
+    void RemoveUnusedBuffers();
+    // Moves the bytes of every other buffer, and of every image held as bytes outside a buffer
+    // view, into buffer 0 (made when there is none), whose uri is cleared.
+    void PackIntoFirstBuffer();
+
+  private:
+    void compactBuffers(const std::set<int>& buffers);
+    // Appends bytes at a 16-byte boundary of buffer 0; returns their offset.
+    size_t appendToFirst(const std::vector<unsigned char>& bytes);
+
+    tinygltf::Model& m_;
+};

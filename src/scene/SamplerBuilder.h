@@ -1,0 +1,65 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+class ChannelCurve;
+
+// One glTF animation sampler as it is written: key times in seconds and, per key, `width`
+// floats (three times as many for CUBICSPLINE: in-tangent, value, out-tangent).
+struct BuiltSampler {
+    std::string interpolation = "LINEAR";
+    std::vector<float> times;
+    std::vector<float> values;
+    int width = 3;
+};
+
+// Builds the sampler of one node path (translation, rotation or scale) from the key curves of
+// its three axes. What is written how:
+//   - translation or scale whose animated axes share their key times: the keys themselves,
+//     LINEAR when every segment is a straight line, STEP when every one is a step, else
+//     CUBICSPLINE with the keys' slopes (exact);
+//   - translation or scale whose axes are keyed at different times, without steps: CUBICSPLINE
+//     at the union of the key times, each piece cut from the axis's own cubic (exact);
+//   - rotation, and translation or scale mixing steps with axes keyed at different times:
+//     LINEAR samples taken from the keys and the whole frames between them, reduced to the
+//     fewest that keep the written curve within kVectorTolerance (units) or
+//     kRotationToleranceDegrees (the angle between the rotations) of the evaluated curve at
+//     every key and every frame. Spans where every axis holds still get no samples inside.
+// A curve is never sampled before its first or after its last key; one whose keys would make it
+// need more than kMaxSampledFrames frames sampled is refused.
+class SamplerBuilder {
+  public:
+    static constexpr double kVectorTolerance = 1e-4;
+    static constexpr double kRotationToleranceDegrees = 1e-3;
+    static constexpr size_t kMaxSampledFrames = 2000000;
+
+    // `curves` are the three axes (null for an unanimated axis, which holds `rest`); `fps` the
+    // frame rate whose frames are sampled. The curves are borrowed.
+    SamplerBuilder(const ChannelCurve* const curves[3], const double rest[3], int fps);
+
+    // Nothing to write when no axis is animated.
+    bool Animated() const { return lead_ != nullptr; }
+    // Each false with `why` set when the curve would need too many samples.
+    bool BuildVector(BuiltSampler* out, std::string* why) const;
+    bool BuildRotation(BuiltSampler* out, std::string* why) const;
+
+  private:
+    bool sharedTimes() const;
+    void keysExact(BuiltSampler* out) const;
+    void unionCubic(BuiltSampler* out) const;
+    // Every axis key time, ascending, one per distinct float.
+    std::vector<double> unionTimes() const;
+    // The union key times plus the whole frames inside every span where some axis moves; false
+    // when that is more than kMaxSampledFrames.
+    bool candidateTimes(std::vector<double>* times, std::string* why) const;
+    // For each span between consecutive `keys` (the union key times), whether every axis holds
+    // still across it.
+    std::vector<char> stillSpans(const std::vector<double>& keys) const;
+    void evaluate(const std::vector<double>& times, std::vector<double> axis[3]) const;
+
+    const ChannelCurve* curves_[3];
+    const ChannelCurve* lead_ = nullptr;
+    double rest_[3];
+    int fps_;
+};

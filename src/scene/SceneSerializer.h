@@ -1,0 +1,19 @@
+#pragma once
+
+#include <string>
+
+#include <tiny_gltf.h>
+
+// Serialises a model into a glTF file: `path` ending in ".glb" (any case) gives a binary file
+// whose buffer 0 is the binary chunk, anything else a .gltf with its buffers embedded as data
+// URIs. Images read as bytes are written back as the same bytes; images named by a file keep
+// their uri. The file is written through a SafeFile, so that `path` is either the old file or
+// the whole new one and no temporary file is left behind.
+class SceneSerializer {
+  public:
+    static bool IsBinaryPath(const std::string& path);
+    // Base64 of `size` bytes (RFC 4648, with padding), as data URIs carry them.
+    static std::string Base64(const unsigned char* bytes, size_t size);
+    // False with `error` naming the file when it cannot be written.
+    static bool Write(tinygltf::Model& model, const std::string& path, std::string* error);
+};

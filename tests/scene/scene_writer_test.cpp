@@ -1,0 +1,417 @@
+// What the scene writer writes: the sampler of each case (interpolation, key count, times),
+// the tolerance of sampled curves at every frame and key, which clip and buffer the new data
+// goes to, what it leaves alone, and the bounds on what a small scene can make it write.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cmath>
+#include <filesystem>
+
+#include "scene/EulerRotation.h"
+#include "scene/SamplerBuilder.h"
+#include "scene/SceneChecker.h"
+#include "scene/SceneDocument.h"
+#include "scene/scene_builder_util.h"
+#include "scene/scene_util.h"
+
+namespace {
+// The sampler written for `node`'s `path`, read back raw from the file's model.
+struct Written {
+    int clip = -1;
+    int channels = 0;  // channels on that node path, over every clip
+    std::string interpolation;
+    std::vector<float> times, values;
+};
+Written WrittenSampler(const tinygltf::Model& m, int node, const std::string& path) {
+    Written w;
+    std::string why;
+    for (size_t a = 0; a < m.animations.size(); ++a) {
+        for (const tinygltf::AnimationChannel& c : m.animations[a].channels) {
+            if (c.target_node != node || c.target_path != path) {
+                continue;
+            }
+            ++w.channels;
+            w.clip = int(a);
+            const tinygltf::AnimationSampler& s = m.animations[a].samplers[size_t(c.sampler)];
+            w.interpolation = s.interpolation;
+            EXPECT_TRUE(SceneChecker::ReadFloats(m, s.input, 1, &w.times, &why)) << why;
+            EXPECT_TRUE(
+                SceneChecker::ReadFloats(m, s.output, path == "rotation" ? 4 : 3, &w.values, &why))
+                << why;
+        }
+    }
+    return w;
+}
+
+// A LINEAR sampler's value at `t`: lerp, or slerp for quaternions.
+std::vector<double> SampleAt(const Written& w, double t, int width) {
+    size_t n = w.times.size(), i = 0;
+    while (i + 1 < n && w.times[i + 1] <= t) {
+        ++i;
+    }
+    auto at = [&](size_t k) {
+        return std::vector<double>(w.values.begin() + long(k) * width,
+                                   w.values.begin() + long(k + 1) * width);
+    };
+    if (t <= w.times[0] || i + 1 >= n) {
+        return at(t <= w.times[0] ? 0 : n - 1);
+    }
+    double u = (t - w.times[i]) / (double(w.times[i + 1]) - w.times[i]);
+    std::vector<double> a = at(i), b = at(i + 1);
+    if (width == 4) {
+        EulerRotation::Quat q =
+            EulerRotation::Slerp({a[0], a[1], a[2], a[3]}, {b[0], b[1], b[2], b[3]}, u);
+        return {q[0], q[1], q[2], q[3]};
+    }
+    for (int k = 0; k < width; ++k) {
+        a[size_t(k)] += (b[size_t(k)] - a[size_t(k)]) * u;
+    }
+    return a;
+}
+
+class SceneWriterTest : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        dir = MakeTempDir();
+        CueTime::default_fps = 30;
+    }
+    // Opens `builder`'s model saved as `name`.
+    void Open(ModelBuilder& builder, const std::string& name = "in.gltf") {
+        ASSERT_TRUE(builder.Save(dir + "/" + name,
+                                 name.size() > 4 && name.substr(name.size() - 4) == ".glb"));
+        ASSERT_TRUE(scene.Open(dir + "/" + name));
+    }
+    // Stores the open scene as `name` and reads the result back.
+    std::shared_ptr<SceneDocument> StoreAndRead(const std::string& name = "out.gltf") {
+        std::string error;
+        out = dir + "/" + name;
+        EXPECT_EQ(scene.source->Store(out.c_str()), 1);
+        auto back = SceneDocument::Load(out, &error);
+        EXPECT_TRUE(back) << error;
+        return back;
+    }
+    std::string dir, out;
+    OpenScene scene;
+};
+
+const float kQ90X[] = {0.70710678f, 0, 0, 0.70710678f};
+}  // namespace
+
+// Translation keyed on every axis at one set of times is written as those keys: LINEAR when
+// every piece is straight, STEP when every one steps, CUBICSPLINE otherwise.
+TEST_F(SceneWriterTest, SharedKeyTimesAreWrittenAsTheKeys) {
+    ModelBuilder b;
+    b.Node("a");
+    Open(b);
+    Node a = scene.Fetch("a");
+    struct Case {
+        int in, out;
+        const char* interpolation;
+        size_t floatsPerKey;
+    };
+    for (const Case& c : {Case{1, 1, "LINEAR", 3}, Case{0, 2, "CUBICSPLINE", 9}}) {
+        for (int axis = 0; axis < 3; ++axis) {
+            ASSERT_EQ(StoreKeys(a.get(), axis,
+                                {{0, 1.f + axis, c.in, c.out},
+                                 {1500, 2, c.in, c.out},
+                                 {7000, -1, c.in, c.out}}),
+                      1);
+        }
+        auto back = StoreAndRead();
+        Written w = WrittenSampler(back->model(), 0, "translation");
+        EXPECT_EQ(w.interpolation, c.interpolation);
+        EXPECT_EQ(w.times, (std::vector<float>{0, 0.25f, 7000 / 6000.0f}));
+        EXPECT_EQ(w.values.size(), 3 * c.floatsPerKey);
+        ExpectValidGltf(out);
+        ASSERT_TRUE(scene.Open(out));
+        a = scene.Fetch("a");
+    }
+    // Steps: the document has no step tangent code, so set one through the curve.
+    ChannelCurve::Key k0, k1;
+    k0.out = ChannelCurve::kStep;
+    k0.value = 1;
+    k1.time = 0.5;
+    k1.value = 2;
+    for (int axis = 0; axis < 3; ++axis) {
+        scene.source->document()->SetCurve(0, axis, {k0, k1}, true);
+    }
+    Written w = WrittenSampler(StoreAndRead()->model(), 0, "translation");
+    EXPECT_EQ(w.interpolation, "STEP");
+    EXPECT_EQ(w.times, (std::vector<float>{0, 0.5f}));
+}
+
+// Axes keyed at different times are cut at the union of the key times as cubic pieces: exact
+// at every frame, and no more keys than the union.
+TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) {
+    ModelBuilder b;
+    b.Node("a");
+    Open(b);
+    Node a = scene.Fetch("a");
+    ASSERT_EQ(StoreKeys(a.get(), 0, {{0, 0, 0, 0}, {3000, 4, 0, 0}, {6000, 1, 0, 0}}), 1);
+    ASSERT_EQ(StoreKeys(a.get(), 2, {{1000, 2, 1, 1}, {9000, -3, 1, 1}}), 1);
+    auto back = StoreAndRead();
+    Written w = WrittenSampler(back->model(), 0, "translation");
+    EXPECT_EQ(w.interpolation, "CUBICSPLINE");
+    EXPECT_EQ(w.times, (std::vector<float>{0, 1000 / 6000.0f, 0.5f, 1, 1.5f}));
+    const SceneDocument& doc = *scene.source->document();
+    for (int f = 0; f <= 50; ++f) {
+        for (int c : {0, 1, 2}) {
+            ASSERT_NEAR(back->Curve(0, c)->eval(f), doc.Curve(0, c) ? doc.Curve(0, c)->eval(f) : 0,
+                        1e-5)
+                << "channel " << c << " frame " << f;
+        }
+    }
+    ExpectValidGltf(out);
+}
+
+// Sampled curves (rotation; translation mixing steps with axes at other times) stay within
+// the stated tolerance at every frame and every key, with fewer samples than frames where the
+// curve allows it.
+TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
+    ModelBuilder b;
+    b.Node("a");
+    Open(b);
+    Node a = scene.Fetch("a");
+    // A steady turn about X over 20 s (600 frames), a smooth swing about Y for the first 5 s,
+    // a quick one about Z in the first frame.
+    ASSERT_EQ(StoreKeys(a.get(), 3, {{0, 0, 1, 1}, {120000, 170, 1, 1}}), 1);
+    ASSERT_EQ(StoreKeys(a.get(), 4, {{0, 10, 0, 0}, {15000, 95, 0, 0}, {30000, 5, 0, 0}}), 1);
+    ASSERT_EQ(StoreKeys(a.get(), 5, {{0, 0, 0, 2}, {100, 30, 2, 2}}), 1);
+    ChannelCurve::Key s0, s1, s2;
+    s0.out = ChannelCurve::kStep;
+    s1.time = 2.0;
+    s1.value = 5;
+    s2.time = 3.5;
+    s2.value = 1;
+    scene.source->document()->SetCurve(0, 0, {s0, s1, s2}, true);  // TX steps
+    ASSERT_EQ(StoreKeys(a.get(), 1, {{0, 0, 0, 0}, {9000, 2, 0, 0}, {24000, -1, 0, 0}}), 1);
+    auto back = StoreAndRead();
+    ExpectValidGltf(out);
+    const SceneDocument& doc = *scene.source->document();
+    Written rot = WrittenSampler(back->model(), 0, "rotation");
+    Written pos = WrittenSampler(back->model(), 0, "translation");
+    EXPECT_EQ(rot.interpolation, "LINEAR");
+    EXPECT_EQ(pos.interpolation, "LINEAR");
+    EXPECT_LT(rot.times.size(), 300u);  // far fewer than the 601 frames
+    EXPECT_LT(pos.times.size(), 121u);
+    // Every frame, and every key of the path's own axes.
+    std::vector<double> checks[2];
+    for (int f = 0; f <= 630; ++f) {
+        checks[0].push_back(f / 30.0);
+        checks[1].push_back(f / 30.0);
+    }
+    for (int c : {0, 1, 3, 4, 5}) {
+        for (const ChannelCurve::Key& k : doc.Curve(0, c)->keys()) {
+            checks[c / 3].push_back(k.time);
+        }
+    }
+    for (double t : checks[1]) {
+        EulerRotation::Quat want =
+            EulerRotation::ToQuaternion({doc.Curve(0, 3)->Evaluate(t), doc.Curve(0, 4)->Evaluate(t),
+                                         doc.Curve(0, 5)->Evaluate(t)});
+        std::vector<double> got = SampleAt(rot, t, 4);
+        ASSERT_LE(EulerRotation::AngleBetween(want, {got[0], got[1], got[2], got[3]}),
+                  SamplerBuilder::kRotationToleranceDegrees)
+            << "rotation at " << t;
+    }
+    for (double t : checks[0]) {
+        std::vector<double> got = SampleAt(pos, t, 3);
+        for (int axis : {0, 1}) {
+            ASSERT_NEAR(got[size_t(axis)], doc.Curve(0, axis)->Evaluate(t),
+                        SamplerBuilder::kVectorTolerance)
+                << "axis " << axis << " at " << t;
+        }
+    }
+}
+
+// A skinned figure whose animation lives in a buffer of its own: replacing that animation
+// leaves the buffer empty, and an empty buffer is removed, not written with byteLength 0.
+TEST_F(SceneWriterTest, ABufferLeftEmptyIsRemoved) {
+    ModelBuilder b;
+    int root = b.Node("root"), bone = b.Node("bone", root), body = b.Node("body");
+    int ibm = b.Floats({1, 0, 0, 0, 0, 1, 0, 0, 0, 0, 1, 0, 0, 0,  0, 1,  //
+                        1, 0, 0, 0, 0, 1, 0, 0, 0, 0, 1, 0, 0, -1, 0, 1},
+                       16);
+    tinygltf::Skin skin;
+    skin.joints = {root, bone};
+    skin.inverseBindMatrices = ibm;
+    b.m.skins.push_back(skin);
+    tinygltf::Primitive prim;
+    prim.attributes["POSITION"] = b.Floats({0, 0, 0, 1, 0, 0, 0, 1, 0}, 3, 0, true);
+    prim.attributes["WEIGHTS_0"] = b.Floats({1, 0, 0, 0, 0, 1, 0, 0, 1, 0, 0, 0}, 4);
+    std::vector<unsigned short> joints = {0, 0, 0, 0, 0, 1, 0, 0, 0, 0, 0, 0};
+    std::vector<unsigned char>& data = b.m.buffers[0].data;
+    tinygltf::BufferView jv;
+    jv.buffer = 0;
+    jv.byteOffset = data.size();
+    jv.byteLength = joints.size() * 2;
+    const unsigned char* p = reinterpret_cast<const unsigned char*>(joints.data());
+    data.insert(data.end(), p, p + jv.byteLength);
+    b.m.bufferViews.push_back(jv);
+    tinygltf::Accessor ja;
+    ja.bufferView = int(b.m.bufferViews.size()) - 1;
+    ja.componentType = TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT;
+    ja.type = TINYGLTF_TYPE_VEC4;
+    ja.count = 3;
+    b.m.accessors.push_back(ja);
+    prim.attributes["JOINTS_0"] = int(b.m.accessors.size()) - 1;
+    prim.mode = TINYGLTF_MODE_TRIANGLES;
+    b.m.meshes.emplace_back();
+    b.m.meshes[0].primitives.push_back(prim);
+    b.m.nodes[size_t(body)].mesh = 0;
+    b.m.nodes[size_t(body)].skin = 0;
+    b.Channel(0, bone, "rotation", {0, 1}, {0, 0, 0, 1, kQ90X[0], 0, 0, kQ90X[3]}, "LINEAR", 1);
+    Open(b);
+    ASSERT_EQ(StoreKeys(scene.Fetch("bone").get(), 3, {{0, 0, 1, 1}, {6000, 45, 1, 1}}), 1);
+    auto back = StoreAndRead();
+    EXPECT_EQ(back->model().buffers.size(), 1u);
+    EXPECT_EQ(back->model().skins.size(), 1u);
+    Written w = WrittenSampler(back->model(), bone, "rotation");
+    ASSERT_EQ(w.channels, 1);
+    EXPECT_NEAR(back->Curve(bone, 3)->Evaluate(1), 45, 1e-3);
+    ExpectValidGltf(out);
+}
+
+// A path animated in the second clip: the applied curve replaces it there, and the channel on
+// the same path in the first clip goes; the clips' other channels stay as they were.
+TEST_F(SceneWriterTest, ADrivenPathEndsInTheFirstClipThatAnimatedItAndNowhereElse) {
+    ModelBuilder b;
+    int a = b.Node("a"), c = b.Node("c");
+    b.Channel(0, c, "translation", {0, 1}, {0, 0, 0, 1, 1, 1});
+    b.Channel(1, a, "translation", {0, 2}, {0, 0, 0, 2, 0, 0});
+    b.Channel(1, c, "scale", {0, 1}, {1, 1, 1, 2, 2, 2});
+    b.Channel(2, a, "translation", {0, 3}, {0, 0, 0, 3, 0, 0});
+    Open(b);
+    ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 1, {{0, 0, 1, 1}, {6000, 7, 1, 1}}), 1);
+    auto back = StoreAndRead();
+    const tinygltf::Model& m = back->model();
+    Written w = WrittenSampler(m, a, "translation");
+    EXPECT_EQ(w.channels, 1);
+    EXPECT_EQ(w.clip, 1);
+    ASSERT_EQ(m.animations.size(), 2u);  // clip2 lost its only channel
+    EXPECT_EQ(m.animations[0].name + m.animations[1].name, "clip0clip1");
+    EXPECT_EQ(WrittenSampler(m, c, "scale").values, (std::vector<float>{1, 1, 1, 2, 2, 2}));
+    EXPECT_NEAR(back->Curve(a, 0)->Evaluate(1), 1, 1e-6);  // TX as clip1 had it
+    EXPECT_NEAR(back->Curve(a, 1)->Evaluate(1), 7, 1e-6);
+    ExpectValidGltf(out);
+}
+
+// A chain driven in one axis of one path: its other paths are written back as they were read.
+TEST_F(SceneWriterTest, PathsNotDrivenAreWrittenBackAsRead) {
+    ModelBuilder b;
+    int bone = b.Node("b0");
+    for (int i = 1; i < 4; ++i) {
+        bone = b.Node("b" + std::to_string(i), bone);
+    }
+    std::vector<float> q = {0, 0, 0, 1, kQ90X[0], 0, 0, kQ90X[3], 0, 0, 0, 1};
+    b.Channel(0, bone, "rotation", {0, 1, 2}, q);
+    Open(b);
+    ASSERT_EQ(StoreKeys(scene.Fetch("b3").get(), 2, {{0, 0, 1, 1}, {6000, 1, 1, 1}}), 1);
+    auto back = StoreAndRead();
+    Written rot = WrittenSampler(back->model(), bone, "rotation");
+    EXPECT_EQ(rot.times, (std::vector<float>{0, 1, 2}));
+    EXPECT_EQ(rot.values, q);
+    EXPECT_EQ(WrittenSampler(back->model(), bone, "translation").times.size(), 2u);
+    ExpectValidGltf(out);
+}
+
+// A .glb carries every buffer and embedded image in its binary chunk.
+TEST_F(SceneWriterTest, AGlbHoldsEveryBufferAndImageInItsBinaryChunk) {
+    ModelBuilder b;
+    int a = b.Node("a");
+    b.Channel(0, a, "scale", {0, 1}, {1, 1, 1, 2, 2, 2}, "LINEAR", 0);
+    b.Channel(0, a, "rotation", {0, 1}, {0, 0, 0, 1, kQ90X[0], 0, 0, kQ90X[3]}, "LINEAR", 1);
+    tinygltf::Image image;
+    image.uri =
+        "data:image/png;base64,iVBORw0KGgoAAAANSUhEUgAAAAEAAAABCAYAAAAfFcSJAAAADUlEQVR42mNkYPhfDwAC"
+        "hwGA60e6kgAAAABJRU5ErkJggg==";
+    b.m.images.push_back(image);
+    b.m.textures.emplace_back();
+    b.m.textures[0].source = 0;
+    b.m.materials.emplace_back();
+    b.m.materials[0].pbrMetallicRoughness.baseColorTexture.index = 0;
+    Open(b, "in.glb");
+    ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 0, {{0, 0, 1, 1}, {6000, 1, 1, 1}}), 1);
+    auto back = StoreAndRead("out.glb");
+    const tinygltf::Model& m = back->model();
+    ASSERT_EQ(m.buffers.size(), 1u);
+    EXPECT_TRUE(m.buffers[0].uri.empty());
+    ASSERT_EQ(m.images.size(), 1u);
+    EXPECT_GE(m.images[0].bufferView, 0);
+    EXPECT_EQ(m.images[0].mimeType, "image/png");
+    EXPECT_EQ(ReadFile(out).find("data:"), std::string::npos);
+    EXPECT_EQ(WrittenSampler(m, a, "scale").values, (std::vector<float>{1, 1, 1, 2, 2, 2}));
+    ExpectValidGltf(out);
+    EXPECT_EQ(ReadFile(dir + "/validator.txt").find("DATA_URI_GLB"), std::string::npos);
+}
+
+// Keys before time 0 are cut off: the curve starts at 0 with its value there. No time or
+// minimum is written as -0.
+TEST_F(SceneWriterTest, CurvesStartAtZeroWithoutNegativeZeros) {
+    ModelBuilder b;
+    b.Node("a");
+    Open(b);
+    Node a = scene.Fetch("a");
+    ASSERT_EQ(StoreKeys(a.get(), 0, {{-6000, 0, 1, 1}, {-3000, 1, 1, 1}, {3000, 3, 1, 1}}), 1);
+    const ChannelCurve* tx = scene.source->document()->Curve(0, 0);
+    ASSERT_EQ(tx->keys().size(), 2u);
+    EXPECT_EQ(tx->keys()[0].time, 0);
+    EXPECT_NEAR(tx->Evaluate(0), 2, 1e-9);
+    EXPECT_NEAR(tx->Evaluate(0.25), 2.5, 1e-9);
+    ASSERT_EQ(StoreKeys(a.get(), 3, {{-1, 0, 0, 0}, {3000, 30, 0, 0}}), 1);
+    auto back = StoreAndRead();
+    for (const char* path : {"translation", "rotation"}) {
+        Written w = WrittenSampler(back->model(), 0, path);
+        ASSERT_FALSE(w.times.empty());
+        EXPECT_FALSE(std::signbit(w.times[0])) << path;
+    }
+    for (const tinygltf::Accessor& acc : back->model().accessors) {
+        for (double v : acc.minValues) {
+            EXPECT_FALSE(std::signbit(v) && v == 0);
+        }
+    }
+    ExpectValidGltf(out);
+}
+
+// A one-kilobyte scene with one rotation key at 359,000 s driven for one second stays small; a
+// rotation that really turns over those 100 hours is refused, naming the file and the node,
+// and nothing is written.
+TEST_F(SceneWriterTest, AFarKeyCostsNothingAndATooLongCurveIsRefused) {
+    ModelBuilder b;
+    int a = b.Node("a");
+    b.Channel(0, a, "rotation", {359000}, {kQ90X[0], 0, 0, kQ90X[3]});
+    Open(b);
+    EXPECT_LT(ReadFile(dir + "/in.gltf").size(), 1500u);
+    ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 4, {{0, 0, 1, 1}, {6000, 20, 1, 1}}), 1);
+    auto back = StoreAndRead();
+    EXPECT_LT(ReadFile(out).size(), 4000u);
+    EXPECT_NEAR(back->Curve(a, 4)->Evaluate(0.5), 10, 1e-3);
+    EXPECT_NEAR(back->Curve(a, 3)->Evaluate(100000), 90, 1e-3);
+    ExpectValidGltf(out);
+
+    ModelBuilder turning;
+    a = turning.Node("a");
+    turning.Channel(0, a, "rotation", {0, 359000}, {0, 0, 0, 1, kQ90X[0], 0, 0, kQ90X[3]});
+    Open(turning);
+    ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 4, {{0, 0, 1, 1}, {6000, 20, 1, 1}}), 1);
+    std::string refused = dir + "/refused.gltf";
+    testing::internal::CaptureStderr();
+    EXPECT_EQ(scene.source->Store(refused.c_str()), 0);
+    std::string said = testing::internal::GetCapturedStderr();
+    EXPECT_NE(said.find(refused), std::string::npos) << said;
+    EXPECT_NE(said.find("node [a]"), std::string::npos) << said;
+    EXPECT_FALSE(std::filesystem::exists(refused));
+}
+
+// Buffers and images named by a uri are read from regular files only.
+TEST_F(SceneWriterTest, AUriNamingADirectoryIsRefused) {
+    std::filesystem::create_directory(dir + "/sub");
+    for (const std::string& json :
+         {std::string(R"({"asset":{"version":"2.0"},"buffers":[{"byteLength":4,"uri":"sub"}]})"),
+          std::string(R"({"asset":{"version":"2.0"},"images":[{"uri":"sub"}]})")}) {
+        WriteFile(dir + "/d.gltf", json);
+        std::string error;
+        EXPECT_FALSE(SceneDocument::Load(dir + "/d.gltf", &error));
+        EXPECT_NE(error.find("not a regular file"), std::string::npos) << error;
+    }
+}
