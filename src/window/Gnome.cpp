@@ -2,6 +2,7 @@
 // file managers' binding to the File and Reference menus.
 #include "window/Gnome.h"
 
+#include <Xm/Protocols.h>
 #include <Xm/RowColumn.h>
 #include <Xm/TextF.h>
 #include <Xm/ToggleBG.h>
@@ -16,6 +17,7 @@
 #include "toolkit/xm/KLImageButton.h"
 #include "toolkit/xm/KLImageView.h"
 #include "toolkit/xm/KLPrompt.h"
+#include "toolkit/xm/KLXtBeat.h"
 #include "window/KeysetFileManager.h"
 #include "window/ReferenceFileManager.h"
 #include "window/SoundFileManager.h"
@@ -62,6 +64,14 @@ Gnome::~Gnome() {
 }
 
 int Gnome::DressWidgets() {
+    // Timers fire from the event loop; the window manager's close is Quit.
+    KLXtBeat::Install();
+    if (Widget shell = AppShell()) {
+        Atom wmDelete =
+            XmInternAtom(XtDisplay(shell), const_cast<char*>("WM_DELETE_WINDOW"), False);
+        XmAddWMProtocolCallback(shell, wmDelete, quit_cb, nullptr);
+    }
+
     // 1. Dialogs built outside the table.
     create_apply_dialog();
     create_link_dialog();
