@@ -257,6 +257,11 @@ void KLSoundControl::Stop() {
         install(Pass{});
 }
 
+void KLSoundControl::Forget(const CueSound* sound) {
+    if (out.device && out.pass.sound == sound)  // only this thread changes the pass
+        install(Pass{});
+}
+
 namespace {
 void log_to_reports(void*, int, SDL_LogPriority priority, const char* message) {
     int level = priority >= SDL_LOG_PRIORITY_ERROR  ? KLErr::kError

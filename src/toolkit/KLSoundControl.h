@@ -23,6 +23,8 @@ class KLSoundControl {
     static int PlayDrag(CueSound* sound, KLTimer* timer, int grainMs, const float* position);
     // Stops whatever is playing.
     static void Stop();
+    // Stops when `sound` is what is playing (a sound being destroyed calls this).
+    static void Forget(const CueSound* sound);
     // Routes the audio library's own messages into the program's reports.
     static void DisableAudioLibraryErrors();
 

@@ -241,6 +241,21 @@ TEST_F(SoundOutputTest, AScrubGrainIsTheSoundAtThePointerAndRestingIsSilent) {
     }
 }
 
+// The workspace may replace its sound while a pass plays it: the output lets go first.
+TEST_F(SoundOutputTest, ASoundDestroyedWhilePlayingFallsSilent) {
+    auto sound = chirp(rate_ / 2.0, 2.0);
+    KLTimer timer(CueTime(), CueTime::FromSeconds(2));
+    ASSERT_EQ(KLSoundControl::Play(sound.get(), &timer, CueTime()), 1);
+    timer.start();
+    Run(0.5);
+    sound.reset();
+    const double cut = KLSoundControl::DeviceSeconds();
+    Run(0.5);
+    auto seg = segments(Written());
+    ASSERT_EQ(seg.size(), 1u);
+    EXPECT_LE(double(seg[0].second) / rate_, cut + 0.05) << "nothing after the sound went";
+}
+
 TEST_F(SoundOutputTest, NothingToPlayIsSilentAndSaysSo) {
     KLTimer timer(CueTime(), CueTime::FromSeconds(0.5));
     EXPECT_EQ(KLSoundControl::Play(nullptr, &timer, CueTime()), 0);
