@@ -50,6 +50,10 @@ void KLScene::LoadGeometry(KLWireSource* source) {
     SetRestFrame(restFrame_);
 }
 
+void KLScene::SetPoseSource(std::unique_ptr<KLPoseSource> source) {
+    poseSource_ = std::move(source);
+}
+
 void KLScene::SetRestFrame(double frame) {
     restFrame_ = frame;
     const SceneDocument* doc = source_ ? source_->document() : nullptr;

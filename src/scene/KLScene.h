@@ -50,9 +50,9 @@ class KLScene {
     // channels no key track drives.
     void SetRestFrame(double frame);
     double RestFrame() const { return restFrame_; }
-    // The source of the previewed animation (borrowed; null for none).
-    void SetPoseSource(KLPoseSource* source) { poseSource_ = source; }
-    KLPoseSource* PoseSource() const { return poseSource_; }
+    // The source of the previewed animation (null for none); the scene owns it.
+    void SetPoseSource(std::unique_ptr<KLPoseSource> source);
+    KLPoseSource* PoseSource() const { return poseSource_.get(); }
 
     // Poses the scene at `t`: channels, node matrices, deformed vertices, bounding box.
     void Evaluate(CueTime t);
@@ -93,8 +93,8 @@ class KLScene {
     int tessU_ = 0, tessV_ = 0;
     int generation_ = 0;
     double restFrame_ = 0.0;
-    KLWireSource* source_ = nullptr;      // borrowed
-    KLPoseSource* poseSource_ = nullptr;  // borrowed
+    KLWireSource* source_ = nullptr;  // borrowed
+    std::unique_ptr<KLPoseSource> poseSource_;
     std::map<std::string, std::unique_ptr<KLGraphNode>> nodes_;
     SceneGeometry geometry_;
     std::vector<std::string> messages_;
