@@ -485,19 +485,19 @@ void SceneGeometry::Load(const tinygltf::Model& m, std::vector<std::string>* mes
             nodeSkin[i] = node.skin;
             // Joint references beyond the skin's joints lose their influence.
             const size_t jointCount = skins[size_t(node.skin)].joints.size();
+            size_t dropped = 0;
             for (ScenePrimitive& prim : meshes[size_t(nodeMesh[i])].primitives) {
-                size_t dropped = 0;
                 for (size_t k = 0; k < prim.joints.size(); ++k) {
                     if (prim.joints[k] >= jointCount && prim.weights[k] != 0) {
                         prim.weights[k] = 0;
                         ++dropped;
                     }
                 }
-                if (dropped) {
-                    say(item("node", i) + " (" + node.name + ") has " + std::to_string(dropped) +
-                        " joint references beyond its skin's " + std::to_string(jointCount) +
-                        " joints; they are ignored");
-                }
+            }
+            if (dropped) {
+                say(item("node", i) + " (" + node.name + ") has " + std::to_string(dropped) +
+                    " joint references beyond its skin's " + std::to_string(jointCount) +
+                    " joints; they are ignored");
             }
         }
         for (double w : node.weights) {
