@@ -138,8 +138,8 @@ const BadCase kBadCases[] = {
      "", 2},
     {"corrupt_texture",
      [](tinygltf::Model& m) {
-         m.images[0].image.assign(5, 'x');
-         m.images[0].as_is = true;
+         const tinygltf::BufferView& v = m.bufferViews[size_t(m.images[0].bufferView)];
+         std::memset(m.buffers[0].data.data() + v.byteOffset, 'x', 8);
      },
      "image 0 cannot be decoded; its materials show their base colour", 2},
     {"camera_zero_aspect",

@@ -42,6 +42,59 @@ int add_accessor(tinygltf::Model& m, const std::vector<T>& data, int componentTy
     return int(m.accessors.size()) - 1;
 }
 
+// A PNG file of `width` x `height` RGBA pixels, compressed with stored (uncompressed) deflate
+// blocks: enough for the tiny test textures.
+std::vector<unsigned char> png_of(int width, int height, const std::vector<unsigned char>& rgba) {
+    auto crc = [](const unsigned char* p, size_t n) {
+        uint32_t c = 0xffffffffu;
+        for (size_t i = 0; i < n; ++i) {
+            c ^= p[i];
+            for (int k = 0; k < 8; ++k) {
+                c = c & 1 ? 0xedb88320u ^ (c >> 1) : c >> 1;
+            }
+        }
+        return c ^ 0xffffffffu;
+    };
+    auto be32 = [](std::vector<unsigned char>& out, uint32_t v) {
+        out.insert(out.end(), {uint8_t(v >> 24), uint8_t(v >> 16), uint8_t(v >> 8), uint8_t(v)});
+    };
+    std::vector<unsigned char> png = {0x89, 'P', 'N', 'G', '\r', '\n', 0x1a, '\n'};
+    auto chunk = [&](const char* type, const std::vector<unsigned char>& data) {
+        be32(png, uint32_t(data.size()));
+        std::vector<unsigned char> body(type, type + 4);
+        body.insert(body.end(), data.begin(), data.end());
+        png.insert(png.end(), body.begin(), body.end());
+        be32(png, crc(body.data(), body.size()));
+    };
+    std::vector<unsigned char> header;
+    be32(header, uint32_t(width));
+    be32(header, uint32_t(height));
+    header.insert(header.end(), {8, 6, 0, 0, 0});  // 8-bit RGBA
+    chunk("IHDR", header);
+    std::vector<unsigned char> raw;
+    for (int y = 0; y < height; ++y) {
+        raw.push_back(0);  // no filter
+        raw.insert(raw.end(), rgba.begin() + y * width * 4, rgba.begin() + (y + 1) * width * 4);
+    }
+    std::vector<unsigned char> z = {0x78,
+                                    0x01,
+                                    1,
+                                    uint8_t(raw.size()),
+                                    uint8_t(raw.size() >> 8),
+                                    uint8_t(~raw.size()),
+                                    uint8_t(~raw.size() >> 8)};
+    z.insert(z.end(), raw.begin(), raw.end());
+    uint32_t a = 1, b = 0;
+    for (unsigned char c : raw) {
+        a = (a + c) % 65521;
+        b = (b + a) % 65521;
+    }
+    be32(z, (b << 16) | a);
+    chunk("IDAT", z);
+    chunk("IEND", {});
+    return png;
+}
+
 constexpr int kFloat = TINYGLTF_COMPONENT_TYPE_FLOAT;
 constexpr int kArray = TINYGLTF_TARGET_ARRAY_BUFFER;
 constexpr int kElements = TINYGLTF_TARGET_ELEMENT_ARRAY_BUFFER;
@@ -124,22 +177,19 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
     if (s.texture || s.corruptTexture) {
         tinygltf::Image image;
         image.mimeType = "image/png";
-        if (s.corruptTexture) {
-            const char junk[] = "this is not a picture";
-            image.bufferView = int(m.bufferViews.size());
-            tinygltf::BufferView view;
-            view.buffer = 0;
-            view.byteOffset = m.buffers[0].data.size();
-            view.byteLength = sizeof junk;
-            m.buffers[0].data.insert(m.buffers[0].data.end(), junk, junk + sizeof junk);
-            m.bufferViews.push_back(view);
-        } else {
-            image.width = image.height = 2;
-            image.component = 4;
-            image.bits = 8;
-            image.pixel_type = TINYGLTF_COMPONENT_TYPE_UNSIGNED_BYTE;
-            image.image = {255, 0, 0, 255, 0, 0, 255, 255, 0, 0, 255, 255, 255, 0, 0, 255};
-        }
+        const char junk[] = "this is not a picture";
+        const std::vector<unsigned char> bytes =
+            s.corruptTexture ? std::vector<unsigned char>(junk, junk + sizeof junk)
+                             : png_of(2, 2,
+                                      {255, 0, 0, 255, 0, 0, 255, 255,  //
+                                       0, 0, 255, 255, 255, 0, 0, 255});
+        image.bufferView = int(m.bufferViews.size());
+        tinygltf::BufferView view;
+        view.buffer = 0;
+        view.byteOffset = m.buffers[0].data.size();
+        view.byteLength = bytes.size();
+        m.buffers[0].data.insert(m.buffers[0].data.end(), bytes.begin(), bytes.end());
+        m.bufferViews.push_back(view);
         m.images.push_back(image);
         tinygltf::Texture texture;
         texture.source = 0;
