@@ -43,6 +43,10 @@ void Gnome::ShowKeySet(int k) {
     const char* name = shownKeyset ? shownKeyset->Name() : nullptr;
     set_label("keyVuLabel", name ? KLFmt("%s:", name) : std::string("Keyset:"));
     set_label("infoKeysetTitle", name ? std::string(name) : std::string("No Keyset Loaded"));
+    if (theImp.geometryActive) {
+        theImp.PrepareKeyFrames(k);
+        show_scene_in_views();
+    }
 }
 
 void Gnome::DressKeysetMenu() {
@@ -98,11 +102,8 @@ void Gnome::ClearKeysets(int) {}
 void Gnome::ClearKeyTracks() {}
 void Gnome::InitSound(CueSound*) {}
 void Gnome::InitMarkTrack(KLMarkTrack*) {}
-void Gnome::MakeKeysetImages() {}
 void Gnome::update_keyset_tiles() {}
 void Gnome::DisplayKeyShapeImages(int, int, float) {}
-void Gnome::set_static_keytracks(void*) {}
-void Gnome::clear_static_keytracks(void*) {}
 void Gnome::TileButtonDown(Widget, XtPointer, XtPointer) {}
 void Gnome::TileButtonClick2(Widget, XtPointer, XtPointer) {}
 void Gnome::display_style_cb(Widget, XtPointer, XtPointer) {}
