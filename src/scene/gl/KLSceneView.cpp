@@ -189,6 +189,7 @@ void KLSceneView::Draw() {
     }
     render(width, height);
     glXSwapBuffers(XtDisplay(area_), XtWindow(area_));
+    ++draws_;
 }
 
 std::unique_ptr<KLImageSGI> KLSceneView::DrawPix(int width, int height) {

@@ -65,8 +65,10 @@ class KLSceneView : public KLFiend {
     KLCamera& Camera() { return camera_; }
     // True when the view has a GL context to draw with.
     bool HasGL() const { return context_ != nullptr; }
-    // Number of camera drags ended (CameraEnd) since the view was made.
+    // Number of camera drags ended (CameraEnd) and of redraws made on screen since the view
+    // was made.
     int DragsEnded() const { return dragsEnded_; }
+    int Draws() const { return draws_; }
 
     CueTime time;     // the scene time the view shows
     int playing = 0;  // nonzero while playback runs: fast drawing
@@ -94,5 +96,6 @@ class KLSceneView : public KLFiend {
     Hook after_ = nullptr;
     void* hookData_ = nullptr;
     int dragsEnded_ = 0;
+    int draws_ = 0;
     bool framed_ = false;
 };
