@@ -40,13 +40,33 @@ void KLCamera::Zoom(float dx, float dy) {
     distance = std::max(kMinDistance, distance * std::exp(-(dx - dy) * kZoomRate));
 }
 
-void KLCamera::Frame(const Vec3& boxMin, const Vec3& boxMax) {
+void KLCamera::Frame(const Vec3& boxMin, const Vec3& boxMax, float aspect) {
     centre = (boxMin + boxMax) * 0.5f;
-    float radius = (boxMax - boxMin).Length() * 0.5f;
-    if (!(radius > 0) || !std::isfinite(radius)) {
-        radius = 1.0f;
+    if (!std::isfinite(centre.x) || !std::isfinite(centre.y) || !std::isfinite(centre.z)) {
+        centre = Vec3();
     }
-    distance = std::max(kMinDistance, radius / std::sin(fovY * kDegrees / 2) * 1.05f);
+    if (!(aspect > 0) || !std::isfinite(aspect)) {
+        aspect = 1.0f;
+    }
+    // Each corner, in the camera's axes about the look-at point, needs the eye at least so
+    // far back that it lies inside both half-angles of the view.
+    const Vec3 back = back_of(yaw, pitch);
+    const Vec3 right = Vec3(0, 1, 0).Cross(back).Normalized();
+    const Vec3 up = back.Cross(right);
+    const float t = std::tan(fovY * kDegrees / 2);
+    float needed = 0;
+    for (int corner = 0; corner < 8; ++corner) {
+        const Vec3 p(corner & 1 ? boxMax.x : boxMin.x, corner & 2 ? boxMax.y : boxMin.y,
+                     corner & 4 ? boxMax.z : boxMin.z);
+        const Vec3 d = p - centre;
+        const float z = d.Dot(back);
+        needed = std::max(needed, z + std::fabs(d.Dot(up)) / t);
+        needed = std::max(needed, z + std::fabs(d.Dot(right)) / (t * aspect));
+    }
+    if (!(needed > 0) || !std::isfinite(needed)) {
+        needed = 1.0f;
+    }
+    distance = std::max(kMinDistance, needed * 1.1f);
 }
 
 void KLCamera::Aim(const Vec3& eye, const Vec3& target) {

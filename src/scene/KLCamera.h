@@ -23,8 +23,9 @@ class KLCamera {
     // Dollies towards the look-at point (pointer right or up) or away from it.
     void Zoom(float dx, float dy);
 
-    // Looks at the box from the current direction, near enough that it fills the view.
-    void Frame(const Vec3& boxMin, const Vec3& boxMax);
+    // Looks at the box's centre from the current direction, near enough that the box fills
+    // a view of that aspect (width / height) with a small margin.
+    void Frame(const Vec3& boxMin, const Vec3& boxMax, float aspect = 4.0f / 3.0f);
     // Looks from `eye` towards `target` (the direction of a scene camera).
     void Aim(const Vec3& eye, const Vec3& target);
 

@@ -146,7 +146,7 @@ bool KLScene::Bounds(Vec3* min, Vec3* max) const {
     return true;
 }
 
-void KLScene::LookAt(KLCamera* camera, bool fromSceneCamera) const {
+void KLScene::LookAt(KLCamera* camera, bool fromSceneCamera, float aspect) const {
     Vec3 lo(-1, -1, -1), hi(1, 1, 1);
     Bounds(&lo, &hi);
     if (fromSceneCamera && !geometry_.cameras.empty()) {
@@ -162,5 +162,5 @@ void KLScene::LookAt(KLCamera* camera, bool fromSceneCamera) const {
             camera->fovY = sc.yfov;
         }
     }
-    camera->Frame(lo, hi);
+    camera->Frame(lo, hi, aspect);
 }

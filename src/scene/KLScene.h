@@ -65,8 +65,8 @@ class KLScene {
     bool Bounds(Vec3* min, Vec3* max) const;
     // Points `camera` at the subject as last evaluated, framing its bounding box: from the
     // direction of the scene's first camera when it has one and `fromSceneCamera` is set,
-    // else from the camera's own direction.
-    void LookAt(KLCamera* camera, bool fromSceneCamera = false) const;
+    // else from the camera's own direction; `aspect` is the view's width / height.
+    void LookAt(KLCamera* camera, bool fromSceneCamera = false, float aspect = 4.0f / 3.0f) const;
 
     const SceneGeometry& Geometry() const { return geometry_; }
     int NodeCount() const { return int(world_.size()); }

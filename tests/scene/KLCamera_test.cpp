@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cmath>
 
 #include "scene/KLCamera.h"
@@ -53,22 +54,29 @@ TEST(KLCamera, ZoomAndPan) {
     EXPECT_NEAR((camera.Eye() - camera.centre).Length(), (eye - Vec3()).Length(), 1e-4);
 }
 
-// Framing puts the box's centre ahead and every corner inside the field of view.
+// Framing puts the box's centre ahead and every corner inside the field of view of a view of
+// that shape, the box filling most of it.
 TEST(KLCamera, FrameShowsTheWholeBox) {
     KLCamera camera;
     camera.yaw = 40;
     camera.pitch = -20;
     const Vec3 lo(-1, 0, 2), hi(3, 1, 2.5f);
-    camera.Frame(lo, hi);
+    const float aspect = 1.5f;
+    camera.Frame(lo, hi, aspect);
     EXPECT_NEAR(camera.centre.x, 1, 1e-6);
     const Mat4 view = camera.ViewMatrix();
+    const float t = std::tan(camera.fovY / 2 * float(M_PI) / 180);
+    float widest = 0;
     for (int corner = 0; corner < 8; ++corner) {
         Vec3 p(corner & 1 ? hi.x : lo.x, corner & 2 ? hi.y : lo.y, corner & 4 ? hi.z : lo.z);
         Vec3 v = view.TransformPoint(p);
         ASSERT_LT(v.z, 0) << "in front of the camera";
-        const float angle = std::atan(std::hypot(v.x, v.y) / -v.z) * 180 / float(M_PI);
-        EXPECT_LT(angle, camera.fovY / 2 * 1.5f) << "corner " << corner;
+        const float x = std::fabs(v.x) / -v.z / (t * aspect), y = std::fabs(v.y) / -v.z / t;
+        EXPECT_LT(x, 1.0f) << "corner " << corner;
+        EXPECT_LT(y, 1.0f) << "corner " << corner;
+        widest = std::max({widest, x, y});
     }
+    EXPECT_GT(widest, 0.8f) << "the box fills the view";
     camera.Frame(Vec3(), Vec3());  // a point: still a usable distance
     EXPECT_GT(camera.distance, 0);
 }

@@ -206,8 +206,11 @@ TEST_F(ViewsTest, KeyViewCameraSetAndClear) {
     Gnome::key_view_clear_cb(nullptr, nullptr, nullptr);
     for (int i = 0; i < 30; i++)
         view->CameraZoom(300, 0);
+    const float zoomed = view->Camera().distance;
     gnome->CenterKeyView();
-    EXPECT_EQ(view->Camera().distance, stored.distance) << "framed again from that direction";
+    EXPECT_EQ(view->Camera().yaw, stored.yaw) << "framed again from the same direction";
+    EXPECT_EQ(view->Camera().pitch, stored.pitch);
+    EXPECT_GT(view->Camera().distance, zoomed * 1.5f);
 }
 
 // Every key shape of the active keyset has a 160 x 121 picture and an 80 x 60 icon, grabbed

@@ -225,7 +225,10 @@ void KLSceneView::LookAt() {
         return;
     }
     evaluate();
-    scene_->LookAt(&camera_, !framed_);
+    Dimension width = 0, height = 0;
+    XtVaGetValues(area_, XmNwidth, &width, XmNheight, &height, nullptr);
+    scene_->LookAt(&camera_, !framed_,
+                   width && height ? float(width) / float(height) : 4.0f / 3.0f);
     framed_ = true;
 }
 
