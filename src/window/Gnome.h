@@ -147,6 +147,13 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void toggle_ref_view_cb(Widget, XtPointer, XtPointer);
     static void key_view_set_cb(Widget, XtPointer, XtPointer);
     static void key_view_clear_cb(Widget, XtPointer, XtPointer);
+    // Helpers of the views: the key view's hooks and the showTextures toggle (from
+    // DressWidgets); both views given the workspace's scene when it has geometry (from
+    // ShowKeySet); one arm or disarm of a camera button of view 1 (key) or 0 (mix).
+    void dress_scene_views();
+    void show_scene_in_views();
+    static void show_textures_cb(Widget, XtPointer, XtPointer);
+    void camera_drag(Widget w, XtPointer clientData, XtPointer callData, int view);
 
     // --- Information bar, prompts, error flag, help, reference menu (GnomeInfo.cpp)
     void DisplayTimecode(CueTime t);

@@ -74,11 +74,7 @@ void Gnome::ShowKeySet(int k) {
     update_recognizer_dialogs();
     if (theImp.geometryActive) {
         theImp.PrepareKeyFrames(k);
-#ifdef GNOME_HAS_SCENE_VIEW
-        for (KLSceneView* view : {keyScene, mixScene})
-            if (view)
-                view->SetScene(theImp.scene.get());
-#endif
+        show_scene_in_views();
     }
     ShowKeyframeImage();
 }
@@ -237,8 +233,6 @@ void Gnome::InitMarkTrack(KLMarkTrack* track) {
     if (syncChart)
         syncChart->SetMarkTrack(track);
 }
-
-void Gnome::MakeKeysetImages() {}
 
 void Gnome::update_keyset_tiles() {
     if (!shownKeyset || activeKeyset < 0 || activeKeyset >= kMaxKeysets)

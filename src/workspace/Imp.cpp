@@ -10,6 +10,7 @@
 #include "model/KLKeySet.h"
 #include "model/KLKeyTrack.h"
 #include "model/KLMarkTrack.h"
+#include "model/KLTrackPreview.h"
 #include "scene/KLKeyFrameList.h"
 #include "scene/KLScene.h"
 #include "scene/KLWireSource.h"
@@ -56,6 +57,13 @@ std::unique_ptr<KLScene> Imp::make_scene() {
     else
         made->DontEvaluateDags();
     made->SetDetail(tessU, tessV);
+    // The views preview every keyset's track as apply would write it.
+    made->SetPoseSource(std::make_unique<KLTrackPreview>([this]() {
+        std::vector<KLKeyTrack*> tracks;
+        for (int i = 0; i < keysetCount; ++i)
+            tracks.push_back(keyTracks[i].get());
+        return tracks;
+    }));
     return made;
 }
 
