@@ -46,7 +46,7 @@ void KLTrackPreview::build(KLWireSource* source, TrackCurves* curves) {
         return;
     }
     if (set->kind == 1) {
-        for (const KLKeyChannel* kc : set->keyChannels) {
+        for (const auto& kc : set->keyChannels) {
             bool ambiguous = false;
             std::unique_ptr<OrDagNode> node =
                 KLFindChannelNode(root.get(), kc->Name() ? kc->Name() : "", &ambiguous);
@@ -56,8 +56,8 @@ void KLTrackPreview::build(KLWireSource* source, TrackCurves* curves) {
             Driven d;
             d.node = node->index();
             d.channel = kc->channel;
-            d.keyChannel = kc;
-            d.curve = KLApplyCurve(track, kc, kFirst, kLast, CueTime()).Curve();
+            d.keyChannel = kc.get();
+            d.curve = KLApplyCurve(track, kc.get(), kFirst, kLast, CueTime()).Curve();
             curves->driven.push_back(std::move(d));
         }
     } else if (set->kind == 2 && set->nodeName) {

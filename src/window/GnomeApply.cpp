@@ -180,9 +180,9 @@ void Gnome::update_apply_dialog(KLEdlEvent* event) {
     std::vector<std::string> names;
     if (event->dagList) {
         bool first = true;
-        for (OrDagNode* node : event->dagList->nodes) {
+        for (const auto& node : event->dagList->nodes) {
             // The first node of the list is the scene's root group.
-            names.push_back(first ? kRootItem : KLWire::NodeName(node));
+            names.push_back(first ? kRootItem : KLWire::NodeName(node.get()));
             first = false;
         }
     }

@@ -251,20 +251,6 @@ void Gnome::DisplayKeyShapeImages(int a, int b, float fraction) {
     show_key_images(ka, kb, ka != nullptr, kb != nullptr, fraction);
 }
 
-void Gnome::set_static_keytracks(void* gnome) {
-    auto* g = static_cast<Gnome*>(gnome);
-    for (int i = 0; i < theImp.keysetCount && i < kMaxKeysets; i++)
-        if (KLKeyTrack* track = theImp.GetKeyTrack(i))
-            if (!g || i != g->activeKeyset)
-                track->SetStatic();
-}
-
-void Gnome::clear_static_keytracks(void*) {
-    for (int i = 0; i < theImp.keysetCount && i < kMaxKeysets; i++)
-        if (KLKeyTrack* track = theImp.GetKeyTrack(i))
-            track->ClearStatic();
-}
-
 // Makes `pressed` the only set tile of the active keyset; returns its index (-1: not one
 // of the active keyset's tiles).
 int Gnome::select_tile(KLFiend* pressed) {

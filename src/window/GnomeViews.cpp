@@ -318,7 +318,7 @@ void Gnome::MakeKeysetImages() {}
 
 // Every keyset's track but the active one holds its default shape while the key view draws.
 void Gnome::set_static_keytracks(void* gnome) {
-    const int active = static_cast<Gnome*>(gnome)->activeKeyset;
+    const int active = gnome ? static_cast<Gnome*>(gnome)->activeKeyset : -1;
     for (int i = 0; i < theImp.keysetCount; i++)
         if (i != active)
             if (KLKeyTrack* track = theImp.GetKeyTrack(i))

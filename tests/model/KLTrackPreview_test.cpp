@@ -55,13 +55,13 @@ class PreviewTest : public ModelTest {
         browTrack.SetControlGraphNode(scene.FetchNode("brow"));
     }
     void AddChannel(const char* node, int channel, std::vector<float> values) {
-        auto* c = new KLKeyChannel(node, channel, int(values.size()));
+        auto c = std::make_unique<KLKeyChannel>(node, channel, int(values.size()));
         for (size_t i = 0; i < values.size(); ++i)
             c->Set(int(i), values[i]);
-        mouth.keyChannels.push_back(c);
+        mouth.AddKeyChannel(std::move(c));
     }
     int Index(const char* name) {
-        std::unique_ptr<OrDagNode> n(KLWire::FetchDagNode(root.get(), name));
+        std::unique_ptr<OrDagNode> n = KLWire::FetchDagNode(root.get(), name);
         return n ? n->index() : -1;
     }
     void ApplyBoth(double offset) {
