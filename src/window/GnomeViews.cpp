@@ -54,16 +54,6 @@ void Gnome::dress_scene_views() {
         XmToggleButtonSetState(w, True, False);
 }
 
-void Gnome::show_scene_in_views() {
-    KLScene* scene = theImp.geometryActive ? theImp.scene.get() : nullptr;
-    for (KLSceneView* view : {keyScene, mixScene}) {
-        if (view) {
-            view->SetScene(scene);
-            view->Draw();
-        }
-    }
-}
-
 void Gnome::show_textures_cb(Widget w, XtPointer, XtPointer) {
     Gnome* g = TheGnome();
     if (!g)
@@ -290,7 +280,6 @@ void Gnome::MakeKeysetImages() {
 #else  // no scene view in this build: the views stay blank
 
 void Gnome::dress_scene_views() {}
-void Gnome::show_scene_in_views() {}
 void Gnome::show_textures_cb(Widget, XtPointer, XtPointer) {}
 void Gnome::CenterKeyView() {}
 void Gnome::CenterMixView() {}
@@ -315,21 +304,6 @@ void Gnome::key_view_clear_cb(Widget, XtPointer, XtPointer) {}
 void Gnome::MakeKeysetImages() {}
 
 #endif
-
-// Every keyset's track but the active one holds its default shape while the key view draws.
-void Gnome::set_static_keytracks(void* gnome) {
-    const int active = static_cast<Gnome*>(gnome)->activeKeyset;
-    for (int i = 0; i < theImp.keysetCount; i++)
-        if (i != active)
-            if (KLKeyTrack* track = theImp.GetKeyTrack(i))
-                track->SetStatic();
-}
-
-void Gnome::clear_static_keytracks(void*) {
-    for (int i = 0; i < theImp.keysetCount; i++)
-        if (KLKeyTrack* track = theImp.GetKeyTrack(i))
-            track->ClearStatic();
-}
 
 // View choices: each sets the view fields, then the window manages the right alternative.
 void Gnome::toggle_key_view_cb(Widget, XtPointer clientData, XtPointer) {
