@@ -152,6 +152,10 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     void dress_scene_views();
     static void show_textures_cb(Widget, XtPointer, XtPointer);
     void camera_drag(Widget w, XtPointer clientData, XtPointer callData, int view);
+    // PlayForwardSave's frames: the mix view as drawn, kept as playblast frame i; the
+    // playblast from `start` shown in the reference view.
+    void grab_playblast_frame(int i);
+    void show_playblast(CueTime start);
 
     // --- Information bar, prompts, error flag, help, reference menu (GnomeInfo.cpp)
     void DisplayTimecode(CueTime t);

@@ -259,7 +259,10 @@ void Gnome::PlayForwardSave() {
             CueTime t = start + CueTime(double(i), 0);
             GoToTime(t);
             DisplayTimecode(t);
+            grab_playblast_frame(i);
         }
+    if (theImp.geometryActive && frames > 0)
+        show_playblast(start);
     if (!mixViewOn) {
         if (mixFake)
             XtManageChild(mixFake);

@@ -5,6 +5,7 @@
 #include <Xm/ToggleB.h>
 #include <Xm/Xm.h>
 
+#include <algorithm>
 #include <memory>
 
 #include "model/KLKey.h"
@@ -277,7 +278,18 @@ void Gnome::MakeKeysetImages() {
     keyScene->Draw();
 }
 
+void Gnome::grab_playblast_frame(int i) {
+    if (!mixScene || i < 0 || i >= theImp.playblastCount || !theImp.playblastImages)
+        return;
+    Dimension width = 0, height = 0;
+    XtVaGetValues(mixScene->GetWidget(), XmNwidth, &width, XmNheight, &height, nullptr);
+    theImp.playblastImages[size_t(i)] =
+        mixScene->DrawPix(std::max<int>(width, 1), std::max<int>(height, 1));
+}
+
 #else  // no scene view in this build: the views stay blank
+
+void Gnome::grab_playblast_frame(int) {}
 
 void Gnome::dress_scene_views() {}
 void Gnome::show_textures_cb(Widget, XtPointer, XtPointer) {}
@@ -304,6 +316,13 @@ void Gnome::key_view_clear_cb(Widget, XtPointer, XtPointer) {}
 void Gnome::MakeKeysetImages() {}
 
 #endif
+
+void Gnome::show_playblast(CueTime start) {
+    theImp.playblastOffset = start;
+    theImp.playblastLoaded = 1;
+    toggle_ref_view_cb(nullptr, XtPointer(1), nullptr);
+    DisplayReference(start);
+}
 
 // View choices: each sets the view fields, then the window manages the right alternative.
 void Gnome::toggle_key_view_cb(Widget, XtPointer clientData, XtPointer) {

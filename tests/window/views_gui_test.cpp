@@ -273,3 +273,43 @@ TEST_F(ViewsTest, ClearViewsAndShowAgain) {
 }
 
 }  // namespace
+
+namespace {
+
+// Played forward to a playblast, each frame of the mix view becomes a playblast frame of the
+// view's size, shown in the reference view from the region's start.
+TEST_F(ViewsTest, PlayblastFramesAreTheMixViewsFrames) {
+    KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
+    KLKeySet* set = gnome->shownKeyset;
+    mouth->InsertKey(1, CueTime::FromFrames(10), set->GetKeyShape(1), KLKeyEvent::kLinear, 1.0f);
+    mouth->InsertKey(3, CueTime::FromFrames(12), set->GetKeyShape(3), KLKeyEvent::kLinear, 1.0f);
+    theImp.PrepareKeyFrames(-1);
+    theImp.playblastImages = std::make_unique<std::unique_ptr<KLImageSGI>[]>(3);
+    theImp.playblastCount = 3;
+    const CueTime start = CueTime::FromFrames(10);
+    for (int i = 0; i < 3; i++) {
+        gnome->mixScene->time = start + CueTime::FromFrames(i);
+        gnome->mixScene->Draw();
+        gnome->grab_playblast_frame(i);
+    }
+    gnome->show_playblast(start);
+    Dimension width = 0, height = 0;
+    XtVaGetValues(gnome->mixScene->GetWidget(), XmNwidth, &width, XmNheight, &height, nullptr);
+    for (int i = 0; i < 3; i++) {
+        ASSERT_TRUE(theImp.playblastImages[size_t(i)]);
+        EXPECT_EQ(theImp.playblastImages[size_t(i)]->Width(), int(width));
+        EXPECT_EQ(theImp.playblastImages[size_t(i)]->Height(), int(height));
+    }
+    EXPECT_FALSE(SamePixels(*theImp.playblastImages[0], *theImp.playblastImages[2]))
+        << "the mouth moved from one key shape to the other";
+    EXPECT_EQ(gnome->playblastViewOn, 1);
+    EXPECT_EQ(gnome->refViewOn, 0);
+    EXPECT_EQ(theImp.GetPlayblast(start + CueTime::FromFrames(1)), theImp.playblastImages[1].get());
+    mouth->RemoveKey(CueTime::FromFrames(10));
+    mouth->RemoveKey(CueTime::FromFrames(12));
+    theImp.PrepareKeyFrames(-1);
+    theImp.DeletePlayblast();
+    Gnome::toggle_ref_view_cb(nullptr, XtPointer(0), nullptr);
+}
+
+}  // namespace
