@@ -71,6 +71,11 @@ void KLScene::SetRestFrame(double frame) {
     pose_.Reset(rest_);
 }
 
+long KLScene::ContentRevision() const {
+    const long animation = poseSource_ ? poseSource_->Revision() : 0;
+    return (animation * 31 + generation_) * 7 + feedback_;
+}
+
 KLGraphNode* KLScene::FetchNode(const char* name) {
     if (!name) {
         return nullptr;
