@@ -334,3 +334,25 @@ TEST_F(ViewsTest, EditedKeysRedrawBothViews) {
 }
 
 }  // namespace
+
+namespace {
+
+// Loaded without geometry, the views get no scene and no key-shape pictures are grabbed;
+// loaded with it again, both come back.
+TEST_F(ViewsTest, WithoutGeometryTheViewsStayEmpty) {
+    const std::string kset = windowtest::DemoProject() + "/misc_data/demo.kset";
+    theImp.loadGeometry = 0;
+    ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);
+    EXPECT_EQ(theImp.geometryActive, 0);
+    EXPECT_EQ(gnome->keyScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->mixScene->GetScene(), nullptr);
+    ASSERT_TRUE(gnome->shownKeyset);
+    gnome->MakeKeysetImages();
+    EXPECT_FALSE(gnome->shownKeyset->GetKeyShape(1)->image) << "nothing grabbed";
+    theImp.loadGeometry = 1;
+    ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);
+    EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
+    EXPECT_TRUE(gnome->shownKeyset->GetKeyShape(1)->image);
+}
+
+}  // namespace
