@@ -214,9 +214,15 @@ TEST_F(ViewsTest, KeyViewCameraSetAndClear) {
 }
 
 // Every key shape of the active keyset has a 160 x 121 picture and an 80 x 60 icon, grabbed
-// from the key view; different shapes give different pictures.
+// from the key view (also while the key image view stands in its place); different shapes
+// give different pictures.
 TEST_F(ViewsTest, KeysetImagesAreGrabbedPerKeyShape) {
+    gnome->keyViewMode = 0;
+    gnome->SetViewStatus();
+    ASSERT_FALSE(XtIsManaged(gnome->keyScene->GetWidget()));
     gnome->MakeKeysetImages();
+    gnome->keyViewMode = 1;
+    gnome->SetViewStatus();
     KLKeySet* set = gnome->shownKeyset;
     ASSERT_TRUE(set);
     ASSERT_GE(set->keyShapeCount, 3);
