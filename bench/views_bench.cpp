@@ -14,6 +14,7 @@
 #include <Xm/Form.h>
 #include <Xm/Xm.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
@@ -75,7 +76,9 @@ void make_project() {
     for (const char* sub : {"misc_data", "wire", "pix"})
         fs::create_directories(dir + "/" + sub);
     testscenes::Sheet face;
-    face.columns = face.rows = 100;
+    // CHIRRUP_VIEWS_BENCH_COLUMNS: another number of quads per side than 100.
+    const char* columns = getenv("CHIRRUP_VIEWS_BENCH_COLUMNS");
+    face.columns = face.rows = columns ? std::max(1, atoi(columns)) : 100;
     face.joints = 60;
     face.morphTargets = 50;
     face.morphWeights.assign(50, 0.5f);

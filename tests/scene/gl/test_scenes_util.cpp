@@ -257,7 +257,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
         for (int j = 0; j < s.joints; ++j) {
             std::vector<float> quats;
             for (int f = 0; f < s.animatedFrames; ++f) {
-                const double half = (j + 1) * f / 4.0 * M_PI / 360.0;
+                const double half = 2.0 * std::sin(double(j + f)) * M_PI / 360.0;
                 quats.insert(quats.end(), {0, 0, float(std::sin(half)), float(std::cos(half))});
             }
             tinygltf::AnimationSampler sampler;
