@@ -112,8 +112,12 @@ bool Pump(const std::function<bool()>& done, double seconds = 5.0) {
     while (!done()) {
         if (std::chrono::steady_clock::now() > limit)
             return done();
-        XtAppAddTimeOut(
-            context, 10, [](XtPointer, XtIntervalId*) {}, nullptr);
+        static bool armed = false;  // one wake-up timeout at a time
+        if (!armed) {
+            armed = true;
+            XtAppAddTimeOut(
+                context, 10, [](XtPointer, XtIntervalId*) { armed = false; }, nullptr);
+        }
         XtAppProcessEvent(context, XtIMAll);
     }
     return true;
