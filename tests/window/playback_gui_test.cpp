@@ -233,6 +233,7 @@ TEST_F(PlaybackWindowTest, SpeedFastAndReverseShapeThePass) {
     chart->SetRegionRange(CueTime::FromSeconds(1), CueTime::FromSeconds(3));
     CueTime s, e;
     chart->GetRegionRange(s, e);
+    chart->SetIndicatorTime(e);
     ChooseOption("speedMenu", 3);
     EXPECT_EQ(gnome->playSpeed, 0.25f);
     guitest::Click(W("fastReverse"));
