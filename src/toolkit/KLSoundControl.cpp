@@ -155,7 +155,7 @@ bool open_device(const char* driver) {
     want.freq = 48000;
     want.format = AUDIO_F32SYS;
     want.channels = 2;
-    want.samples = 480;  // 10 ms at 48 kHz
+    want.samples = 512;  // a power of two: SDL 2.26 overruns its buffers with others
     want.callback = feed;
     out.device =
         SDL_OpenAudioDevice(nullptr, 0, &want, &have,

@@ -148,12 +148,14 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void key_view_set_cb(Widget, XtPointer, XtPointer);
     static void key_view_clear_cb(Widget, XtPointer, XtPointer);
     // Helpers of the views: the key view's hooks and the showTextures toggle (from
-    // DressWidgets); both views given the workspace's scene when it has geometry (from
-    // ShowKeySet); one arm or disarm of a camera button of view 1 (key) or 0 (mix).
+    // DressWidgets); one arm or disarm of a camera button of view 1 (key) or 0 (mix).
     void dress_scene_views();
-    void show_scene_in_views();
     static void show_textures_cb(Widget, XtPointer, XtPointer);
     void camera_drag(Widget w, XtPointer clientData, XtPointer callData, int view);
+    // PlayForwardSave's frames: the mix view as drawn, kept as playblast frame i; the
+    // playblast from `start` shown in the reference view.
+    void grab_playblast_frame(int i);
+    void show_playblast(CueTime start);
 
     // --- Information bar, prompts, error flag, help, reference menu (GnomeInfo.cpp)
     void DisplayTimecode(CueTime t);

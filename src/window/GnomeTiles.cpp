@@ -214,14 +214,21 @@ void Gnome::ClearKeysets(int index) {
 
 void Gnome::ClearKeyTracks() {
     halt_playback();
-    if (syncChart)
+    // The workspace replaces its mark track next: the chart must not draw the old one.
+    if (syncChart) {
         syncChart->SetKeyTrack(nullptr);
+        syncChart->SetMarkTrack(nullptr);
+    }
 }
 
 void Gnome::InitSound(CueSound* sound) {
     halt_playback();
-    if (syncChart)
+    if (syncChart) {
+        // A track load replaces the mark track before the sound: the chart must not draw
+        // the old one while it takes the new sound.
+        syncChart->SetMarkTrack(theImp.markTrack.get());
         syncChart->SetSound(sound);
+    }
 }
 
 void Gnome::InitMarkTrack(KLMarkTrack* track) {
@@ -244,6 +251,20 @@ void Gnome::DisplayKeyShapeImages(int a, int b, float fraction) {
     KLKey* ka = shownKeyset->GetKeyShape(a);
     KLKey* kb = shownKeyset->GetKeyShape(b);
     show_key_images(ka, kb, ka != nullptr, kb != nullptr, fraction);
+}
+
+void Gnome::set_static_keytracks(void* gnome) {
+    auto* g = static_cast<Gnome*>(gnome);
+    for (int i = 0; i < theImp.keysetCount && i < kMaxKeysets; i++)
+        if (KLKeyTrack* track = theImp.GetKeyTrack(i))
+            if (!g || i != g->activeKeyset)
+                track->SetStatic();
+}
+
+void Gnome::clear_static_keytracks(void*) {
+    for (int i = 0; i < theImp.keysetCount && i < kMaxKeysets; i++)
+        if (KLKeyTrack* track = theImp.GetKeyTrack(i))
+            track->ClearStatic();
 }
 
 // Makes `pressed` the only set tile of the active keyset; returns its index (-1: not one

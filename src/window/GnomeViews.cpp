@@ -5,6 +5,7 @@
 #include <Xm/ToggleB.h>
 #include <Xm/Xm.h>
 
+#include <algorithm>
 #include <memory>
 
 #include "model/KLKey.h"
@@ -52,16 +53,6 @@ void Gnome::dress_scene_views() {
     AddCallback("showTextures", XmNvalueChangedCallback, show_textures_cb, nullptr);
     if (Widget w = FindWidget("showTextures"))
         XmToggleButtonSetState(w, True, False);
-}
-
-void Gnome::show_scene_in_views() {
-    KLScene* scene = theImp.geometryActive ? theImp.scene.get() : nullptr;
-    for (KLSceneView* view : {keyScene, mixScene}) {
-        if (view) {
-            view->SetScene(scene);
-            view->Draw();
-        }
-    }
 }
 
 void Gnome::show_textures_cb(Widget w, XtPointer, XtPointer) {
@@ -287,10 +278,20 @@ void Gnome::MakeKeysetImages() {
     keyScene->Draw();
 }
 
+void Gnome::grab_playblast_frame(int i) {
+    if (!mixScene || i < 0 || i >= theImp.playblastCount || !theImp.playblastImages)
+        return;
+    Dimension width = 0, height = 0;
+    XtVaGetValues(mixScene->GetWidget(), XmNwidth, &width, XmNheight, &height, nullptr);
+    theImp.playblastImages[size_t(i)] =
+        mixScene->DrawPix(std::max<int>(width, 1), std::max<int>(height, 1));
+}
+
 #else  // no scene view in this build: the views stay blank
 
+void Gnome::grab_playblast_frame(int) {}
+
 void Gnome::dress_scene_views() {}
-void Gnome::show_scene_in_views() {}
 void Gnome::show_textures_cb(Widget, XtPointer, XtPointer) {}
 void Gnome::CenterKeyView() {}
 void Gnome::CenterMixView() {}
@@ -316,19 +317,11 @@ void Gnome::MakeKeysetImages() {}
 
 #endif
 
-// Every keyset's track but the active one holds its default shape while the key view draws.
-void Gnome::set_static_keytracks(void* gnome) {
-    const int active = gnome ? static_cast<Gnome*>(gnome)->activeKeyset : -1;
-    for (int i = 0; i < theImp.keysetCount; i++)
-        if (i != active)
-            if (KLKeyTrack* track = theImp.GetKeyTrack(i))
-                track->SetStatic();
-}
-
-void Gnome::clear_static_keytracks(void*) {
-    for (int i = 0; i < theImp.keysetCount; i++)
-        if (KLKeyTrack* track = theImp.GetKeyTrack(i))
-            track->ClearStatic();
+void Gnome::show_playblast(CueTime start) {
+    theImp.playblastOffset = start;
+    theImp.playblastLoaded = 1;
+    toggle_ref_view_cb(nullptr, XtPointer(1), nullptr);
+    DisplayReference(start);
 }
 
 // View choices: each sets the view fields, then the window manages the right alternative.

@@ -214,9 +214,15 @@ TEST_F(ViewsTest, KeyViewCameraSetAndClear) {
 }
 
 // Every key shape of the active keyset has a 160 x 121 picture and an 80 x 60 icon, grabbed
-// from the key view; different shapes give different pictures.
+// from the key view (also while the key image view stands in its place); different shapes
+// give different pictures.
 TEST_F(ViewsTest, KeysetImagesAreGrabbedPerKeyShape) {
+    gnome->keyViewMode = 0;
+    gnome->SetViewStatus();
+    ASSERT_FALSE(XtIsManaged(gnome->keyScene->GetWidget()));
     gnome->MakeKeysetImages();
+    gnome->keyViewMode = 1;
+    gnome->SetViewStatus();
     KLKeySet* set = gnome->shownKeyset;
     ASSERT_TRUE(set);
     ASSERT_GE(set->keyShapeCount, 3);
@@ -270,6 +276,89 @@ TEST_F(ViewsTest, ClearViewsAndShowAgain) {
     gnome->SetActiveKeyset(0);
     EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
     EXPECT_EQ(gnome->mixScene->GetScene(), theImp.scene.get());
+}
+
+}  // namespace
+
+namespace {
+
+// Played forward to a playblast, each frame of the mix view becomes a playblast frame of the
+// view's size, shown in the reference view from the region's start.
+TEST_F(ViewsTest, PlayblastFramesAreTheMixViewsFrames) {
+    KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
+    KLKeySet* set = gnome->shownKeyset;
+    mouth->InsertKey(1, CueTime::FromFrames(10), set->GetKeyShape(1), KLKeyEvent::kLinear, 1.0f);
+    mouth->InsertKey(3, CueTime::FromFrames(12), set->GetKeyShape(3), KLKeyEvent::kLinear, 1.0f);
+    theImp.PrepareKeyFrames(-1);
+    theImp.playblastImages = std::make_unique<std::unique_ptr<KLImageSGI>[]>(3);
+    theImp.playblastCount = 3;
+    const CueTime start = CueTime::FromFrames(10);
+    for (int i = 0; i < 3; i++) {
+        gnome->mixScene->time = start + CueTime::FromFrames(i);
+        gnome->mixScene->Draw();
+        gnome->grab_playblast_frame(i);
+    }
+    gnome->show_playblast(start);
+    Dimension width = 0, height = 0;
+    XtVaGetValues(gnome->mixScene->GetWidget(), XmNwidth, &width, XmNheight, &height, nullptr);
+    for (int i = 0; i < 3; i++) {
+        ASSERT_TRUE(theImp.playblastImages[size_t(i)]);
+        EXPECT_EQ(theImp.playblastImages[size_t(i)]->Width(), int(width));
+        EXPECT_EQ(theImp.playblastImages[size_t(i)]->Height(), int(height));
+    }
+    EXPECT_FALSE(SamePixels(*theImp.playblastImages[0], *theImp.playblastImages[2]))
+        << "the mouth moved from one key shape to the other";
+    EXPECT_EQ(gnome->playblastViewOn, 1);
+    EXPECT_EQ(gnome->refViewOn, 0);
+    EXPECT_EQ(theImp.GetPlayblast(start + CueTime::FromFrames(1)), theImp.playblastImages[1].get());
+    mouth->RemoveKey(CueTime::FromFrames(10));
+    mouth->RemoveKey(CueTime::FromFrames(12));
+    theImp.PrepareKeyFrames(-1);
+    Gnome::toggle_ref_view_cb(nullptr, XtPointer(0), nullptr);
+    gnome->DisplayReference(start);  // lets go of the playblast picture
+    theImp.DeletePlayblast();
+}
+
+}  // namespace
+
+namespace {
+
+// A key edited on the active track shows in both views at once, without a call to draw.
+TEST_F(ViewsTest, EditedKeysRedrawBothViews) {
+    for (KLSceneView* view : {gnome->keyScene, gnome->mixScene})
+        view->time = CueTime::FromFrames(5);
+    guitest::Settle();
+    const int key = gnome->keyScene->Draws(), mix = gnome->mixScene->Draws();
+    KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
+    mouth->InsertKey(2, CueTime::FromFrames(5), gnome->shownKeyset->GetKeyShape(2),
+                     KLKeyEvent::kLinear, 1.0f);
+    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
+    EXPECT_TRUE(guitest::WaitFor(
+        [&] { return gnome->keyScene->Draws() > key && gnome->mixScene->Draws() > mix; }));
+    mouth->RemoveKey(CueTime::FromFrames(5));
+    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
+}
+
+}  // namespace
+
+namespace {
+
+// Loaded without geometry, the views get no scene and no key-shape pictures are grabbed;
+// loaded with it again, both come back.
+TEST_F(ViewsTest, WithoutGeometryTheViewsStayEmpty) {
+    const std::string kset = windowtest::DemoProject() + "/misc_data/demo.kset";
+    theImp.loadGeometry = 0;
+    ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);
+    EXPECT_EQ(theImp.geometryActive, 0);
+    EXPECT_EQ(gnome->keyScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->mixScene->GetScene(), nullptr);
+    ASSERT_TRUE(gnome->shownKeyset);
+    gnome->MakeKeysetImages();
+    EXPECT_FALSE(gnome->shownKeyset->GetKeyShape(1)->image) << "nothing grabbed";
+    theImp.loadGeometry = 1;
+    ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);
+    EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
+    EXPECT_TRUE(gnome->shownKeyset->GetKeyShape(1)->image);
 }
 
 }  // namespace

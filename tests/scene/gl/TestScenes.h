@@ -23,6 +23,10 @@ struct Sheet {
     int morphTargets = 0;
     float morphLift = 0.5f;
     std::vector<float> morphWeights;  // the mesh's default weights (zeros when empty)
+    // An animation "shapes" turning every joint about Z at each of frames 0..N-1 (30 fps,
+    // STEP), by 2 * sin(j + frame) degrees for joint j: N poses for key shapes that wave the
+    // sheet a little, as a face's key shapes move its parts.
+    int animatedFrames = 0;
     // An animation "weights" of the sheet's morph weights: key times (s) and weights per key.
     std::vector<float> weightTimes;
     std::vector<float> weightValues;

@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cmath>
 #include <cstring>
 
 #include <tiny_gltf.h>
@@ -244,6 +245,33 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
         skin.skeleton = skin.joints[0];
         m.skins.push_back(skin);
         m.nodes[0].skin = 0;
+    }
+    if (skinned && s.animatedFrames > 0) {
+        tinygltf::Animation anim;
+        anim.name = "shapes";
+        std::vector<float> times;
+        for (int f = 0; f < s.animatedFrames; ++f) {
+            times.push_back(float(f) / 30.0f);
+        }
+        const int input = add_accessor(m, times, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
+        for (int j = 0; j < s.joints; ++j) {
+            std::vector<float> quats;
+            for (int f = 0; f < s.animatedFrames; ++f) {
+                const double half = 2.0 * std::sin(double(j + f)) * M_PI / 360.0;
+                quats.insert(quats.end(), {0, 0, float(std::sin(half)), float(std::cos(half))});
+            }
+            tinygltf::AnimationSampler sampler;
+            sampler.input = input;
+            sampler.output = add_accessor(m, quats, kFloat, TINYGLTF_TYPE_VEC4, -1);
+            sampler.interpolation = "STEP";
+            anim.samplers.push_back(sampler);
+            tinygltf::AnimationChannel channel;
+            channel.sampler = int(anim.samplers.size()) - 1;
+            channel.target_node = m.skins[0].joints[size_t(j)];
+            channel.target_path = "rotation";
+            anim.channels.push_back(channel);
+        }
+        m.animations.push_back(anim);
     }
     if (morphed && !s.weightTimes.empty()) {
         tinygltf::Animation anim;

@@ -1,0 +1,125 @@
+// Display updates during playback in the main window: the demo track looping in the window
+// with the chart 1,600 pixels wide, the key image view and the reference view showing a
+// picture per frame. Reports the updates per second (the stop watch's marks) and the
+// program's CPU time over wall time. Needs a display: bench/playback-display runs it on its
+// own Xvfb. CHIRRUP_PLAY_SECONDS sets the wall time played per repetition (default 10).
+#include <benchmark/benchmark.h>
+#include <stdlib.h>
+#include <sys/resource.h>
+#include <unistd.h>
+
+#include <X11/Intrinsic.h>
+
+#include <chrono>
+#include <filesystem>
+#include <memory>
+#include <string>
+
+#include "chart/KLSyncChart.h"
+#include "toolkit/CuePrefs.h"
+#include "toolkit/KLImageSGI.h"
+#include "toolkit/MonotonicClock.h"
+#include "window/FallbackResources.h"
+#include "window/Gnome.h"
+#include "workspace/Imp.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+double CpuSeconds() {
+    rusage u{};
+    getrusage(RUSAGE_SELF, &u);
+    return double(u.ru_utime.tv_sec + u.ru_stime.tv_sec) +
+           double(u.ru_utime.tv_usec + u.ru_stime.tv_usec) * 1e-6;
+}
+
+// The window on a copy of the demo project, with a reference picture for every frame.
+Gnome* OpenWindow() {
+    static Gnome* gnome = [] {
+        std::string dir = fs::temp_directory_path() / ("chirrup-bench-" + std::to_string(getpid()));
+        std::string demo = std::string(CHIRRUP_SOURCE_DIR) + "/resources/demo";
+        for (const char* sub : {"misc_data", "wire", "pix"}) {
+            fs::create_directories(dir + "/" + sub);
+            for (const auto& entry : fs::directory_iterator(demo))
+                fs::copy(entry.path(), dir + "/" + sub + "/" + entry.path().filename().string(),
+                         fs::copy_options::overwrite_existing);
+        }
+        setenv("TESSEL_PROJECT", dir.c_str(), 1);
+        setenv("VX_NOCONFIRM", "1", 1);
+        CuePrefs::Refresh();
+        auto* g = new Gnome;
+        theGhost = g;
+        int argc = 1;
+        char name[] = "chirrup";
+        char* argv[] = {name, nullptr};
+        if (!g->Initialize("chirrup", "Chirrup", widget_spec, &argc, argv,
+                           chirrup_fallback_resources()))
+            return static_cast<Gnome*>(nullptr);
+        XtVaSetValues(KLXmGnome::AppShell(), XtNwidth, 1640, XtNheight, 1000, nullptr);
+        theImp.LoadKeyset((dir + "/misc_data/demo.kset").c_str());
+        theImp.LoadTrack((dir + "/misc_data/demo.track").c_str());
+        // Reference pictures, one per frame of the track.
+        const int frames = int(theImp.duration.Frames()) + 1;
+        theImp.referenceImages = std::make_unique<std::unique_ptr<KLImageSGI>[]>(size_t(frames));
+        for (int i = 0; i < frames; i++) {
+            theImp.referenceImages[size_t(i)] = std::make_unique<KLImageSGI>(160, 121);
+            uint8_t* p = theImp.referenceImages[size_t(i)]->Pixels();
+            for (int k = 0; k < 160 * 121 * 4; k++)
+                p[k] = uint8_t(i * 7 + k);
+        }
+        theImp.referenceCount = frames;
+        theImp.referenceLoaded = 1;
+        g->refViewOn = 1;
+        g->keyViewMode = 2;  // key images
+        g->SetViewStatus();
+        g->SetActiveKeyset(0);
+        return g;
+    }();
+    return gnome;
+}
+
+// One round of the event loop, as the main loop runs it (work procedures included); a short
+// timeout makes sure it returns.
+void OneRound(XtAppContext context) {
+    static bool armed = false;  // one wake-up timeout at a time
+    if (!armed) {
+        armed = true;
+        XtAppAddTimeOut(
+            context, 10, [](XtPointer, XtIntervalId*) { armed = false; }, nullptr);
+    }
+    XtAppProcessEvent(context, XtIMAll);
+}
+
+void BM_PlaybackDisplayRate(benchmark::State& state) {
+    Gnome* g = OpenWindow();
+    if (!g || !g->syncChart)
+        return state.SkipWithError("no display or no window");
+    const char* s = getenv("CHIRRUP_PLAY_SECONDS");
+    const double seconds = s && atof(s) > 0 ? atof(s) : 10.0;
+    XtAppContext context = KLXmGnome::AppContext();
+    for (auto _ : state) {
+        g->repeatMode = 1;
+        g->stopWatch.Reset();
+        const double cpu0 = CpuSeconds(), wall0 = MonotonicSeconds();
+        g->PlayForward();
+        while (MonotonicSeconds() - wall0 < seconds)
+            OneRound(context);
+        const double cpu = CpuSeconds() - cpu0, wall = MonotonicSeconds() - wall0;
+        state.counters["updates_per_s"] = g->stopWatch.FrameRate();
+        state.counters["cpu_percent"] = 100.0 * cpu / wall;
+        state.counters["chart_px"] = double(g->syncChart->geometry.width);
+        g->PlayStop();
+        while (g->playTimer)
+            OneRound(context);
+    }
+}
+BENCHMARK(BM_PlaybackDisplayRate)
+    ->Iterations(1)
+    ->Repetitions(3)
+    ->Unit(benchmark::kSecond)
+    ->UseRealTime();
+
+}  // namespace
+
+BENCHMARK_MAIN();

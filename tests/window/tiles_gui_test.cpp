@@ -1,0 +1,237 @@
+// Keyset tiles and key editing through the main window on the demo project: panels in rows,
+// tile selection by real clicks, keyset switching, the display-style radio group, the value
+// field and the duration prompt through real typing.
+#include <gtest/gtest.h>
+
+#include <X11/keysym.h>
+#include <Xm/SelectioB.h>
+#include <Xm/TextF.h>
+#include <Xm/ToggleB.h>
+#include <Xm/ToggleBG.h>
+#include <Xm/Xm.h>
+
+#include <cstdlib>
+#include <fstream>
+#include <string>
+
+#include "chart/KLSyncChart.h"
+#include "guitest/GuiTest.h"
+#include "model/KLKeyEvent.h"
+#include "model/KLKeySet.h"
+#include "model/KLKeyTrack.h"
+#include "toolkit/KLImageSGI.h"
+#include "toolkit/xm/KLImageButton.h"
+#include "toolkit/xm/KLPrompt.h"
+#include "window/Gnome.h"
+#include "window/WindowTestUtil.h"
+#include "workspace/Imp.h"
+
+namespace {
+
+Widget W(const char* name) {
+    return KLXmGnome::FindWidget(name);
+}
+
+std::string LabelText(Widget w) {
+    XmString s = nullptr;
+    XtVaGetValues(w, XmNlabelString, &s, nullptr);
+    char* text = nullptr;
+    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+    std::string out = text ? text : "";
+    XtFree(text);
+    XmStringFree(s);
+    return out;
+}
+
+std::vector<Widget> Children(Widget w) {
+    WidgetList children = nullptr;
+    Cardinal count = 0;
+    XtVaGetValues(w, XmNchildren, &children, XmNnumChildren, &count, nullptr);
+    return std::vector<Widget>(children, children + count);
+}
+
+// The demo's keysets (mouth with 11 shapes, two brows with 3) and a fourth of 9 shapes,
+// loaded once with 4 tiles per row.
+class TilesTest : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        setenv("SDL_AUDIODRIVER", "dummy", 1);
+        gnome = &windowtest::TheWindow();
+        const std::string project = windowtest::DemoProject();
+        if (theImp.keysetCount != 4) {
+            std::ifstream demo(project + "/misc_data/demo.kset");
+            std::string text((std::istreambuf_iterator<char>(demo)), {});
+            text += "\nbegin shapeset nine jaw 5 0 1\n";
+            for (int i = 0; i < 9; i++)
+                text += "    key s" + std::to_string(i) + " " + std::to_string(i) + "\n";
+            text += "end\n";
+            std::ofstream(project + "/misc_data/nine.kset") << text;
+            Gnome::tilesPerRow = 4;
+            ASSERT_EQ(theImp.LoadKeyset((project + "/misc_data/nine.kset").c_str()), 1);
+            ASSERT_EQ(theImp.keysetCount, 4);
+        }
+        chart = gnome->syncChart;
+        ASSERT_NE(chart, nullptr);
+        gnome->SetActiveKeyset(0);
+    }
+    Gnome* gnome = nullptr;
+    KLSyncChart* chart = nullptr;
+};
+
+TEST_F(TilesTest, PanelsHoldRowsOfTilesWithLabelsAndTheSharedBlankIcon) {
+    Widget box = gnome->tileBoxes[3];
+    ASSERT_NE(box, nullptr);
+    EXPECT_EQ(gnome->tileCount[3], 9);
+    std::vector<int> rows;
+    for (Widget row : Children(box))
+        rows.push_back(int(Children(row).size()));
+    EXPECT_EQ(rows, (std::vector<int>{4, 4, 1}));
+    // Each tile: the button named after the shape, then its label.
+    Widget firstTile = Children(Children(box)[0])[0];
+    auto parts = Children(firstTile);
+    ASSERT_EQ(parts.size(), 2u);
+    EXPECT_STREQ(XtName(parts[0]), "s0");
+    EXPECT_EQ(LabelText(parts[1]), "s0");
+    // Shapes without pictures share one blank 80 x 60 icon.
+    KLImageSGI* blank = gnome->tiles[3][0]->Image();
+    ASSERT_NE(blank, nullptr);
+    EXPECT_EQ(blank->Width(), 80);
+    EXPECT_EQ(blank->Height(), 60);
+    EXPECT_EQ(gnome->tiles[3][8]->Image(), blank);
+}
+
+TEST_F(TilesTest, PressingSelectsOneTileAndASecondPressKeepsIt) {
+    gnome->HighlightKeyframe(-1);
+    EXPECT_EQ(gnome->CurrentKeyShape(), -1);
+    guitest::Click(gnome->tiles[0][1]->GetWidget());
+    ASSERT_TRUE(guitest::WaitFor([&] { return gnome->CurrentKeyShape() == 1; }));
+    // Slower than a double click, so that it is a second single press.
+    guitest::WaitFor([] { return false; }, 0.6);
+    guitest::Click(gnome->tiles[0][1]->GetWidget());
+    guitest::Settle();
+    EXPECT_EQ(gnome->CurrentKeyShape(), 1);
+    guitest::Click(gnome->tiles[0][4]->GetWidget());
+    ASSERT_TRUE(guitest::WaitFor([&] { return gnome->CurrentKeyShape() == 4; }));
+    EXPECT_EQ(gnome->tiles[0][1]->GetState(), 0);
+    gnome->HighlightKeyframe(7);
+    EXPECT_EQ(gnome->CurrentKeyShape(), 7);
+    EXPECT_EQ(gnome->tiles[0][4]->GetState(), 0) << "the old selection is cleared";
+}
+
+TEST_F(TilesTest, DoubleClickAddsAKeyOfThatShapeAtTheIndicator) {
+    KLKeyTrack* track = theImp.GetKeyTrack(0);
+    const CueTime at = CueTime::FromSeconds(1.5);
+    chart->activeKey = nullptr;
+    chart->SetIndicatorTime(at);
+    const CueTime t = chart->GetIndicatorTime();
+    guitest::DoubleClick(gnome->tiles[0][4]->GetWidget());
+    KLKeyEvent* prev = nullptr;
+    KLKeyEvent* next = nullptr;
+    ASSERT_TRUE(guitest::WaitFor([&] {
+        track->bracket_keys_from_time(t, &prev, &next);
+        return prev && prev->time == t;
+    }));
+    EXPECT_EQ(prev->shapeIndex, 4);
+    EXPECT_EQ(gnome->CurrentKeyShape(), 4);
+}
+
+TEST_F(TilesTest, TheKeysetMenuSwitchesChartTitleAndPanel) {
+    ASSERT_NE(gnome->keysetMenuEntries[1], nullptr);
+    XtCallCallbacks(gnome->keysetMenuEntries[1], XmNvalueChangedCallback, nullptr);
+    EXPECT_EQ(gnome->GetActiveKeyset(), 1);
+    EXPECT_EQ(chart->keyTrack, theImp.GetKeyTrack(1));
+    EXPECT_EQ(LabelText(W("infoKeysetTitle")), "brow_L");
+    EXPECT_EQ(LabelText(W("keyVuLabel")), "brow_L:");
+    EXPECT_TRUE(XtIsManaged(gnome->tileBoxes[1]));
+    EXPECT_FALSE(XtIsManaged(gnome->tileBoxes[0]));
+    EXPECT_NE(gnome->tileBoxes[0], nullptr) << "other panels stay built";
+    EXPECT_TRUE(XmToggleButtonGetState(gnome->keysetMenuEntries[1]));
+    EXPECT_FALSE(XmToggleButtonGetState(gnome->keysetMenuEntries[0]));
+}
+
+TEST_F(TilesTest, DisplayStylesAreARadioGroup) {
+    const char* names[] = {"midpoint", "keyframe", "dissolve"};
+    for (int pick : {2, 1, 1, 0}) {
+        XmToggleButtonGadgetSetState(W(names[pick]), pick != 1, False);  // a click toggles
+        XtCallCallbacks(W(names[pick]), XmNvalueChangedCallback, nullptr);
+        EXPECT_EQ(gnome->displayStyle, pick);
+        for (int i = 0; i < 3; i++)
+            EXPECT_EQ(bool(XmToggleButtonGadgetGetState(W(names[i]))), i == pick) << names[i];
+    }
+}
+
+// Types into the value field with real keys: select all, the text, Return.
+void TypeValue(const std::string& text) {
+    Widget field = W("valTypein");
+    XmTextFieldSetString(field, const_cast<char*>(""));
+    guitest::Click(field);
+    for (char c : text)
+        if (c == '-')
+            guitest::TypeKey(XK_minus);
+        else
+            guitest::TypeText(std::string(1, c));
+    guitest::TypeKey(XK_Return);
+    guitest::Settle();
+}
+
+TEST_F(TilesTest, TheValueFieldSetsTheActiveKeyOnlyForOneFiniteNumber) {
+    KLKeyTrack* track = theImp.GetKeyTrack(0);
+    KLKeyEvent* key = track->InsertKey(1, CueTime::FromSeconds(2.2), nullptr, 1, 1.0f);
+    ASSERT_NE(key, nullptr);
+    // The key at the indicator is the chart's active key.
+    chart->SetIndicatorTime(key->time);
+    chart->UpdateDisplay();
+    ASSERT_EQ(chart->activeKey, key);
+    gnome->ActivateKeyValue(1);
+    EXPECT_TRUE(XtIsSensitive(W("valTypein")));
+    TypeValue("1.5");
+    EXPECT_FLOAT_EQ(key->value, 1.5f);
+    for (const char* ignored : {"word", "", "nan", "1e40"}) {
+        TypeValue(ignored);
+        EXPECT_FLOAT_EQ(key->value, 1.5f) << '"' << ignored << '"';
+    }
+    TypeValue("-3");
+    EXPECT_FLOAT_EQ(key->value, -3.0f);
+    chart->SetIndicatorTime(CueTime::FromSeconds(3.5));
+    chart->UpdateDisplay();
+    ASSERT_EQ(chart->activeKey, nullptr);
+    TypeValue("0.25");
+    EXPECT_FLOAT_EQ(key->value, -3.0f) << "no active key: nothing";
+    gnome->SetKeyValue(0.125f);
+    char* shown = XmTextFieldGetString(W("valTypein"));
+    EXPECT_STREQ(shown, "0.125");
+    XtFree(shown);
+    gnome->ActivateKeyValue(0);
+    EXPECT_FALSE(XtIsSensitive(W("valLabel")));
+    gnome->ActivateKeyValue(1);
+}
+
+TEST_F(TilesTest, TheDurationButtonAsksForANewDuration) {
+    Widget dialog = gnome->prompt->GetDialog();
+    Widget text = XmSelectionBoxGetChild(dialog, XmDIALOG_TEXT);
+    Widget ok = XmSelectionBoxGetChild(dialog, XmDIALOG_OK_BUTTON);
+    std::string question;
+    windowtest::AnswerScript answers({[&] {
+        if (!windowtest::Viewable(ok))
+            return false;
+        XmString s = nullptr;
+        XtVaGetValues(dialog, XmNselectionLabelString, &s, nullptr);
+        char* q = nullptr;
+        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &q);
+        question = q ? q : "";
+        XtFree(q);
+        XmStringFree(s);
+        XmTextFieldSetString(text, const_cast<char*>(""));
+        guitest::Click(text);
+        guitest::TypeText("450");
+        guitest::Click(ok);
+        return true;
+    }});
+    guitest::Click(W("infoDurationValue"));
+    ASSERT_TRUE(guitest::WaitFor([&] { return answers.Finished(); }, 10));
+    guitest::Settle();
+    EXPECT_EQ(question, "Enter New Duration:");
+    EXPECT_EQ(theImp.requestedDuration, CueTime::FromFrames(450));
+}
+
+}  // namespace
