@@ -181,6 +181,29 @@ TEST_F(ChartDraw, ZoomButtonsAndPanBarMoveTheVisiblePart) {
         [this] { return chart->geometry.zoomStart == 0.0f && chart->geometry.zoomEnd == 1.0f; }));
 }
 
+TEST_F(ChartDraw, ActiveKeyAndMarkAreHighlightedAtTheIndicator) {
+    track->InsertKey(1, Seconds(2), keyset->GetKeyShape(1), 1, 1.0f);
+    KLMarkTrack marks;
+    marks.InsertMark(Seconds(4), 'M');
+    chart->SetKeyTrack(track.get());
+    chart->SetMarkTrack(&marks);
+    chart->SetIndicatorTime(Seconds(2) + CueTime::FromFrames(1));  // 2 pixels right of the key
+    chart->UpdateDisplay();
+    ASSERT_NE(chart->activeKey, nullptr);
+    EXPECT_EQ(Pixel(120, 170), chart->keyActiveColor);
+    EXPECT_EQ(chart->activeMark, nullptr);
+    // Moving on to the mark: the key's highlight goes, the mark's letter sits on the colour.
+    chart->SetIndicatorTime(Seconds(4));
+    chart->UpdateDisplay();
+    EXPECT_EQ(chart->activeKey, nullptr);
+    EXPECT_EQ(Pixel(120, 170), chart->keyColor);
+    ASSERT_NE(chart->activeMark, nullptr);
+    int highlighted = 0;
+    for (unsigned long p : window->Pixels(232, 0, 16, 14))
+        highlighted += p == chart->keyActiveColor;
+    EXPECT_GT(highlighted, 20);
+}
+
 TEST_F(ChartDraw, ShrinkingAndGrowingRepaintAtTheNewSize) {
     track->InsertKey(1, Seconds(5), keyset->GetKeyShape(1), 1, 1.0f);
     chart->SetKeyTrack(track.get());
