@@ -51,11 +51,11 @@ struct Fixture {
                 set->keyShapes[size_t(s)]->index = s;
             for (int c = 0; c < kChannels; ++c) {
                 const int slot = k * kChannels + c;  // 300 channels over 100 nodes x 3 axes
-                auto* kc = new KLKeyChannel(("n" + std::to_string(slot / 3)).c_str(), 3 + slot % 3,
-                                            kShapes);
+                auto kc = std::make_unique<KLKeyChannel>(("n" + std::to_string(slot / 3)).c_str(),
+                                                         3 + slot % 3, kShapes);
                 for (int s = 0; s < kShapes; ++s)
                     kc->Set(s, float((s * 7 + c) % 11) * 3.0f);
-                set->keyChannels.push_back(kc);
+                set->AddKeyChannel(std::move(kc));
             }
             auto track = std::make_unique<KLKeyTrack>(set.get());
             for (int e = 0; e < kEvents; ++e)

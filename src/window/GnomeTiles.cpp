@@ -69,7 +69,11 @@ void Gnome::ShowKeySet(int k) {
     update_recognizer_dialogs();
     if (theImp.geometryActive) {
         theImp.PrepareKeyFrames(k);
-        show_scene_in_views();
+#ifdef GNOME_HAS_SCENE_VIEW
+        for (KLSceneView* view : {keyScene, mixScene})
+            if (view)
+                view->SetScene(theImp.scene.get());
+#endif
     }
     ShowKeyframeImage();
 }
