@@ -46,9 +46,9 @@ int main(int argc, char** argv) {
     if (!gnome.Initialize("chirrup", "Chirrup", widget_spec, &xargc, xargv,
                           chirrup_fallback_resources())) {
         theGhost = &ConsoleGhost::Instance();
-        std::cerr << "chirrup: no display to open the window on (is DISPLAY set?); use -B for "
-                     "batch mode."
-                  << std::endl;
+        const char* display = std::getenv("DISPLAY");
+        std::cerr << "chirrup: cannot open the display \"" << (display ? display : "")
+                  << "\" for the window; use -B for batch mode." << std::endl;
         return 1;
     }
     if (line.infile)

@@ -22,9 +22,9 @@ class KLXmGnome {
 
     // Opens the display and creates the application shell (XtOpenApplication) with the given
     // null-terminated fallback resources, which are used only when no app-defaults file of
-    // the class is found. Returns the shell, or null with a message on the error stream when
-    // the display cannot be opened. Runs once per process: a second call returns the shell
-    // of the first (Xt cannot reopen a display after destroying its context).
+    // the class is found. Returns the shell, or null when the display cannot be opened. Runs
+    // once per process: a second call returns the shell of the first (Xt cannot reopen a
+    // display after destroying its context).
     static Widget OpenApplication(const char* appName, const char* appClass, int* argc, char** argv,
                                   const char* const* fallbackResources);
 
