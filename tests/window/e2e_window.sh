@@ -64,13 +64,8 @@ cd "$work"
 "$program" -e "$work/errlog.vx" demo.kset >"$work/out.txt" 2>&1 &
 pid=$!
 
-main=$(wait_window Chirrup)
-# The keyset is loaded by the event loop once the window is up: its name reaches the title.
-for _ in $(seq 200); do
-    grep -q "Reading wire file" "$work/errlog.vx" 2>/dev/null && break
-    kill -0 "$pid" || fail "the program ended: $(cat "$work/out.txt")"
-    timeout 0.1 tail -f /dev/null || true
-done
+# The keyset is loaded once the event loop runs; the title then names the active keyset.
+main=$(wait_window "Chirrup: mouth")
 xdotool mousemove --window "$main" 600 600
 shot e2e-1-demo-keyset
 
