@@ -125,8 +125,24 @@ void Gnome::DisplayTimecode(CueTime t) {
         XFlush(dpy);
 }
 
+void Gnome::chart_follows_workspace(bool withSound) {
+#ifdef GNOME_HAS_CHART
+    if (!syncChart)
+        return;
+    // The mark track first: the chart's drawing reads it, while of the sound it only asks
+    // whether there is one.
+    if (syncChart->markTrack != theImp.markTrack.get())
+        syncChart->SetMarkTrack(theImp.markTrack.get());
+    if (withSound && syncChart->sound != theImp.sound.get())
+        syncChart->SetSound(theImp.sound.get());
+#else
+    (void)withSound;
+#endif
+}
+
 void Gnome::DisplayDuration(CueTime duration) {
 #ifdef GNOME_HAS_CHART
+    chart_follows_workspace();
     if (syncChart)
         syncChart->SetUserDuration(duration);
 #endif
@@ -149,6 +165,7 @@ void Gnome::DisplayReference(CueTime t) {
 }
 
 void Gnome::Inform(const char* message, const char* button) {
+    chart_follows_workspace();  // the alert's event loop may redraw the chart
     std::cerr << (message ? message : "") << std::endl;
     if (attentionAlert)
         attentionAlert->Notify(message, button);
@@ -159,6 +176,7 @@ int Gnome::Confirm(const char* message, const char* yes, const char* no) {
         std::cerr << (message ? message : "") << std::endl << "Assuming OK" << std::endl;
         return 1;
     }
+    chart_follows_workspace();
     return attentionAlert->Confirm(message, yes, no);
 }
 

@@ -1,0 +1,15 @@
+#pragma once
+
+#include "toolkit/CueTime.h"
+
+class ScenePose;
+class KLWireSource;
+
+// What a scene is posed with at a time, besides its own rest animation: the key tracks
+// previewed in the 3D views. The scene calls Pose with its channels at rest; the source sets
+// the channels it drives.
+class KLPoseSource {
+  public:
+    virtual ~KLPoseSource() = default;
+    virtual void Pose(KLWireSource* source, CueTime t, ScenePose* pose) = 0;
+};
