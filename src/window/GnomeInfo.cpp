@@ -15,6 +15,8 @@
 #include <sstream>
 
 #include "dialogs/RefLoadDialog.h"
+#include "model/KLKeyEvent.h"
+#include "model/KLKeyTrack.h"
 #include "toolkit/CuePrefs.h"
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLString.h"
@@ -26,6 +28,10 @@
 #if __has_include("chart/KLSyncChart.h")
 #include "chart/KLSyncChart.h"
 #define GNOME_HAS_CHART 1
+#endif
+#if __has_include("scene/gl/KLSceneView.h")
+#include "scene/gl/KLSceneView.h"
+#define GNOME_HAS_SCENE_VIEW 1
 #endif
 
 namespace {
@@ -201,6 +207,9 @@ int Gnome::AdjustRelLoad(char** prefix, char** ext, int* start, int* end, int* b
     if (!refLoadDialog)
         return 0;
     RefLoadDialog& d = *refLoadDialog;
+    // The sequence shown may be replaced by this load: the view lets go of its pictures.
+    if (refImageView)
+        refImageView->SetImage(nullptr);
     d.SetPrefix(*prefix);
     d.SetExt(*ext);
     d.SetStart(*start);
@@ -298,10 +307,34 @@ void Gnome::set_reference_region_cb(Widget, XtPointer, XtPointer) {
 }
 
 void Gnome::ShowKeyframeImage() {
-    // The key and mix views follow the indicator through GoToTime's view steps.
+    // The key and mix views at the indicator, as GoToTime shows them, without moving the
+    // indicator or the reference view.
 #ifdef GNOME_HAS_CHART
-    if (syncChart)
-        GoToTime(syncChart->GetIndicatorTime());
+    if (!syncChart)
+        return;
+    CueTime t = syncChart->GetIndicatorTime();
+    if (shownKeyset && keyViewOn) {
+        if (keyViewMode == 1 && theImp.geometryActive) {
+#ifdef GNOME_HAS_SCENE_VIEW
+            if (keyScene) {
+                keyScene->time = t;
+                keyScene->Draw();
+            }
+#endif
+        } else if (KLKeyTrack* track = theImp.GetKeyTrack(activeKeyset)) {
+            KLKeyEvent* prev = nullptr;
+            KLKeyEvent* next = nullptr;
+            float fraction = track->bracket_keys_from_time(t, &prev, &next);
+            show_key_images(prev ? prev->key : nullptr, next ? next->key : nullptr,
+                            prev != nullptr, next != nullptr, fraction);
+        }
+    }
+#ifdef GNOME_HAS_SCENE_VIEW
+    if (mixViewOn && theImp.geometryActive && mixScene) {
+        mixScene->time = t;
+        mixScene->Draw();
+    }
+#endif
 #endif
 }
 
