@@ -119,7 +119,17 @@ void Gnome::ShowStatus(const char* message) {
 }
 
 void Gnome::status_hook(const char* message, void* gnome) {
-    static_cast<Gnome*>(gnome)->ShowStatus(message);
+    auto* g = static_cast<Gnome*>(gnome);
+    g->ShowStatus(message);
+    if (!g->statusIdle && AppContext())
+        g->statusIdle = XtAppAddWorkProc(AppContext(), status_idle_workproc, g);
+}
+
+Boolean Gnome::status_idle_workproc(XtPointer gnome) {
+    auto* g = static_cast<Gnome*>(gnome);
+    g->statusIdle = 0;
+    g->ShowStatus("Ready.");
+    return True;
 }
 
 void Gnome::DisplayTimecode(CueTime t) {
