@@ -32,7 +32,10 @@
 namespace fs = std::filesystem;
 
 namespace {
-constexpr int kWidth = 640, kHeight = 480;
+// The views' size: 640 x 480, or CHIRRUP_VIEWS_BENCH_WIDTH x 3/4 of it.
+const int kWidth =
+    getenv("CHIRRUP_VIEWS_BENCH_WIDTH") ? atoi(getenv("CHIRRUP_VIEWS_BENCH_WIDTH")) : 640;
+const int kHeight = kWidth * 3 / 4;
 KLSceneView* views[2] = {nullptr, nullptr};
 std::string keysetPath;
 

@@ -1,6 +1,7 @@
 #include "model/KLTrackPreview.h"
 
 #include <cmath>
+#include <cstdint>
 #include <limits>
 #include <memory>
 
@@ -122,4 +123,13 @@ void KLTrackPreview::Pose(KLWireSource* source, CueTime t, ScenePose* pose) {
             }
         }
     }
+}
+
+long KLTrackPreview::Revision() {
+    long revision = 17;
+    for (KLKeyTrack* track : tracks_ ? tracks_() : std::vector<KLKeyTrack*>()) {
+        const long id = long(reinterpret_cast<uintptr_t>(track) >> 4);
+        revision = revision * 31 + id + (track ? track->previewRevision : 0);
+    }
+    return revision;
 }

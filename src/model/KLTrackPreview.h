@@ -24,6 +24,8 @@ class KLTrackPreview : public KLPoseSource {
     explicit KLTrackPreview(TrackList tracks);
 
     void Pose(KLWireSource* source, CueTime t, ScenePose* pose) override;
+    // From the tracks and their preview revisions.
+    long Revision() override;
     // Number of curve builds so far (one per track change).
     int Builds() const { return builds_; }
 

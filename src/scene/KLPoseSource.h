@@ -12,4 +12,7 @@ class KLPoseSource {
   public:
     virtual ~KLPoseSource() = default;
     virtual void Pose(KLWireSource* source, CueTime t, ScenePose* pose) = 0;
+    // Changes whenever what Pose would give changes (an edit of the animation), so that a
+    // view can tell that it should draw again.
+    virtual long Revision() { return 0; }
 };

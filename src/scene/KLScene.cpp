@@ -29,7 +29,10 @@ void KLScene::LoadGeometry(KLWireSource* source) {
     world_.clear();
     items_.clear();
     hasBox_ = false;
-    ++generation_;
+    // Unique over all scenes of the run: a new scene made where an old one stood must not
+    // pass for it.
+    static int loads = 0;
+    generation_ = ++loads;
     source_ = source;
     if (!source || !source->document()) {
         deformer_->Prepare(geometry_);
@@ -69,6 +72,11 @@ void KLScene::SetRestFrame(double frame) {
         }
     }
     pose_.Reset(rest_);
+}
+
+long KLScene::ContentRevision() const {
+    const long animation = poseSource_ ? poseSource_->Revision() : 0;
+    return (animation * 31 + generation_) * 7 + feedback_;
 }
 
 KLGraphNode* KLScene::FetchNode(const char* name) {

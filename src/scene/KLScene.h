@@ -72,8 +72,12 @@ class KLScene {
     int NodeCount() const { return int(world_.size()); }
     // Messages of the last LoadGeometry (parts left out).
     const std::vector<std::string>& LoadMessages() const { return messages_; }
-    // Grows by one at every LoadGeometry, so that the views know to renew their GL copies.
+    // Changes at every LoadGeometry (unique in the run), so that the views know to renew
+    // their GL copies.
     int Generation() const { return generation_; }
+    // Changes whenever what the views draw changes: the geometry, the feedback style or the
+    // previewed animation.
+    long ContentRevision() const;
 
     int Feedback() const { return feedback_; }
     int TessU() const { return tessU_; }

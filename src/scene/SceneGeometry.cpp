@@ -4,139 +4,13 @@
 #include <cmath>
 #include <cstring>
 
+#include "scene/SceneAccessor.h"
+#include "scene/ScenePrimitiveReader.h"
+
 namespace {
 using Model = tinygltf::Model;
 
 constexpr float kDegrees = float(180.0 / M_PI);
-
-int component_size(int type) {
-    switch (type) {
-        case TINYGLTF_COMPONENT_TYPE_BYTE:
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_BYTE:
-            return 1;
-        case TINYGLTF_COMPONENT_TYPE_SHORT:
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT:
-            return 2;
-        case TINYGLTF_COMPONENT_TYPE_INT:
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT:
-        case TINYGLTF_COMPONENT_TYPE_FLOAT:
-            return 4;
-        default:
-            return 0;
-    }
-}
-
-// One component at `p` as a number; normalised integers are scaled to [0, 1] or [-1, 1].
-double component(const unsigned char* p, int type, bool normalized) {
-    switch (type) {
-        case TINYGLTF_COMPONENT_TYPE_BYTE: {
-            double v = int8_t(p[0]);
-            return normalized ? std::max(v / 127.0, -1.0) : v;
-        }
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_BYTE:
-            return normalized ? p[0] / 255.0 : p[0];
-        case TINYGLTF_COMPONENT_TYPE_SHORT: {
-            int16_t s;
-            std::memcpy(&s, p, 2);
-            return normalized ? std::max(s / 32767.0, -1.0) : s;
-        }
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT: {
-            uint16_t s;
-            std::memcpy(&s, p, 2);
-            return normalized ? s / 65535.0 : s;
-        }
-        case TINYGLTF_COMPONENT_TYPE_INT: {
-            int32_t s;
-            std::memcpy(&s, p, 4);
-            return s;
-        }
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT: {
-            uint32_t s;
-            std::memcpy(&s, p, 4);
-            return s;
-        }
-        default: {
-            float f;
-            std::memcpy(&f, p, 4);
-            return f;
-        }
-    }
-}
-
-// The elements of an accessor (already bounds-checked when the scene was opened) as numbers,
-// `components` per element, with sparse substitutions applied. False when the accessor's
-// element type has another number of components.
-bool read_accessor(const Model& m, int index, int components, std::vector<double>* out) {
-    if (index < 0 || size_t(index) >= m.accessors.size()) {
-        return false;
-    }
-    const tinygltf::Accessor& a = m.accessors[size_t(index)];
-    if (tinygltf::GetNumComponentsInType(uint32_t(a.type)) != components) {
-        return false;
-    }
-    const int csize = component_size(a.componentType);
-    out->assign(a.count * size_t(components), 0.0);
-    if (a.bufferView >= 0) {
-        const tinygltf::BufferView& v = m.bufferViews[size_t(a.bufferView)];
-        const unsigned char* base =
-            m.buffers[size_t(v.buffer)].data.data() + v.byteOffset + a.byteOffset;
-        const size_t elem = size_t(csize) * size_t(components);
-        const size_t stride = v.byteStride ? v.byteStride : elem;
-        for (size_t e = 0; e < a.count; ++e) {
-            for (int c = 0; c < components; ++c) {
-                (*out)[e * size_t(components) + size_t(c)] =
-                    component(base + e * stride + size_t(c * csize), a.componentType, a.normalized);
-            }
-        }
-    }
-    if (a.sparse.isSparse) {
-        const auto& si = a.sparse.indices;
-        const auto& sv = a.sparse.values;
-        const tinygltf::BufferView& iv = m.bufferViews[size_t(si.bufferView)];
-        const tinygltf::BufferView& vv = m.bufferViews[size_t(sv.bufferView)];
-        const unsigned char* ip =
-            m.buffers[size_t(iv.buffer)].data.data() + iv.byteOffset + size_t(si.byteOffset);
-        const unsigned char* vp =
-            m.buffers[size_t(vv.buffer)].data.data() + vv.byteOffset + size_t(sv.byteOffset);
-        const int isize = component_size(si.componentType);
-        for (int k = 0; k < a.sparse.count; ++k) {
-            const double at = component(ip + size_t(k * isize), si.componentType, false);
-            if (at < 0 || at >= double(a.count)) {
-                return false;
-            }
-            for (int c = 0; c < components; ++c) {
-                (*out)[size_t(at) * size_t(components) + size_t(c)] = component(
-                    vp + size_t((k * components + c) * csize), a.componentType, a.normalized);
-            }
-        }
-    }
-    return true;
-}
-
-// As read_accessor, into floats; non-finite values become 0 and are counted in *bad.
-bool read_floats(const Model& m, int index, int components, std::vector<float>* out,
-                 size_t* bad = nullptr) {
-    std::vector<double> values;
-    if (!read_accessor(m, index, components, &values)) {
-        return false;
-    }
-    out->resize(values.size());
-    for (size_t i = 0; i < values.size(); ++i) {
-        float f = float(values[i]);
-        if (!std::isfinite(f)) {
-            f = 0.0f;
-            if (bad) {
-                ++*bad;
-            }
-        }
-        (*out)[i] = f;
-    }
-    return true;
-}
-
-size_t accessor_count(const Model& m, int index) {
-    return index >= 0 && size_t(index) < m.accessors.size() ? m.accessors[size_t(index)].count : 0;
-}
 
 Mat4 rest_local(const tinygltf::Node& n) {
     if (n.matrix.size() == 16) {
@@ -165,201 +39,10 @@ Mat4 rest_local(const tinygltf::Node& n) {
 }
 
 // Turns strips, fans and loops into plain triangles and lines; false for an unknown mode.
-bool to_basic_mode(int mode, std::vector<uint32_t>* idx, int* basic) {
-    std::vector<uint32_t> in;
-    in.swap(*idx);
-    switch (mode) {
-        case TINYGLTF_MODE_POINTS:
-            *basic = ScenePrimitive::kPoints;
-            idx->swap(in);
-            return true;
-        case TINYGLTF_MODE_LINE:
-            *basic = ScenePrimitive::kLines;
-            in.resize(in.size() / 2 * 2);
-            idx->swap(in);
-            return true;
-        case TINYGLTF_MODE_LINE_LOOP:
-        case TINYGLTF_MODE_LINE_STRIP:
-            *basic = ScenePrimitive::kLines;
-            for (size_t i = 0; i + 1 < in.size(); ++i) {
-                idx->insert(idx->end(), {in[i], in[i + 1]});
-            }
-            if (mode == TINYGLTF_MODE_LINE_LOOP && in.size() > 2) {
-                idx->insert(idx->end(), {in.back(), in.front()});
-            }
-            return true;
-        case TINYGLTF_MODE_TRIANGLES:
-            *basic = ScenePrimitive::kTriangles;
-            in.resize(in.size() / 3 * 3);
-            idx->swap(in);
-            return true;
-        case TINYGLTF_MODE_TRIANGLE_STRIP:
-            *basic = ScenePrimitive::kTriangles;
-            for (size_t i = 0; i + 2 < in.size(); ++i) {
-                if (i % 2 == 0) {
-                    idx->insert(idx->end(), {in[i], in[i + 1], in[i + 2]});
-                } else {
-                    idx->insert(idx->end(), {in[i + 1], in[i], in[i + 2]});
-                }
-            }
-            return true;
-        case TINYGLTF_MODE_TRIANGLE_FAN:
-            *basic = ScenePrimitive::kTriangles;
-            for (size_t i = 1; i + 1 < in.size(); ++i) {
-                idx->insert(idx->end(), {in[0], in[i], in[i + 1]});
-            }
-            return true;
-        default:
-            return false;
-    }
-}
-
-// Vertex normals from the area-weighted normals of the triangles around each vertex.
-void face_normals(ScenePrimitive* p) {
-    p->normals.assign(p->positions.size(), 0.0f);
-    if (p->mode != ScenePrimitive::kTriangles) {
-        for (size_t v = 0; v < p->VertexCount(); ++v) {
-            p->normals[v * 3 + 2] = 1.0f;
-        }
-        return;
-    }
-    const float* pos = p->positions.data();
-    for (size_t t = 0; t + 2 < p->indices.size(); t += 3) {
-        const uint32_t a = p->indices[t], b = p->indices[t + 1], c = p->indices[t + 2];
-        Vec3 pa(pos[a * 3], pos[a * 3 + 1], pos[a * 3 + 2]);
-        Vec3 pb(pos[b * 3], pos[b * 3 + 1], pos[b * 3 + 2]);
-        Vec3 pc(pos[c * 3], pos[c * 3 + 1], pos[c * 3 + 2]);
-        Vec3 n = (pb - pa).Cross(pc - pa);
-        for (uint32_t v : {a, b, c}) {
-            p->normals[v * 3] += n.x;
-            p->normals[v * 3 + 1] += n.y;
-            p->normals[v * 3 + 2] += n.z;
-        }
-    }
-    for (size_t v = 0; v < p->VertexCount(); ++v) {
-        Vec3 n(p->normals[v * 3], p->normals[v * 3 + 1], p->normals[v * 3 + 2]);
-        n = n.Length() > 0 ? n.Normalized() : Vec3(0, 0, 1);
-        std::memcpy(&p->normals[v * 3], &n, sizeof(float) * 3);
-    }
-}
-
 std::string item(const char* what, size_t i) {
     return std::string(what) + " " + std::to_string(i);
 }
 }  // namespace
-
-// Reads one primitive; false with a message when it cannot be drawn.
-static bool read_primitive(const Model& m, const tinygltf::Primitive& in, ScenePrimitive* out,
-                           std::string* why) {
-    auto pos = in.attributes.find("POSITION");
-    if (pos == in.attributes.end()) {
-        *why = "has no vertex positions";
-        return false;
-    }
-    const size_t count = accessor_count(m, pos->second);
-    if (count == 0) {
-        *why = "has no vertices";
-        return false;
-    }
-    if (count > SceneGeometry::kMaxVertices) {
-        *why = "has " + std::to_string(count) + " vertices, more than the " +
-               std::to_string(SceneGeometry::kMaxVertices) + " a view draws";
-        return false;
-    }
-    size_t bad = 0;
-    if (!read_floats(m, pos->second, 3, &out->positions, &bad)) {
-        *why = "has vertex positions that are not 3D vectors";
-        return false;
-    }
-    if (bad) {
-        *why = "has " + std::to_string(bad) + " non-finite vertex coordinates";
-        return false;
-    }
-    std::vector<uint32_t> idx;
-    if (in.indices >= 0) {
-        std::vector<double> raw;
-        if (!read_accessor(m, in.indices, 1, &raw)) {
-            *why = "has vertex indices that are not scalars";
-            return false;
-        }
-        idx.reserve(raw.size());
-        for (double d : raw) {
-            if (!(d >= 0 && d < double(count))) {
-                *why = "has a vertex index out of range";
-                return false;
-            }
-            idx.push_back(uint32_t(d));
-        }
-    } else {
-        idx.resize(count);
-        for (size_t i = 0; i < count; ++i) {
-            idx[i] = uint32_t(i);
-        }
-    }
-    if (!to_basic_mode(in.mode < 0 ? TINYGLTF_MODE_TRIANGLES : in.mode, &idx, &out->mode)) {
-        *why = "has an unknown drawing mode " + std::to_string(in.mode);
-        return false;
-    }
-    out->indices.swap(idx);
-    out->material = in.material;
-
-    auto normal = in.attributes.find("NORMAL");
-    if (normal == in.attributes.end() || accessor_count(m, normal->second) != count ||
-        !read_floats(m, normal->second, 3, &out->normals)) {
-        face_normals(out);
-    }
-    auto uv = in.attributes.find("TEXCOORD_0");
-    if (uv != in.attributes.end() && accessor_count(m, uv->second) == count) {
-        read_floats(m, uv->second, 2, &out->texcoords);
-    }
-    auto joints = in.attributes.find("JOINTS_0");
-    auto weights = in.attributes.find("WEIGHTS_0");
-    if (joints != in.attributes.end() && weights != in.attributes.end() &&
-        accessor_count(m, joints->second) == count && accessor_count(m, weights->second) == count) {
-        std::vector<double> j;
-        if (read_accessor(m, joints->second, 4, &j) &&
-            read_floats(m, weights->second, 4, &out->weights)) {
-            out->joints.resize(j.size());
-            for (size_t k = 0; k < j.size(); ++k) {
-                const bool ok = j[k] >= 0 && j[k] < 65536.0;
-                out->joints[k] = ok ? uint16_t(j[k]) : 0;
-                if (!ok || out->weights[k] < 0) {
-                    out->weights[k] = 0;
-                }
-            }
-        } else {
-            out->weights.clear();
-        }
-    }
-    for (size_t t = 0; t < in.targets.size(); ++t) {
-        SceneMorphTarget target;
-        auto dp = in.targets[t].find("POSITION");
-        std::vector<float> d, dn;
-        if (dp != in.targets[t].end() && accessor_count(m, dp->second) == count) {
-            read_floats(m, dp->second, 3, &d);
-        }
-        auto dnormal = in.targets[t].find("NORMAL");
-        if (dnormal != in.targets[t].end() && accessor_count(m, dnormal->second) == count) {
-            read_floats(m, dnormal->second, 3, &dn);
-        }
-        for (size_t v = 0; v < count && (!d.empty() || !dn.empty()); ++v) {
-            const float* p = d.empty() ? nullptr : &d[v * 3];
-            const float* n = dn.empty() ? nullptr : &dn[v * 3];
-            const bool moves = (p && (p[0] != 0 || p[1] != 0 || p[2] != 0)) ||
-                               (n && (n[0] != 0 || n[1] != 0 || n[2] != 0));
-            if (!moves) {
-                continue;
-            }
-            target.vertices.push_back(uint32_t(v));
-            target.positionDeltas.insert(target.positionDeltas.end(),
-                                         {p ? p[0] : 0, p ? p[1] : 0, p ? p[2] : 0});
-            target.normalDeltas.insert(target.normalDeltas.end(),
-                                       {n ? n[0] : 0, n ? n[1] : 0, n ? n[2] : 0});
-        }
-        out->targets.push_back(std::move(target));
-    }
-    return true;
-}
 
 void SceneGeometry::Load(const tinygltf::Model& m, std::vector<std::string>* messages) {
     *this = SceneGeometry();
@@ -434,7 +117,7 @@ void SceneGeometry::Load(const tinygltf::Model& m, std::vector<std::string>* mes
         for (size_t p = 0; p < in.primitives.size(); ++p) {
             ScenePrimitive prim;
             std::string why;
-            if (!read_primitive(m, in.primitives[p], &prim, &why)) {
+            if (!ScenePrimitiveReader::Read(m, in.primitives[p], &prim, &why)) {
                 say(item("mesh", i) + " (" + in.name + ") part " + std::to_string(p) + " " + why +
                     "; it is not drawn");
                 continue;
@@ -459,7 +142,8 @@ void SceneGeometry::Load(const tinygltf::Model& m, std::vector<std::string>* mes
         const int ibm = m.skins[s].inverseBindMatrices;
         std::vector<float> mats;
         if (ibm >= 0) {
-            if (read_floats(m, ibm, 16, &mats) && mats.size() >= skin.joints.size() * 16) {
+            if (SceneAccessor::ReadFloats(m, ibm, 16, &mats) &&
+                mats.size() >= skin.joints.size() * 16) {
                 for (size_t j = 0; j < skin.joints.size(); ++j) {
                     std::memcpy(skin.inverseBind[j].m, &mats[j * 16], sizeof(float) * 16);
                 }
@@ -554,9 +238,9 @@ void SceneGeometry::Load(const tinygltf::Model& m, std::vector<std::string>* mes
             track.node = ch.target_node;
             track.step = sampler.interpolation == "STEP";
             if (known || sampler.interpolation == "CUBICSPLINE" ||
-                !read_floats(m, sampler.input, 1, &track.times) ||
-                !read_floats(m, sampler.output, 1, &track.values) || track.times.empty() ||
-                track.values.size() % track.times.size() != 0) {
+                !SceneAccessor::ReadFloats(m, sampler.input, 1, &track.times) ||
+                !SceneAccessor::ReadFloats(m, sampler.output, 1, &track.values) ||
+                track.times.empty() || track.values.size() % track.times.size() != 0) {
                 continue;
             }
             weightTracks_.push_back(std::move(track));

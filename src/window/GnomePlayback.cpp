@@ -246,7 +246,7 @@ void Gnome::PlayForwardSave() {
     syncChart->GetRegionRange(start, end);
     const int frames = std::max(0, PlaybackPass::RegionFrames(start, end));
     // The playblast table: one picture per frame, filled as the mix view draws each frame.
-    // The reference view lets go of the pictures of the table it replaces first.
+    // The reference view lets go of the old table's picture first.
     if (refImageView)
         refImageView->SetImage(nullptr);
     theImp.playblastImages = std::make_unique<std::unique_ptr<KLImageSGI>[]>(size_t(frames));

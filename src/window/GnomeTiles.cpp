@@ -223,8 +223,11 @@ void Gnome::ClearKeysets(int index) {
 
 void Gnome::ClearKeyTracks() {
     halt_playback();
-    if (syncChart)
+    // The workspace replaces its mark track next: the chart must not draw the old one.
+    if (syncChart) {
         syncChart->SetKeyTrack(nullptr);
+        syncChart->SetMarkTrack(nullptr);
+    }
 }
 
 void Gnome::InitSound(CueSound* sound) {

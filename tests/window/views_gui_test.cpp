@@ -308,8 +308,51 @@ TEST_F(ViewsTest, PlayblastFramesAreTheMixViewsFrames) {
     mouth->RemoveKey(CueTime::FromFrames(10));
     mouth->RemoveKey(CueTime::FromFrames(12));
     theImp.PrepareKeyFrames(-1);
-    theImp.DeletePlayblast();
     Gnome::toggle_ref_view_cb(nullptr, XtPointer(0), nullptr);
+    gnome->DisplayReference(start);  // lets go of the playblast picture
+    theImp.DeletePlayblast();
+}
+
+}  // namespace
+
+namespace {
+
+// A key edited on the active track shows in both views at once, without a call to draw.
+TEST_F(ViewsTest, EditedKeysRedrawBothViews) {
+    for (KLSceneView* view : {gnome->keyScene, gnome->mixScene})
+        view->time = CueTime::FromFrames(5);
+    guitest::Settle();
+    const int key = gnome->keyScene->Draws(), mix = gnome->mixScene->Draws();
+    KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
+    mouth->InsertKey(2, CueTime::FromFrames(5), gnome->shownKeyset->GetKeyShape(2),
+                     KLKeyEvent::kLinear, 1.0f);
+    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
+    EXPECT_TRUE(guitest::WaitFor(
+        [&] { return gnome->keyScene->Draws() > key && gnome->mixScene->Draws() > mix; }));
+    mouth->RemoveKey(CueTime::FromFrames(5));
+    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
+}
+
+}  // namespace
+
+namespace {
+
+// Loaded without geometry, the views get no scene and no key-shape pictures are grabbed;
+// loaded with it again, both come back.
+TEST_F(ViewsTest, WithoutGeometryTheViewsStayEmpty) {
+    const std::string kset = windowtest::DemoProject() + "/misc_data/demo.kset";
+    theImp.loadGeometry = 0;
+    ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);
+    EXPECT_EQ(theImp.geometryActive, 0);
+    EXPECT_EQ(gnome->keyScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->mixScene->GetScene(), nullptr);
+    ASSERT_TRUE(gnome->shownKeyset);
+    gnome->MakeKeysetImages();
+    EXPECT_FALSE(gnome->shownKeyset->GetKeyShape(1)->image) << "nothing grabbed";
+    theImp.loadGeometry = 1;
+    ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);
+    EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
+    EXPECT_TRUE(gnome->shownKeyset->GetKeyShape(1)->image);
 }
 
 }  // namespace

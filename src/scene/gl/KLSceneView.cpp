@@ -16,6 +16,9 @@ int kVisualAttributes[] = {
     GLX_RGBA, GLX_DOUBLEBUFFER, GLX_RED_SIZE, 1,   GLX_GREEN_SIZE, 1, GLX_BLUE_SIZE,
     1,        GLX_DEPTH_SIZE,   16,           None};
 
+// How often a view looks whether its scene changed.
+constexpr unsigned long kWatchMilliseconds = 50;
+
 // The context the first view made; later views share its textures and buffers.
 GLXContext sharedContext = nullptr;
 
@@ -68,9 +71,14 @@ KLSceneView::KLSceneView(Widget parent, const char* name, ArgList args, Cardinal
                                Cardinal(all.size()));
     }
     attach_widget(area_);
+    watch_ =
+        XtAppAddTimeOut(XtWidgetToApplicationContext(area_), kWatchMilliseconds, watch_cb, this);
 }
 
 KLSceneView::~KLSceneView() {
+    if (watch_) {
+        XtRemoveTimeOut(watch_);
+    }
     if (context_) {
         Display* display = XtDisplay(area_);
         if (glXGetCurrentContext() == static_cast<GLXContext>(context_)) {
@@ -98,6 +106,16 @@ void KLSceneView::expose_cb(Widget, XtPointer clientData, XtPointer) {
 void KLSceneView::resize_cb(Widget, XtPointer clientData, XtPointer) {
     auto* view = static_cast<KLSceneView*>(clientData);
     if (XtIsRealized(view->area_)) {
+        view->Draw();
+    }
+}
+
+void KLSceneView::watch_cb(XtPointer clientData, XtIntervalId*) {
+    auto* view = static_cast<KLSceneView*>(clientData);
+    view->watch_ = XtAppAddTimeOut(XtWidgetToApplicationContext(view->area_), kWatchMilliseconds,
+                                   watch_cb, view);
+    if (view->scene_ && !view->playing && view->context_ && XtIsRealized(view->area_) &&
+        XtIsManaged(view->area_) && view->scene_->ContentRevision() != view->drawnRevision_) {
         view->Draw();
     }
 }
@@ -186,6 +204,7 @@ void KLSceneView::Draw() {
     XtVaGetValues(area_, XmNwidth, &width, XmNheight, &height, nullptr);
     if (scene_) {
         evaluate();
+        drawnRevision_ = scene_->ContentRevision();
     }
     render(width, height);
     glXSwapBuffers(XtDisplay(area_), XtWindow(area_));

@@ -20,6 +20,9 @@ class SceneRenderer;
 // drag's anchor). A view may keep a stored camera: LookAt returns to it when there is one,
 // and otherwise frames the scene's bounding box at the view's time.
 //
+// A view on screen that is not playing draws again by itself, within a twentieth of a
+// second, when its scene's content changes (a key edited, the feedback style changed).
+//
 // When the display offers no direct-rendering GLX visual the view says so once on the error
 // stream and stays blank; every operation is then harmless.
 class KLSceneView : public KLFiend {
@@ -78,6 +81,8 @@ class KLSceneView : public KLFiend {
     static void ginit_cb(Widget w, XtPointer clientData, XtPointer callData);
     static void expose_cb(Widget w, XtPointer clientData, XtPointer callData);
     static void resize_cb(Widget w, XtPointer clientData, XtPointer callData);
+    // Every 50 ms: draws again when the scene's content changed since the last draw.
+    static void watch_cb(XtPointer clientData, XtIntervalId* id);
 
     void init_gl();
     bool make_current();
@@ -97,5 +102,7 @@ class KLSceneView : public KLFiend {
     void* hookData_ = nullptr;
     int dragsEnded_ = 0;
     int draws_ = 0;
+    long drawnRevision_ = 0;
+    XtIntervalId watch_ = 0;
     bool framed_ = false;
 };
