@@ -335,8 +335,8 @@ void Gnome::ShowKeyframeImage() {
             KLKeyEvent* prev = nullptr;
             KLKeyEvent* next = nullptr;
             float fraction = track->bracket_keys_from_time(t, &prev, &next);
-            show_key_images(prev ? prev->key : nullptr, next ? next->key : nullptr,
-                            prev != nullptr, next != nullptr, fraction);
+            show_key_images(prev ? prev->key : nullptr, next ? next->key : nullptr, prev != nullptr,
+                            next != nullptr, fraction);
         }
     }
 #ifdef GNOME_HAS_SCENE_VIEW
