@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 
 #include <Xm/MessageB.h>
+#include <Xm/TextF.h>
 #include <Xm/Xm.h>
 
 #include <filesystem>
@@ -11,7 +12,9 @@
 
 #include "guitest/GuiTest.h"
 #include "toolkit/KLErrHandler.h"
+#include "toolkit/KLString.h"
 #include "toolkit/xm/KLAlert.h"
+#include "toolkit/xm/KLImageView.h"
 #include "window/Gnome.h"
 #include "window/WindowTestUtil.h"
 #include "workspace/Imp.h"
@@ -141,6 +144,35 @@ TEST_F(InfoTest, ErrorFlagTurnsSolidOnALoggedErrorAndClearsWhenTheLogIsViewed) {
     EXPECT_NE(log.find("Something went wrong in a test."), std::string::npos);
     EXPECT_NE(log.find("\n---------------------------------------\n"), std::string::npos);
     fs::remove_all(dir);
+}
+
+TEST_F(InfoTest, AdjustRelLoadFillsTheDialogAndCopiesBackTheAnswer) {
+    char* prefix = KLNewString("shots/take.");
+    char* ext = KLNewString("png");
+    int start = 1, end = 24, by = 1, zoom = 2;
+    Widget ok = KLXmGnome::FindWidget("refLoadOk");
+    windowtest::AnswerScript script({[&] {
+        if (!windowtest::Viewable(ok))
+            return false;
+        guitest::Settle();
+        XmTextFieldSetString(KLXmGnome::FindWidget("refPrefix"), const_cast<char*>("pix/ref."));
+        XmTextFieldSetString(KLXmGnome::FindWidget("refEnd"), const_cast<char*>("48"));
+        XmTextFieldSetString(KLXmGnome::FindWidget("refBy"), const_cast<char*>("3"));
+        guitest::Settle();
+        guitest::Screenshot("window-reference-dialog");
+        return windowtest::ClickWhenViewable(ok);
+    }});
+    EXPECT_EQ(gnome->AdjustRelLoad(&prefix, &ext, &start, &end, &by, &zoom), 1);
+    EXPECT_TRUE(script.Finished());
+    EXPECT_STREQ(prefix, "pix/ref.");
+    EXPECT_STREQ(ext, "png");
+    EXPECT_EQ(start, 1);
+    EXPECT_EQ(end, 48);
+    EXPECT_EQ(by, 1);
+    EXPECT_EQ(zoom, 3);
+    EXPECT_EQ(gnome->refImageView->Zoom(), 3);
+    delete[] prefix;
+    delete[] ext;
 }
 
 TEST_F(InfoTest, StatusReportsShowInTheStatusLine) {
