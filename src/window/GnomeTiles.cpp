@@ -227,12 +227,9 @@ void Gnome::ClearKeyTracks() {
 
 void Gnome::InitSound(CueSound* sound) {
     halt_playback();
-    if (syncChart) {
-        // A track load replaces the mark track before the sound: the chart must not draw
-        // the old one while it takes the new sound.
-        syncChart->SetMarkTrack(theImp.markTrack.get());
+    chart_follows_workspace(false);
+    if (syncChart)
         syncChart->SetSound(sound);
-    }
 }
 
 void Gnome::InitMarkTrack(KLMarkTrack* track) {

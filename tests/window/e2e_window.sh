@@ -20,7 +20,13 @@ cleanup() {
 }
 trap cleanup EXIT
 
-fail() { echo "e2e: $*" >&2; import -window root "$shots/e2e-failure.png" || true; exit 1; }
+fail() {
+    echo "e2e: $*" >&2
+    echo "e2e: the program said:" >&2
+    cat "$work/out.txt" >&2 || true
+    import -window root "$shots/e2e-failure.png" || true
+    exit 1
+}
 # A screenshot once the screen has stopped changing (two grabs in a row the same).
 shot() {
     import -window root "$work/a.png"
@@ -64,13 +70,8 @@ cd "$work"
 "$program" -e "$work/errlog.vx" demo.kset >"$work/out.txt" 2>&1 &
 pid=$!
 
-main=$(wait_window Chirrup)
-# The keyset is loaded by the event loop once the window is up: its name reaches the title.
-for _ in $(seq 200); do
-    grep -q "Reading wire file" "$work/errlog.vx" 2>/dev/null && break
-    kill -0 "$pid" || fail "the program ended: $(cat "$work/out.txt")"
-    timeout 0.1 tail -f /dev/null || true
-done
+# The keyset is loaded once the event loop runs; the title then names the active keyset.
+main=$(wait_window "Chirrup: mouth")
 xdotool mousemove --window "$main" 600 600
 shot e2e-1-demo-keyset
 
@@ -80,6 +81,7 @@ browser=$(wait_window "Open Track")
 shot e2e-2-open-track-browser
 choose "$browser" "$work/project/misc_data/demo.track"
 wait_gone "Open Track"
+kill -0 "$pid" 2>/dev/null || fail "the program ended while opening the track"
 xdotool mousemove --window "$main" 600 600
 shot e2e-3-track-opened
 

@@ -123,6 +123,13 @@ TEST_F(ProgramTest, MissingArgumentsAreToldExactlyAndEndWithTheirStatus) {
         EXPECT_EQ(r.err, err) << args.back();
         EXPECT_EQ(r.out, "");
     }
+    // Without a display the window cannot open: said plainly, status 1, nothing else done.
+    const RunResult r = Run({"-nogeom", "-a", "x.kset"}, {{"DISPLAY", std::nullopt}});
+    EXPECT_EQ(r.status, 1);
+    EXPECT_EQ(r.err,
+              "chirrup: cannot open the display \"\".\n"
+              "chirrup: no display to open the window on; use -B for batch mode.\n");
+    EXPECT_FALSE(FileExists(dir / "work/_m.keyset"));
 }
 
 // The track's key at frame 30 lands at 30 / fps seconds in the stored scene. The key shapes
