@@ -264,6 +264,11 @@ class RatioReporter : public benchmark::ConsoleReporter {
 }  // namespace
 
 int main(int argc, char** argv) {
+    // "scene_bench --write-scene PATH" only writes the benchmark scene to PATH (for
+    // bench/batch-memory.sh).
+    if (argc == 3 && std::string(argv[1]) == "--write-scene") {
+        return std::rename(scene_path().c_str(), argv[2]) == 0 ? 0 : 1;
+    }
     benchmark::Initialize(&argc, argv);
     std::printf("scene file: %s (%.1f MB)\n", scene_path().c_str(), [] {
         FILE* f = std::fopen(scene_path().c_str(), "rb");

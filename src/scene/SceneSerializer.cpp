@@ -1,6 +1,11 @@
 #include "scene/SceneSerializer.h"
 
+#include <unistd.h>
+
 #include <cctype>
+#include <cstdint>
+#include <cstdio>
+#include <sstream>
 #include <vector>
 
 #include "toolkit/SafeFile.h"
@@ -17,6 +22,89 @@ bool write_image_bytes(const std::string*, const std::string*, const tinygltf::I
     return true;
 }
 
+// A JSON string literal of `text`.
+std::string json_string(const std::string& text) {
+    std::string out = "\"";
+    for (unsigned char c : text) {
+        if (c == '"' || c == '\\') {
+            out += '\\';
+            out += char(c);
+        } else if (c < 0x20) {
+            char escaped[8];
+            std::snprintf(escaped, sizeof escaped, "\\u%04x", c);
+            out += escaped;
+        } else {
+            out += char(c);
+        }
+    }
+    return out + "\"";
+}
+
+void put_u32(std::ostream& out, uint32_t v) {
+    const char bytes[4] = {char(v & 0xFF), char(v >> 8 & 0xFF), char(v >> 16 & 0xFF),
+                           char(v >> 24 & 0xFF)};
+    out.write(bytes, 4);
+}
+
+// Writes a .glb whose binary chunk is buffer 0, straight from the model: the JSON comes from
+// the serialiser with buffer 0 emptied and marked, and the marked buffer's object is then
+// replaced by its real length. False when the model does not allow it (the caller then lets
+// the serialiser write the whole container).
+bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, std::ostream& out) {
+    if (model->buffers.empty() || model->buffers[0].data.empty() ||
+        !model->buffers[0].uri.empty() || model->buffers[0].extras.Type() != tinygltf::NULL_TYPE ||
+        model->buffers[0].data.size() > 0xFFFFFFF0u) {
+        return false;
+    }
+    tinygltf::Buffer& first = model->buffers[0];
+    const std::string marker = "chirrup binary chunk " + std::to_string(::getpid()) + " " +
+                               std::to_string(reinterpret_cast<uintptr_t>(&first));
+    std::vector<unsigned char> bin;
+    bin.swap(first.data);
+    std::string name = marker;
+    name.swap(first.name);
+    std::ostringstream text;
+    bool ok = writer->WriteGltfSceneToStream(model, text, false, false);
+    bin.swap(first.data);
+    name.swap(first.name);
+    std::string json = text.str();
+    const std::string quoted = json_string(marker);
+    size_t at = json.find(quoted);
+    if (!ok || at == std::string::npos || json.find(quoted, at + 1) != std::string::npos) {
+        return false;
+    }
+    size_t start = json.rfind('{', at), end = json.find('}', at);
+    if (start == std::string::npos || end == std::string::npos) {
+        return false;
+    }
+    std::string object = "{\"byteLength\":" + std::to_string(first.data.size());
+    if (!first.name.empty()) {
+        object += ",\"name\":" + json_string(first.name);
+    }
+    json.replace(start, end + 1 - start, object + "}");
+    while (!json.empty() && (json.back() == '\n' || json.back() == ' ')) {
+        json.pop_back();
+    }
+    json.resize((json.size() + 3) & ~size_t(3), ' ');
+    size_t binLength = (first.data.size() + 3) & ~size_t(3);
+    uint64_t total = 12 + 8 + json.size() + 8 + binLength;
+    if (total > 0xFFFFFFFFu) {
+        return false;
+    }
+    out.write("glTF", 4);
+    put_u32(out, 2);
+    put_u32(out, uint32_t(total));
+    put_u32(out, uint32_t(json.size()));
+    put_u32(out, 0x4E4F534A);  // "JSON"
+    out.write(json.data(), std::streamsize(json.size()));
+    put_u32(out, uint32_t(binLength));
+    put_u32(out, 0x004E4942);  // "BIN"
+    out.write(reinterpret_cast<const char*>(first.data.data()), std::streamsize(first.data.size()));
+    static const char kZeros[4] = {0, 0, 0, 0};
+    out.write(kZeros, std::streamsize(binLength - first.data.size()));
+    return true;
+}
+
 // Serialises `model` through a SafeFile: `path` is either the old file or the whole new one.
 bool write_safely(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binary,
                   const std::string& path, std::string* error) {
@@ -25,7 +113,8 @@ bool write_safely(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binar
         *error = "Cannot write scene file [" + path + "]: " + file.ErrorText();
         return false;
     }
-    if (!writer->WriteGltfSceneToStream(model, file.Stream(), !binary, binary)) {
+    bool written = binary && write_glb_direct(writer, model, file.Stream());
+    if (!written && !writer->WriteGltfSceneToStream(model, file.Stream(), !binary, binary)) {
         *error = "Cannot write scene file [" + path + "]: the scene could not be serialised";
         return false;  // the SafeFile removes what was written
     }
