@@ -49,7 +49,7 @@ for ((r = 0; r < runs; r++)); do
     fi
     read -r kb wall user sys <"$work/time.txt"
     peaks+=("$kb")
-    printf "run %d: peak %.1f MB, wall %.2f s, CPU %.2f s\n" "$r" "$(echo "$kb / 1024" | bc -l)" \
+    printf "run %d: peak %.1f MB, wall %.2f s, CPU %.2f s\n" "$r" "$(echo "$kb * 1024 / 1000000" | bc -l)" \
         "$wall" "$(echo "$user + $sys" | bc -l)"
 done
 in=$(stat -c %s "$work/wire/big.glb")

@@ -51,6 +51,9 @@ void Imp::BatchApply(const char* keysetFile, const char* trackFile, const char* 
     if (batchStop)
         return;  // no usable scene file: the run ends here
     LoadTrack(trackFile);
+    // The keyset's scene has given its key channels; batch mode shows nothing, so it is let go
+    // before the apply scene is read, and the two are never in memory together.
+    wireSource.reset();
 
     applyEvent.reset();
     applyEvent = std::make_unique<KLEdlEvent>(applyFile, CueTime(), duration, CueTime(), duration);
