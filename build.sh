@@ -39,6 +39,8 @@ bench)
     configure_release
     cmake --build build -j "$jobs"
     for b in build/bench/*_bench; do "$b"; done
+    bench/startup.sh build
+    bench/batch-memory.sh build
     ;;
 *)
     echo "usage: ./build.sh demo|test|fuzz|bench" >&2
