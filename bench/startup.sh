@@ -32,7 +32,8 @@ measure() {
 
 demo_run() {
     (cd "$demo" && env -u TESSEL_PROJECT -u TESSEL_MISC_DIR -u VX_FPS \
-        "$program" -B demo.track face.glb VX_ROOT 0 "$out/face-animated.glb" demo.kset)
+        "$program" -e "$out/errlog.vx" -B demo.track face.glb VX_ROOT 0 "$out/face-animated.glb" \
+            demo.kset)
 }
 
 window_libs=""

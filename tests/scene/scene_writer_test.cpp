@@ -150,6 +150,7 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
     ASSERT_EQ(StoreKeys(a.get(), 0, {{0, 0, 0, 0}, {3000, 4, 0, 0}, {6000, 1, 0, 0}}), 1);
     ASSERT_EQ(StoreKeys(a.get(), 2, {{1000, 2, 1, 1}, {9000, -3, 1, 1}}), 1);
     auto back = StoreAndRead();
+    ASSERT_TRUE(back);
     Written w = WrittenSampler(back->model(), 0, "translation");
     EXPECT_EQ(w.interpolation, "CUBICSPLINE");
     EXPECT_EQ(w.times, (std::vector<float>{0, 1000 / 6000.0f, 0.5f, 1, 1.5f}));
@@ -186,6 +187,7 @@ TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
     scene.source->document()->SetCurve(0, 0, {s0, s1, s2}, true);  // TX steps
     ASSERT_EQ(StoreKeys(a.get(), 1, {{0, 0, 0, 0}, {9000, 2, 0, 0}, {24000, -1, 0, 0}}), 1);
     auto back = StoreAndRead();
+    ASSERT_TRUE(back);
     ExpectValidGltf(out);
     const SceneDocument& doc = *scene.source->document();
     Written rot = WrittenSampler(back->model(), 0, "rotation");
@@ -264,6 +266,7 @@ TEST_F(SceneWriterTest, ABufferLeftEmptyIsRemoved) {
     Open(b);
     ASSERT_EQ(StoreKeys(scene.Fetch("bone").get(), 3, {{0, 0, 1, 1}, {6000, 45, 1, 1}}), 1);
     auto back = StoreAndRead();
+    ASSERT_TRUE(back);
     EXPECT_EQ(back->model().buffers.size(), 1u);
     EXPECT_EQ(back->model().skins.size(), 1u);
     Written w = WrittenSampler(back->model(), bone, "rotation");
@@ -284,6 +287,7 @@ TEST_F(SceneWriterTest, ADrivenPathEndsInTheFirstClipThatAnimatedItAndNowhereEls
     Open(b);
     ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 1, {{0, 0, 1, 1}, {6000, 7, 1, 1}}), 1);
     auto back = StoreAndRead();
+    ASSERT_TRUE(back);
     const tinygltf::Model& m = back->model();
     Written w = WrittenSampler(m, a, "translation");
     EXPECT_EQ(w.channels, 1);
@@ -308,6 +312,7 @@ TEST_F(SceneWriterTest, PathsNotDrivenAreWrittenBackAsRead) {
     Open(b);
     ASSERT_EQ(StoreKeys(scene.Fetch("b3").get(), 2, {{0, 0, 1, 1}, {6000, 1, 1, 1}}), 1);
     auto back = StoreAndRead();
+    ASSERT_TRUE(back);
     Written rot = WrittenSampler(back->model(), bone, "rotation");
     EXPECT_EQ(rot.times, (std::vector<float>{0, 1, 2}));
     EXPECT_EQ(rot.values, q);
@@ -333,6 +338,7 @@ TEST_F(SceneWriterTest, AGlbHoldsEveryBufferAndImageInItsBinaryChunk) {
     Open(b, "in.glb");
     ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 0, {{0, 0, 1, 1}, {6000, 1, 1, 1}}), 1);
     auto back = StoreAndRead("out.glb");
+    ASSERT_TRUE(back);
     const tinygltf::Model& m = back->model();
     ASSERT_EQ(m.buffers.size(), 1u);
     EXPECT_TRUE(m.buffers[0].uri.empty());
@@ -360,6 +366,7 @@ TEST_F(SceneWriterTest, CurvesStartAtZeroWithoutNegativeZeros) {
     EXPECT_NEAR(tx->Evaluate(0.25), 2.5, 1e-9);
     ASSERT_EQ(StoreKeys(a.get(), 3, {{-1, 0, 0, 0}, {3000, 30, 0, 0}}), 1);
     auto back = StoreAndRead();
+    ASSERT_TRUE(back);
     for (const char* path : {"translation", "rotation"}) {
         Written w = WrittenSampler(back->model(), 0, path);
         ASSERT_FALSE(w.times.empty());
@@ -384,6 +391,7 @@ TEST_F(SceneWriterTest, AFarKeyCostsNothingAndATooLongCurveIsRefused) {
     EXPECT_LT(ReadFile(dir + "/in.gltf").size(), 1500u);
     ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 4, {{0, 0, 1, 1}, {6000, 20, 1, 1}}), 1);
     auto back = StoreAndRead();
+    ASSERT_TRUE(back);
     EXPECT_LT(ReadFile(out).size(), 4000u);
     EXPECT_NEAR(back->Curve(a, 4)->Evaluate(0.5), 10, 1e-3);
     EXPECT_NEAR(back->Curve(a, 3)->Evaluate(100000), 90, 1e-3);
