@@ -226,8 +226,23 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
             return std::fabs(axis[a][j] - axis[a][i]) < 180 &&
                    line_fits(times, axis[a], i, j, tolerance);
         });
+        // The fixed axes' half-angle sines and cosines once; only the turning one per sample.
+        double c[3], sn[3];
+        for (int b = 0; b < 3; ++b) {
+            double half = axis[b].empty() ? 0 : axis[b][0] * 3.14159265358979323846 / 360;
+            c[b] = std::cos(half);
+            sn[b] = std::sin(half);
+        }
+        q.reserve(kept.size());
         for (size_t k : kept) {
-            q.push_back(quaternion(k));
+            double half = axis[a][k] * 3.14159265358979323846 / 360;
+            c[a] = std::cos(half);
+            sn[a] = std::sin(half);
+            // qz * qy * qx, as EulerRotation::ToQuaternion
+            q.push_back({sn[0] * c[1] * c[2] - c[0] * sn[1] * sn[2],
+                         c[0] * sn[1] * c[2] + sn[0] * c[1] * sn[2],
+                         c[0] * c[1] * sn[2] - sn[0] * sn[1] * c[2],
+                         c[0] * c[1] * c[2] + sn[0] * sn[1] * sn[2]});
         }
     } else {
         q.resize(times.size());

@@ -226,6 +226,36 @@ TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
     }
 }
 
+// One axis turning between two fixed ones is checked as a line in degrees: the written
+// rotation still stays within the tolerance at every frame and key, with the fixed axes kept.
+TEST_F(SceneWriterTest, OneTurningAxisStaysWithinToleranceBetweenFixedOnes) {
+    ModelBuilder b;
+    b.Node("a");
+    Open(b);
+    Node a = scene.Fetch("a");
+    ASSERT_EQ(StoreKeys(a.get(), 3, {{0, 30, 1, 1}}), 1);
+    ASSERT_EQ(StoreKeys(a.get(), 4, {{0, -50, 0, 0}, {30000, 120, 0, 1}, {90000, 100, 1, 1}}), 1);
+    ASSERT_EQ(StoreKeys(a.get(), 5, {{0, -20, 1, 1}}), 1);
+    auto back = StoreAndRead();
+    ASSERT_TRUE(back);
+    const SceneDocument& doc = *scene.source->document();
+    Written rot = WrittenSampler(back->model(), 0, "rotation");
+    EXPECT_LT(rot.times.size(), 200u);  // of 451 frames: the straight last 10 s in one piece
+    std::vector<double> checks = {0, 5, 15};
+    for (int f = 0; f <= 460; ++f) {
+        checks.push_back(f / 30.0);
+    }
+    for (double t : checks) {
+        EulerRotation::Quat want =
+            EulerRotation::ToQuaternion({30, doc.Curve(0, 4)->Evaluate(t), -20});
+        std::vector<double> got = SampleAt(rot, t, 4);
+        ASSERT_LE(EulerRotation::AngleBetween(want, {got[0], got[1], got[2], got[3]}),
+                  SamplerBuilder::kRotationToleranceDegrees)
+            << "at " << t;
+    }
+    ExpectValidGltf(out);
+}
+
 // A skinned figure whose animation lives in a buffer of its own: replacing that animation
 // leaves the buffer empty, and an empty buffer is removed, not written with byteLength 0.
 TEST_F(SceneWriterTest, ABufferLeftEmptyIsRemoved) {
