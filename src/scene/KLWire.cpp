@@ -137,9 +137,12 @@ int KLWire::StoreChannel(OrDagNode* node, int channel, int count, const CueTime*
         keys.push_back(k);
     }
     // Keys in time order; of two at one time the later given wins (Merge replaces).
-    std::stable_sort(
-        keys.begin(), keys.end(),
-        [](const ChannelCurve::Key& a, const ChannelCurve::Key& b) { return a.time < b.time; });
+    auto earlier = [](const ChannelCurve::Key& a, const ChannelCurve::Key& b) {
+        return a.time < b.time;
+    };
+    if (!std::is_sorted(keys.begin(), keys.end(), earlier)) {  // apply gives them in order
+        std::stable_sort(keys.begin(), keys.end(), earlier);
+    }
     node->document()->SetCurve(node->index(), channel, keys, alwaysClearChannel != 0);
     return 1;
 }
