@@ -154,4 +154,14 @@ TEST_F(BatchBoundsTest, AFarKeyInASmallSceneCostsLittle) {
     ExpectValid();
 }
 
+// A keyset whose key shapes are all the same pose has nothing to apply: the run says so.
+TEST_F(BatchBoundsTest, AKeysetWithoutChannelsIsTold) {
+    Data("x.kset", "wire face.gltf\nbegin keyset same\n    key a 0\n    key b 0\nend\n");
+    Data("x.track", "begin keytrack same\n    event 0 a\nend\n");
+    const RunResult r = Batch();
+    EXPECT_EQ(r.status, 0);
+    EXPECT_THAT(r.err, HasSubstr("Keyset [same]: its key shapes differ in no channel, so it has "
+                                 "no key channels."));
+}
+
 }  // namespace
