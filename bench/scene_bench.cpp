@@ -85,6 +85,7 @@ const std::string& scene_path() {
             nrm.insert(nrm.end(), {0.0f, 0.0f, 1.0f});
         }
         tinygltf::Primitive prim;
+        prim.mode = TINYGLTF_MODE_POINTS;
         prim.attributes["POSITION"] = add_floats(&m, pos, TINYGLTF_TYPE_VEC3, 3, true);
         prim.attributes["NORMAL"] = add_floats(&m, nrm, TINYGLTF_TYPE_VEC3, 3, false);
         tinygltf::Mesh mesh;
