@@ -46,27 +46,57 @@ void put_u32(std::ostream& out, uint32_t v) {
     out.write(bytes, 4);
 }
 
-// Writes a .glb whose binary chunk is buffer 0, straight from the model: the JSON comes from
-// the serialiser with buffer 0 emptied and marked, and the marked buffer's object is then
-// replaced by its real length. False when the model does not allow it (the caller then lets
-// the serialiser write the whole container).
-bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, std::ostream& out) {
-    if (model->buffers.empty() || model->buffers[0].data.empty() ||
-        !model->buffers[0].uri.empty() || model->buffers[0].extras.Type() != tinygltf::NULL_TYPE ||
-        model->buffers[0].data.size() > 0xFFFFFFF0u) {
+// Where each buffer starts in a binary chunk that joins them all, 16-byte aligned, and the
+// chunk's length (before its padding to 4 bytes).
+std::vector<size_t> join_bases(const tinygltf::Model& model, size_t* length) {
+    std::vector<size_t> base(model.buffers.size(), 0);
+    size_t at = 0;
+    for (size_t b = 0; b < model.buffers.size(); ++b) {
+        at = (at + 15) & ~size_t(15);
+        base[b] = at;
+        at += model.buffers[b].data.size();
+    }
+    *length = at;
+    return base;
+}
+
+// Writes a .glb whose binary chunk is buffer 0 (with `join`, every buffer one after another)
+// straight from the model: the JSON comes from the serialiser with the buffers taken out, one
+// marked empty buffer in their place and the views moved onto it, and the marked buffer's object
+// is then replaced by the chunk's real length. False when the model does not allow it (the
+// caller then lets the serialiser write the whole container); the model is left as it was.
+bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool join,
+                      std::ostream& out) {
+    if (model->buffers.empty() || (!join && model->buffers.size() > 1) ||
+        !SceneSerializer::CanJoinBuffers(*model) || !model->buffers[0].uri.empty()) {
         return false;
     }
-    tinygltf::Buffer& first = model->buffers[0];
+    size_t length = 0;
+    const std::vector<size_t> base = join_bases(*model, &length);
+    if (length == 0 || length > 0xFFFFFFF0u) {
+        return false;
+    }
     const std::string marker = "chirrup binary chunk " + std::to_string(::getpid()) + " " +
-                               std::to_string(reinterpret_cast<uintptr_t>(&first));
-    std::vector<unsigned char> bin;
-    bin.swap(first.data);
-    std::string name = marker;
-    name.swap(first.name);
+                               std::to_string(reinterpret_cast<uintptr_t>(model));
+    std::vector<tinygltf::Buffer> buffers(1);
+    buffers[0].name = marker;
+    buffers.swap(model->buffers);
+    std::vector<std::pair<int, size_t>> placed;  // each view's buffer and offset, to restore
+    placed.reserve(model->bufferViews.size());
+    for (tinygltf::BufferView& v : model->bufferViews) {
+        placed.emplace_back(v.buffer, v.byteOffset);
+        if (v.buffer > 0 && size_t(v.buffer) < base.size()) {
+            v.byteOffset += base[size_t(v.buffer)];
+            v.buffer = 0;
+        }
+    }
     std::ostringstream text;
     bool ok = writer->WriteGltfSceneToStream(model, text, false, false);
-    bin.swap(first.data);
-    name.swap(first.name);
+    buffers.swap(model->buffers);
+    for (size_t i = 0; i < placed.size(); ++i) {
+        model->bufferViews[i].buffer = placed[i].first;
+        model->bufferViews[i].byteOffset = placed[i].second;
+    }
     std::string json = text.str();
     const std::string quoted = json_string(marker);
     size_t at = json.find(quoted);
@@ -77,7 +107,8 @@ bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, std::o
     if (start == std::string::npos || end == std::string::npos) {
         return false;
     }
-    std::string object = "{\"byteLength\":" + std::to_string(first.data.size());
+    const tinygltf::Buffer& first = model->buffers[0];
+    std::string object = "{\"byteLength\":" + std::to_string(length);
     if (!first.name.empty()) {
         object += ",\"name\":" + json_string(first.name);
     }
@@ -86,7 +117,7 @@ bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, std::o
         json.pop_back();
     }
     json.resize((json.size() + 3) & ~size_t(3), ' ');
-    size_t binLength = (first.data.size() + 3) & ~size_t(3);
+    size_t binLength = (length + 3) & ~size_t(3);
     uint64_t total = 12 + 8 + json.size() + 8 + binLength;
     if (total > 0xFFFFFFFFu) {
         return false;
@@ -99,21 +130,27 @@ bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, std::o
     out.write(json.data(), std::streamsize(json.size()));
     put_u32(out, uint32_t(binLength));
     put_u32(out, 0x004E4942);  // "BIN"
-    out.write(reinterpret_cast<const char*>(first.data.data()), std::streamsize(first.data.size()));
-    static const char kZeros[4] = {0, 0, 0, 0};
-    out.write(kZeros, std::streamsize(binLength - first.data.size()));
+    static const char kZeros[16] = {};
+    size_t written = 0;
+    for (size_t b = 0; b < model->buffers.size(); ++b) {
+        out.write(kZeros, std::streamsize(base[b] - written));
+        const std::vector<unsigned char>& data = model->buffers[b].data;
+        out.write(reinterpret_cast<const char*>(data.data()), std::streamsize(data.size()));
+        written = base[b] + data.size();
+    }
+    out.write(kZeros, std::streamsize(binLength - written));
     return true;
 }
 
 // Serialises `model` through a SafeFile: `path` is either the old file or the whole new one.
-bool write_safely(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binary,
+bool write_safely(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binary, bool join,
                   const std::string& path, std::string* error) {
     SafeFile file(path);
     if (!file.IsOpen()) {
         *error = "Cannot write scene file [" + path + "]: " + file.ErrorText();
         return false;
     }
-    bool written = binary && write_glb_direct(writer, model, file.Stream());
+    bool written = binary && write_glb_direct(writer, model, join, file.Stream());
     if (!written && !writer->WriteGltfSceneToStream(model, file.Stream(), !binary, binary)) {
         *error = "Cannot write scene file [" + path + "]: the scene could not be serialised";
         return false;  // the SafeFile removes what was written
@@ -163,7 +200,19 @@ std::string SceneSerializer::Base64(const unsigned char* bytes, size_t size) {
     return out;
 }
 
-bool SceneSerializer::Write(tinygltf::Model& model, const std::string& path, std::string* error) {
+bool SceneSerializer::CanJoinBuffers(const tinygltf::Model& model) {
+    size_t length = 0;
+    join_bases(model, &length);
+    for (const tinygltf::Buffer& b : model.buffers) {
+        if (b.extras.Type() != tinygltf::NULL_TYPE) {
+            return false;  // a joined buffer has no place for them
+        }
+    }
+    return length <= 0xFFFFFFF0u;
+}
+
+bool SceneSerializer::Write(tinygltf::Model& model, const std::string& path, bool joinBuffers,
+                            std::string* error) {
     // The serialiser writes an object with no properties as null, which no reader accepts:
     // such a node gets its (default) translation written out, such a scene a name.
     for (tinygltf::Node& n : model.nodes) {
@@ -182,5 +231,5 @@ bool SceneSerializer::Write(tinygltf::Model& model, const std::string& path, std
     }
     tinygltf::TinyGLTF writer;
     writer.SetImageWriter(write_image_bytes, nullptr);
-    return write_safely(&writer, &model, IsBinaryPath(path), path, error);
+    return write_safely(&writer, &model, IsBinaryPath(path), joinBuffers, path, error);
 }

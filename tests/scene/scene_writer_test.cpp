@@ -297,7 +297,11 @@ TEST_F(SceneWriterTest, ABufferLeftEmptyIsRemoved) {
     ASSERT_EQ(StoreKeys(scene.Fetch("bone").get(), 3, {{0, 0, 1, 1}, {6000, 45, 1, 1}}), 1);
     auto back = StoreAndRead();
     ASSERT_TRUE(back);
-    EXPECT_EQ(back->model().buffers.size(), 1u);
+    // The old animation's buffer is gone; the scene's and the new animation's remain.
+    ASSERT_EQ(back->model().buffers.size(), 2u);
+    for (const tinygltf::Buffer& buffer : back->model().buffers) {
+        EXPECT_FALSE(buffer.data.empty());
+    }
     EXPECT_EQ(back->model().skins.size(), 1u);
     Written w = WrittenSampler(back->model(), bone, "rotation");
     ASSERT_EQ(w.channels, 1);
