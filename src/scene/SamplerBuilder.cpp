@@ -169,12 +169,10 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
         unionCubic(out);
         return true;
     }
-    std::vector<double> times;
-    if (!candidateTimes(&times, why)) {
+    std::vector<double> times, axis[3];
+    if (!sampleCandidates(&times, axis, why)) {
         return false;
     }
-    std::vector<double> axis[3];
-    evaluate(times, axis);
     auto fits = [&](size_t i, size_t j) {
         for (int a = 0; a < 3; ++a) {
             if (!line_fits(times, axis[a], i, j, kVectorTolerance * 0.5)) {
@@ -199,12 +197,10 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     if (!lead_) {
         return true;
     }
-    std::vector<double> times;
-    if (!candidateTimes(&times, why)) {
+    std::vector<double> times, axis[3];
+    if (!sampleCandidates(&times, axis, why)) {
         return false;
     }
-    std::vector<double> axis[3];
-    evaluate(times, axis);
     auto quaternion = [&](size_t k) {
         return EulerRotation::ToQuaternion({axis[0][k], axis[1][k], axis[2][k]});
     };
@@ -410,6 +406,15 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, std::string* why) 
             }
         }
     }
+    return true;
+}
+
+bool SamplerBuilder::sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
+                                      std::string* why) const {
+    if (!candidateTimes(times, why)) {
+        return false;
+    }
+    evaluate(*times, axis);
     return true;
 }
 

@@ -56,6 +56,9 @@ class SamplerBuilder {
     // For each span between consecutive `keys` (the union key times), whether every axis holds
     // still across it.
     std::vector<char> stillSpans(const std::vector<double>& keys) const;
+    // The candidate times and every axis's value at each of them.
+    bool sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
+                          std::string* why) const;
     void evaluate(const std::vector<double>& times, std::vector<double> axis[3]) const;
 
     const ChannelCurve* curves_[3];
