@@ -170,7 +170,7 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
         return true;
     }
     std::vector<double> times, axis[3];
-    if (!sampleCandidates(&times, axis, why)) {
+    if (!sampleCandidates(&times, axis, HUGE_VAL, why)) {
         return false;
     }
     auto fits = [&](size_t i, size_t j) {
@@ -197,8 +197,17 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     if (!lead_) {
         return true;
     }
+    int moving = -1, movingAxes = 0;
+    for (int a = 0; a < 3; ++a) {
+        if (curves_[a] && !curves_[a]->Constant()) {
+            moving = a;
+            ++movingAxes;
+        }
+    }
+    // With one turning axis a straight span of it is followed exactly (see below), as long as
+    // it turns by less than half a turn, which a piece would go the other way round.
     std::vector<double> times, axis[3];
-    if (!sampleCandidates(&times, axis, why)) {
+    if (!sampleCandidates(&times, axis, movingAxes <= 1 ? 90.0 : 0.0, why)) {
         return false;
     }
     auto quaternion = [&](size_t k) {
@@ -208,13 +217,6 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     const double tolerance = kRotationToleranceDegrees * 0.5;
     std::vector<size_t> kept;
     std::vector<EulerRotation::Quat> q;
-    int moving = -1, movingAxes = 0;
-    for (int a = 0; a < 3; ++a) {
-        if (curves_[a] && !curves_[a]->Constant()) {
-            moving = a;
-            ++movingAxes;
-        }
-    }
     if (movingAxes <= 1) {
         // One axis turning between fixed ones: the rotation is a fixed one, a turn about that
         // axis, and another fixed one, and interpolation commutes with fixed rotations on either
@@ -350,7 +352,8 @@ std::vector<double> SamplerBuilder::unionTimes() const {
     return out;
 }
 
-std::vector<char> SamplerBuilder::stillSpans(const std::vector<double>& keys) const {
+std::vector<char> SamplerBuilder::plainSpans(const std::vector<double>& keys,
+                                             double straightUpTo) const {
     std::vector<char> still(keys.empty() ? 0 : keys.size() - 1, 1);
     for (const ChannelCurve* c : curves_) {
         if (!c) {
@@ -367,6 +370,10 @@ std::vector<char> SamplerBuilder::stillSpans(const std::vector<double>& keys) co
                 continue;  // held before the first key or after the last
             }
             size_t i = after - 1;
+            if (own[i].out == ChannelCurve::kLinear && own[i + 1].in == ChannelCurve::kLinear &&
+                std::fabs(own[i + 1].value - own[i].value) < straightUpTo) {
+                continue;  // a straight line, which the written pieces follow exactly
+            }
             if (own[i].value != own[i + 1].value ||
                 (own[i].out != ChannelCurve::kStep &&
                  (c->OutSlope(i) != 0 || c->InSlope(i + 1) != 0))) {
@@ -377,9 +384,10 @@ std::vector<char> SamplerBuilder::stillSpans(const std::vector<double>& keys) co
     return still;
 }
 
-bool SamplerBuilder::candidateTimes(std::vector<double>* out, std::string* why) const {
+bool SamplerBuilder::candidateTimes(std::vector<double>* out, double straightUpTo,
+                                    std::string* why) const {
     std::vector<double> keys = unionTimes();
-    std::vector<char> still = stillSpans(keys);
+    std::vector<char> still = plainSpans(keys, straightUpTo);
     // Count first, so that a curve that would need too many samples costs no memory.
     double count = double(keys.size());
     for (size_t k = 0; k + 1 < keys.size(); ++k) {
@@ -410,8 +418,8 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, std::string* why) 
 }
 
 bool SamplerBuilder::sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
-                                      std::string* why) const {
-    if (!candidateTimes(times, why)) {
+                                      double straightUpTo, std::string* why) const {
+    if (!candidateTimes(times, straightUpTo, why)) {
         return false;
     }
     evaluate(*times, axis);

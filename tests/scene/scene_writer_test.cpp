@@ -231,8 +231,11 @@ TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
 TEST_F(SceneWriterTest, OneTurningAxisStaysWithinToleranceBetweenFixedOnes) {
     ModelBuilder b;
     b.Node("a");
+    b.Node("spin");
     Open(b);
     Node a = scene.Fetch("a");
+    // Three quarters of a turn in a straight line: more than one piece can hold.
+    ASSERT_EQ(StoreKeys(scene.Fetch("spin").get(), 4, {{0, 0, 1, 1}, {6000, 270, 1, 1}}), 1);
     ASSERT_EQ(StoreKeys(a.get(), 3, {{0, 30, 1, 1}}), 1);
     ASSERT_EQ(StoreKeys(a.get(), 4, {{0, -50, 0, 0}, {30000, 120, 0, 1}, {90000, 100, 1, 1}}), 1);
     ASSERT_EQ(StoreKeys(a.get(), 5, {{0, -20, 1, 1}}), 1);
@@ -252,6 +255,14 @@ TEST_F(SceneWriterTest, OneTurningAxisStaysWithinToleranceBetweenFixedOnes) {
         ASSERT_LE(EulerRotation::AngleBetween(want, {got[0], got[1], got[2], got[3]}),
                   SamplerBuilder::kRotationToleranceDegrees)
             << "at " << t;
+    }
+    Written spin = WrittenSampler(back->model(), 1, "rotation");
+    for (int f = 0; f <= 30; ++f) {
+        std::vector<double> got = SampleAt(spin, f / 30.0, 4);
+        ASSERT_LE(EulerRotation::AngleBetween(EulerRotation::ToQuaternion({0, 9.0 * f, 0}),
+                                              {got[0], got[1], got[2], got[3]}),
+                  SamplerBuilder::kRotationToleranceDegrees)
+            << "spin at frame " << f;
     }
     ExpectValidGltf(out);
 }
