@@ -25,7 +25,9 @@ struct BuiltSampler {
 //     LINEAR samples taken from the keys and the whole frames between them, reduced to the
 //     fewest that keep the written curve within kVectorTolerance (units) or
 //     kRotationToleranceDegrees (the angle between the rotations) of the evaluated curve at
-//     every key and every frame. Spans where every axis holds still get no samples inside.
+//     every key and every frame. Spans where every axis holds still, or where the moving axes
+//     run in straight lines that the pieces follow exactly (translation and scale; a rotation
+//     turning about one axis by less than a quarter turn), get no samples inside.
 // A curve is never sampled before its first or after its last key; one whose keys would make it
 // need more than kMaxSampledFrames frames sampled is refused.
 class SamplerBuilder {
