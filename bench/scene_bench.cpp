@@ -154,8 +154,8 @@ void extract(OrDagNode* node, double frame, double* sum) {
         }
     }
     if (node->asGroupNodePtr()) {
-        for (std::unique_ptr<OrDagNode> child(node->childNode()); child;
-             child.reset(child->nextNode())) {
+        for (std::unique_ptr<OrDagNode> child = node->childNode(); child;
+             child = child->nextNode()) {
             extract(child.get(), frame, sum);
         }
     }
@@ -168,7 +168,7 @@ void BM_ParseAndExtract(benchmark::State& state) {
         std::unique_ptr<OrDagNode> face(KLWire::FetchDagNode(root.get(), "face"));
         double sum = 0;
         for (int shape = 0; shape < 60; ++shape) {
-            for (std::unique_ptr<OrDagNode> n(face->childNode()); n; n.reset(n->nextNode())) {
+            for (std::unique_ptr<OrDagNode> n = face->childNode(); n; n = n->nextNode()) {
                 extract(n.get(), shape * 3.0, &sum);
             }
         }

@@ -17,8 +17,6 @@ KLEdlEvent::KLEdlEvent(const char* a_wireFile, CueTime a_sourceIn, CueTime a_sou
 KLEdlEvent::~KLEdlEvent() {
     DeleteEvent(this);
     CloseWire();
-    if (dagList)
-        KLWire::DeleteDagList(dagList.release());
 }
 
 void KLEdlEvent::DeleteEvent(void* event) {
@@ -33,14 +31,10 @@ void KLEdlEvent::OpenWire() {
     if (!wireFile)
         return;
     const char* dir = KLStdImp::Workspace().GetWireDirectory();
-    const std::string path =
-        (dir && (*wireFile)[0] != '/') ? std::string(dir) + "/" + *wireFile : *wireFile;
-    wire = std::make_unique<KLWireSource>(path.c_str());
-    if (dagList)
-        KLWire::DeleteDagList(dagList.release());
-    std::unique_ptr<OrDagNode> root(wire->RootNode());
-    if (root)
-        dagList.reset(KLWire::BuildDagList(root.get(), 1));
+    wire = std::make_unique<KLWireSource>(KLFilePath::Join(dir, wireFile->c_str()).c_str());
+    dagList.reset();
+    if (std::unique_ptr<OrDagNode> root = wire->RootNode())
+        dagList = KLWire::BuildDagList(root.get(), 1);
 }
 
 int KLEdlEvent::StoreWire(const char* path) {

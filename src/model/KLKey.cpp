@@ -26,8 +26,7 @@ KLImageSGI* KLKey::GetImage() {
     if (!imageFile)
         return nullptr;
     const char* pixDir = KLStdImp::Workspace().GetPixDirectory();
-    const std::string path =
-        (pixDir && (*imageFile)[0] != '/') ? std::string(pixDir) + "/" + *imageFile : *imageFile;
+    const std::string path = KLFilePath::Join(pixDir, imageFile->c_str());
     loadedImage = KLImageSGI::Load(path.c_str());
     if (!loadedImage) {
         std::cerr << "KLKey::GetImage() failed to get image" << std::endl;

@@ -5,7 +5,8 @@
 #include <string>
 
 // One animated transform parameter of one scene node, with its value at each key shape of a
-// keyset (slot i belongs to the key shape of index i).
+// keyset (slot i belongs to the key shape of index i). Not the preview's animation channel
+// (scene/KLChannel.h) nor a curve of a scene file (scene/OrChannel.h).
 class KLKeyChannel {
   public:
     enum Channel { kTX, kTY, kTZ, kRX, kRY, kRZ, kSX, kSY, kSZ };

@@ -2,6 +2,8 @@
 
 #include <cstring>
 
+#include "model/EventOrder.h"
+
 int SmoothFromString(const char* name) {
     if (!name)
         return KLKeyEvent::kEase;
@@ -30,9 +32,5 @@ const char* KLKeyEvent::GetSmoothName() const {
 }
 
 int KLKeyEvent::CompareByTimestamp(const void* a, const void* b) {
-    const CueTime ta = static_cast<const KLKeyEvent*>(a)->time;
-    const CueTime tb = static_cast<const KLKeyEvent*>(b)->time;
-    if (ta == tb)
-        return 0;
-    return ta < tb ? -1 : 1;
+    return CompareEventTimes<KLKeyEvent>(a, b);
 }

@@ -48,17 +48,7 @@ KLKeySet::KLKeySet(const char* a_name, const char* a_nodeName, int a_channelInde
         nodeName = a_nodeName;
 }
 
-KLKeySet::~KLKeySet() {
-    clear_keyshapes();
-    if (kind == 1) {
-        for (KLKeyChannel* c : keyChannels)
-            delete c;
-    }
-    keyChannels.clear();
-    for (CueRecognizer* r : recognizers)
-        delete r;
-    recognizers.clear();
-}
+KLKeySet::~KLKeySet() = default;
 
 void KLKeySet::clear_keyshapes() {
     keyShapes.clear();
@@ -120,30 +110,32 @@ KLKey* KLKeySet::GetDefaultKeyShape() const {
 CueRecognizer* KLKeySet::GetRecognizer(const char* a_name) const {
     if (!a_name)
         return nullptr;
-    for (CueRecognizer* r : recognizers) {
+    for (const auto& r : recognizers) {
         if (std::strcmp(r->Name(), a_name) == 0)
-            return r;
+            return r.get();
     }
     return nullptr;
 }
 
-void KLKeySet::AddRecognizer(CueRecognizer* recognizer) {
-    recognizers.push_front(recognizer);
+CueRecognizer* KLKeySet::AddRecognizer(std::unique_ptr<CueRecognizer> recognizer) {
+    recognizers.push_front(std::move(recognizer));
+    return recognizers.front().get();
 }
 
 KLKeyChannel* KLKeySet::GetKeyChannel(const char* a_name, int channel) const {
     if (!a_name)
         return nullptr;
-    for (KLKeyChannel* c : keyChannels) {
+    for (const auto& c : keyChannels) {
         const char* n = c->Name();
         if (n && c->channel == channel && std::strcmp(n, a_name) == 0)
-            return c;
+            return c.get();
     }
     return nullptr;
 }
 
-void KLKeySet::AddKeyChannel(KLKeyChannel* channel) {
-    keyChannels.push_front(channel);
+KLKeyChannel* KLKeySet::AddKeyChannel(std::unique_ptr<KLKeyChannel> channel) {
+    keyChannels.push_front(std::move(channel));
+    return keyChannels.front().get();
 }
 
 // Keyset block, one statement per line, up to a line whose first token is "end":
@@ -201,7 +193,7 @@ void KLKeySet::read_block(std::istream& in) {
 std::string KLKeySet::picture_path(int i, const char* pixDir) const {
     const int number = kind == 1 ? whole_frame(keyShapes[i]->frame) : i;
     const std::string file = KLFmt("%s.%04d.sgi", Name() ? Name() : "", number);
-    return pixDir ? std::string(pixDir) + "/" + file : file;
+    return KLFilePath::Join(pixDir, file.c_str());
 }
 
 // Writes "    key <name> <frame> <picture>" per key shape, names quoted when they hold a blank

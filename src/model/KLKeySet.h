@@ -49,15 +49,15 @@ class KLKeySet {
     // keyShapes[defaultIndex]; null when the keyset has no key shapes.
     KLKey* GetDefaultKeyShape() const;
 
-    // The newest recognizer of that name, or null. AddRecognizer takes ownership and puts
-    // the recognizer first.
+    // The newest recognizer of that name, or null. AddRecognizer puts the recognizer first
+    // and returns it.
     CueRecognizer* GetRecognizer(const char* name) const;
-    void AddRecognizer(CueRecognizer* recognizer);
+    CueRecognizer* AddRecognizer(std::unique_ptr<CueRecognizer> recognizer);
 
     // The most recently added key channel for (node name, channel), or null. AddKeyChannel
-    // takes ownership (kind 1) and puts the channel first.
+    // puts the channel first and returns it.
     KLKeyChannel* GetKeyChannel(const char* name, int channel) const;
-    void AddKeyChannel(KLKeyChannel* channel);
+    KLKeyChannel* AddKeyChannel(std::unique_ptr<KLKeyChannel> channel);
 
     // The keyset block: "key <name> <frame> [<image>]" lines up to "end" (see KLKeySet.cpp).
     // Read replaces the key shapes; Write writes the key lines only.
@@ -80,13 +80,11 @@ class KLKeySet {
     int channelIndex = 0;                   // kind 2: the driven channel (KLKeyChannel::Channel)
     float lowValue = 0.0f;                  // kind 2: rest value of the driven channel
     float highValue = 0.0f;                 // kind 2: stored, not used here
-    std::vector<std::unique_ptr<KLKey>> keyShapes;  // in index order
-    int keyShapeCount = 0;                          // keyShapes.size()
-    int defaultIndex = 0;                           // the rest pose
-    // Newest first. Owned by a kind-1 keyset; a kind-2 keyset leaves its channels to
-    // whoever added them.
-    std::list<KLKeyChannel*> keyChannels;
-    std::list<CueRecognizer*> recognizers;  // owned, newest first
+    std::vector<std::unique_ptr<KLKey>> keyShapes;          // in index order
+    int keyShapeCount = 0;                                  // keyShapes.size()
+    int defaultIndex = 0;                                   // the rest pose
+    std::list<std::unique_ptr<KLKeyChannel>> keyChannels;   // newest first
+    std::list<std::unique_ptr<CueRecognizer>> recognizers;  // newest first
     int imagesOnFile = 1;   // 1 while every key shape read has a readable image file
     int imagesChanged = 0;  // 1 when the pictures were made anew in the program
     KLKeyFrameList* keyFrameList = nullptr;  // borrowed: the 3D preview's key frame list

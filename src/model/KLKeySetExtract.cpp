@@ -28,16 +28,14 @@ void KLKeySet::extract_dag(CueTime t, int index, OrDagNode* top) {
                 continue;
             const double value = channel->eval(frame);
             KLKeyChannel* kc = GetKeyChannel(nodeName, c);
-            if (!kc) {
-                kc = new KLKeyChannel(nodeName, c, keyShapeCount);
-                AddKeyChannel(kc);
-            }
+            if (!kc)
+                kc = AddKeyChannel(std::make_unique<KLKeyChannel>(nodeName, c, keyShapeCount));
             kc->Set(index, float(value));
         }
         if (node->asGroupNodePtr()) {
             const size_t at = stack.size();
-            for (std::unique_ptr<OrDagNode> child(node->childNode()); child;
-                 child.reset(child->nextNode()))
+            for (std::unique_ptr<OrDagNode> child = node->childNode(); child;
+                 child = child->nextNode())
                 stack.push_back(std::make_unique<OrDagNode>(child->documentPtr(), child->index()));
             std::reverse(stack.begin() + long(at), stack.end());  // first child on top
         }
@@ -54,16 +52,15 @@ void KLKeySet::ExtractKeys(OrDagNode* scene) {
     for (int i = 0; i < keyShapeCount; ++i) {
         const KLKey* key = keyShapes[i].get();
         const CueTime t(double(key->frame), 0);
-        std::unique_ptr<OrDagNode> node(scene->isRoot()
-                                            ? scene->childNode()
-                                            : new OrDagNode(scene->documentPtr(), scene->index()));
-        for (; node; node.reset(node->nextNode()))
+        std::unique_ptr<OrDagNode> node =
+            scene->isRoot() ? scene->childNode()
+                            : std::make_unique<OrDagNode>(scene->documentPtr(), scene->index());
+        for (; node; node = node->nextNode())
             extract_dag(t, key->index, node.get());
     }
     for (auto it = keyChannels.begin(); it != keyChannels.end();) {
-        KLKeyChannel* kc = *it;
+        const KLKeyChannel* kc = it->get();
         if (kc->Constant()) {
-            delete kc;
             it = keyChannels.erase(it);
         } else {
             KLInform("Key Channel [%s.%s].\n", kc->Name() ? kc->Name() : "", kc->GetChannelName());

@@ -10,7 +10,9 @@
 #include "model/KLKeyTrack.h"
 #include "scene/KLChannel.h"
 #include "scene/KLKeyFrameList.h"
+#include "scene/KLSplineChannel.h"
 #include "scene/KLWire.h"
+#include "scene/KLWireSetting.h"
 #include "scene/KLWireSource.h"
 #include "scene/OrDagNode.h"
 #include "toolkit/KLErrHandler.h"
@@ -37,15 +39,15 @@ int tangent_code(int smoothing) {
 NodeHandle find_base(KLWireSource* wire, const char* dagName) {
     if (!wire || !dagName)
         return nullptr;
-    NodeHandle root(wire->RootNode());
+    NodeHandle root = wire->RootNode();
     if (!root)
         return nullptr;
-    for (NodeHandle node(root->childNode()); node; node.reset(node->nextNode())) {
+    for (NodeHandle node = root->childNode(); node; node = node->nextNode()) {
         const char* name = KLWire::NodeName(node.get());
         if (name && std::strcmp(name, dagName) == 0)
             return node;
     }
-    return NodeHandle(KLWire::FetchDagNode(root.get(), dagName));
+    return KLWire::FetchDagNode(root.get(), dagName);
 }
 
 // The keys of one curve, one per event inside the range. Arrays hold one spare entry: the
@@ -73,7 +75,7 @@ struct Curve {
     void Store(OrDagNode* node, int channel) const {
         if (count == 0)
             return;
-        KLWire::alwaysClearChannel = 1;
+        KLWireSetting clear(KLWireSetting::kAlwaysClearChannel);
         KLWire::StoreChannel(node, channel, count, times.data(), values.data(), in.data(), nullptr,
                              out.data(), nullptr);
     }
@@ -84,7 +86,7 @@ struct Curve {
 // name demangling on. Sets *ambiguous when the cut name is not unique (or not there at all).
 NodeHandle find_channel_node(OrDagNode* base, const char* name, bool* ambiguous) {
     *ambiguous = false;
-    NodeHandle node(KLWire::FetchDagNode(base, name));
+    NodeHandle node = KLWire::FetchDagNode(base, name);
     if (node)
         return node;
     std::string cut(name);
@@ -92,9 +94,8 @@ NodeHandle find_channel_node(OrDagNode* base, const char* name, bool* ambiguous)
     if (hash != std::string::npos)
         cut.erase(hash);
     if (KLWire::UniqueDagName(base, cut.c_str())) {
-        KLWire::DemangleNames(1);
-        node.reset(KLWire::FetchDagNode(base, cut.c_str()));
-        KLWire::DemangleNames(0);
+        KLWireSetting demangle(KLWireSetting::kDemangleNames);
+        node = KLWire::FetchDagNode(base, cut.c_str());
     } else {
         *ambiguous = true;
     }
@@ -133,7 +134,7 @@ int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, Cu
                    "Dismiss");
 
     if (keySet->kind == 1) {
-        for (KLKeyChannel* kc : keySet->keyChannels) {
+        for (const auto& kc : keySet->keyChannels) {
             const char* name = kc->Name() ? kc->Name() : "";
             if (!kc->Constant())
                 KLInform("Apply [%s.%s]...\n", name, kc->GetChannelName());
@@ -161,9 +162,11 @@ int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, Cu
         }
     } else if (keySet->kind == 2) {
         const char* name = keySet->nodeName ? keySet->nodeName->c_str() : "";
-        KLWire::DemangleNames(1);
-        NodeHandle node(KLWire::FetchDagNode(base.get(), name));
-        KLWire::DemangleNames(0);
+        NodeHandle node;
+        {
+            KLWireSetting demangle(KLWireSetting::kDemangleNames);
+            node = KLWire::FetchDagNode(base.get(), name);
+        }
         if (!node) {
             return imp.Confirm(KLFmt("Could not locate apply dag [%s].", name).c_str(), "Continue",
                                "Cancel")

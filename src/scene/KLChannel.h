@@ -1,10 +1,12 @@
 #pragma once
 
+#include <cstddef>
 #include <vector>
 
 #include "toolkit/CueTime.h"
 
-// A scalar animation channel of the 3D preview: keyed storage of (time, value) keys evaluated
+// A scalar animation channel of the 3D preview (not a keyset's key channel, model/KLKeyChannel.h,
+// nor a curve of a scene file, scene/OrChannel.h): keyed storage of (time, value) keys evaluated
 // with linear interpolation between keys and held before the first and after the last, or a
 // static value while the channel is marked static.
 class KLChannel {
@@ -30,14 +32,11 @@ class KLChannel {
         CueTime time;
         float value;
     };
+    // Index of the first key at or after `t` (keys_.size() when there is none).
+    size_t keyAtOrAfter(CueTime t) const;
+
     std::vector<Key> keys_;  // in time order
     bool keyed_ = false;
     bool static_ = false;
     float staticValue_ = 0.0f;
-};
-
-// A channel whose keys are joined by a smooth (Catmull-Rom) curve.
-class KLSplineChannel : public KLChannel {
-  public:
-    float Evaluate(CueTime t) const override;
 };

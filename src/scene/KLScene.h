@@ -8,7 +8,8 @@ class KLGraphNode;
 class KLWireSource;
 
 // The scene shown in the 3D views: the geometry loaded from the keyset's scene file and the
-// display settings. Holds no GL state itself.
+// display settings. Holds no GL state itself. The preview always draws key shapes whole, opaque
+// and with plain shading: there are no settings for delta shapes, transparency or shaders.
 class KLScene {
   public:
     KLScene();
@@ -17,9 +18,6 @@ class KLScene {
     void EvaluateDags() { evaluateDags_ = true; }
     void DontEvaluateDags() { evaluateDags_ = false; }
     void SetDetail(int u, int v) { tessU_ = u, tessV_ = v; }
-    void DoDeltaShape() { deltaShape_ = true; }
-    void HideTransparency() { transparency_ = false; }
-    void HideShaders() { shaders_ = false; }
     // Shading mode 0..3 (wire frame, flat, smooth, textured).
     void Feedback(int mode, void* unused = nullptr) { (void)unused, feedback_ = mode; }
 
@@ -36,9 +34,6 @@ class KLScene {
 
   private:
     bool evaluateDags_ = false;
-    bool deltaShape_ = false;
-    bool transparency_ = true;
-    bool shaders_ = true;
     int feedback_ = 2;
     int tessU_ = 0, tessV_ = 0;
     KLWireSource* source_ = nullptr;  // borrowed

@@ -53,12 +53,6 @@ ChannelCurve::Kind tangent_kind(int code) {
 }
 }  // namespace
 
-KLDagList::~KLDagList() {
-    for (OrDagNode* n : nodes) {
-        delete n;
-    }
-}
-
 void KLWire::Initialize() {
     demangle = false;
     alwaysClearChannel = 0;
@@ -76,7 +70,7 @@ const char* KLWire::NodeName(OrDagNode* node) {
     return node ? node->name() : "";
 }
 
-OrDagNode* KLWire::FetchDagNode(OrDagNode* below, const char* name) {
+std::unique_ptr<OrDagNode> KLWire::FetchDagNode(OrDagNode* below, const char* name) {
     if (!below || !name) {
         return nullptr;
     }
@@ -88,7 +82,7 @@ OrDagNode* KLWire::FetchDagNode(OrDagNode* below, const char* name) {
         found = walk(doc, below->index(),
                      [&](int i) { return doc.NodeName(i).compare(0, prefix.size(), prefix) == 0; });
     }
-    return found == -2 ? nullptr : new OrDagNode(below->documentPtr(), found);
+    return found == -2 ? nullptr : std::make_unique<OrDagNode>(below->documentPtr(), found);
 }
 
 int KLWire::UniqueDagName(OrDagNode* below, const char* name) {
@@ -107,6 +101,10 @@ int KLWire::UniqueDagName(OrDagNode* below, const char* name) {
 
 void KLWire::DemangleNames(int on) {
     demangle = on != 0;
+}
+
+int KLWire::NamesDemangled() {
+    return demangle ? 1 : 0;
 }
 
 OrChannel* KLWire::FindChannel(OrDagNode* node, int channel) {
@@ -147,23 +145,19 @@ int KLWire::StoreChannel(OrDagNode* node, int channel, int count, const CueTime*
     return 1;
 }
 
-KLDagList* KLWire::BuildDagList(OrDagNode* root, int withRoot) {
-    auto* list = new KLDagList;
+std::unique_ptr<KLDagList> KLWire::BuildDagList(OrDagNode* root, int withRoot) {
+    auto list = std::make_unique<KLDagList>();
     if (!root) {
         return list;
     }
     const SceneDocument& doc = *root->document();
     walk(doc, root->index(), [&](int i) {
         if (i != root->index() || withRoot) {
-            list->nodes.push_back(new OrDagNode(root->documentPtr(), i));
+            list->nodes.push_back(std::make_unique<OrDagNode>(root->documentPtr(), i));
         }
         return false;
     });
     return list;
-}
-
-void KLWire::DeleteDagList(KLDagList* list) {
-    delete list;
 }
 
 void KLWire::NukeBlendSurfaces(OrDagNode* /*root*/) {}

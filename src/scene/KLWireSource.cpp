@@ -5,10 +5,6 @@
 #include "scene/OrDagNode.h"
 #include "scene/SceneDocument.h"
 
-namespace {
-KLWireSource* active = nullptr;
-}
-
 KLWireSource::KLWireSource(const char* path) : path_(path ? path : "") {
     if (!path) {
         error_ = "Cannot open scene file []: no file name given";
@@ -17,11 +13,7 @@ KLWireSource::KLWireSource(const char* path) : path_(path ? path : "") {
     doc_ = SceneDocument::Load(path_, &error_);
 }
 
-KLWireSource::~KLWireSource() {
-    if (active == this) {
-        active = nullptr;
-    }
-}
+KLWireSource::~KLWireSource() = default;
 
 bool KLWireSource::Valid() const {
     return doc_ != nullptr;
@@ -33,8 +25,8 @@ const std::string& KLWireSource::Path() const {
     return path_;
 }
 
-OrDagNode* KLWireSource::RootNode() const {
-    return doc_ ? new OrDagNode(doc_, -1) : nullptr;
+std::unique_ptr<OrDagNode> KLWireSource::RootNode() const {
+    return doc_ ? std::make_unique<OrDagNode>(doc_, -1) : nullptr;
 }
 
 int KLWireSource::Store(const char* path) {
@@ -49,11 +41,4 @@ int KLWireSource::Store(const char* path) {
     }
     std::cerr << error << std::endl;
     return 0;
-}
-
-void KLWireSource::Activate() {
-    active = this;
-}
-KLWireSource* KLWireSource::Active() {
-    return active;
 }

@@ -19,15 +19,11 @@ class KLWireSource {
 
     // A new handle on the scene's root group (its children are the scene's root nodes);
     // null when the scene is not valid.
-    OrDagNode* RootNode() const;
+    std::unique_ptr<OrDagNode> RootNode() const;
     // Writes the scene, with every channel stored into it, to `path` (.gltf or .glb by the
     // name's ending) through a temporary file renamed into place. Returns 1 on success, 0
     // with a message on the error stream naming the file.
     int Store(const char* path);
-
-    // The scene-file reader that scene operations refer to.
-    void Activate();
-    static KLWireSource* Active();
 
     SceneDocument* document() const { return doc_.get(); }
 

@@ -6,14 +6,14 @@ OrDagNode* OrDagNode::asGroupNodePtr() {
     return isRoot() || doc_->HasChildren(index_) ? this : nullptr;
 }
 
-OrDagNode* OrDagNode::childNode() const {
-    int child = doc_->FirstChild(index_);
-    return child < 0 ? nullptr : new OrDagNode(doc_, child);
+std::unique_ptr<OrDagNode> OrDagNode::childNode() const {
+    const int child = doc_->FirstChild(index_);
+    return child < 0 ? nullptr : std::make_unique<OrDagNode>(doc_, child);
 }
 
-OrDagNode* OrDagNode::nextNode() const {
-    int next = doc_->NextSibling(index_);
-    return next < 0 ? nullptr : new OrDagNode(doc_, next);
+std::unique_ptr<OrDagNode> OrDagNode::nextNode() const {
+    const int next = doc_->NextSibling(index_);
+    return next < 0 ? nullptr : std::make_unique<OrDagNode>(doc_, next);
 }
 
 const char* OrDagNode::name() const {

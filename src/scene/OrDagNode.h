@@ -6,7 +6,7 @@ class SceneDocument;
 
 // A handle on one node of an open scene (or on the scene's synthetic root group, whose
 // children are the scene's root nodes). Handles are small objects handed out by the scene
-// layer; whoever receives one deletes it when done. A handle must not outlive its scene.
+// layer as std::unique_ptr. A handle keeps its scene document alive.
 class OrDagNode {
   public:
     OrDagNode(std::shared_ptr<SceneDocument> doc, int index)
@@ -16,8 +16,8 @@ class OrDagNode {
     // result is this very handle, not a new one.
     OrDagNode* asGroupNodePtr();
     // New handles on the first child and on the next sibling; null when there is none.
-    OrDagNode* childNode() const;
-    OrDagNode* nextNode() const;
+    std::unique_ptr<OrDagNode> childNode() const;
+    std::unique_ptr<OrDagNode> nextNode() const;
     // The node's unique name in its scene (see KLWire::NodeName).
     const char* name() const;
 

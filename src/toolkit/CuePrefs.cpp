@@ -24,9 +24,9 @@ Dirs& dirs() {
             d.project.pop_back();
         if (!d.project.empty()) {
             const char* misc = CuePrefs::Variable("TESSEL_MISC_DIR");
-            d.misc = d.project + "/" + (misc ? misc : "misc_data");
-            d.wire = d.project + "/wire";
-            d.pix = d.project + "/pix";
+            d.misc = KLFilePath::Join(d.project.c_str(), misc ? misc : "misc_data");
+            d.wire = KLFilePath::Join(d.project.c_str(), "wire");
+            d.pix = KLFilePath::Join(d.project.c_str(), "pix");
         } else {
             d.misc = d.wire = d.pix = "";
         }

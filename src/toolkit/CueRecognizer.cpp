@@ -7,6 +7,7 @@
 #include "toolkit/CuePrefs.h"
 #include "toolkit/CueStatement.h"
 #include "toolkit/KLErrHandler.h"
+#include "toolkit/KLFilePath.h"
 #include "toolkit/KLString.h"
 
 namespace {
@@ -148,13 +149,13 @@ bool CueRecognizer::GuardedRecognize(const CueSound& sound) {
     return false;
 }
 
-CueRecognizer* CueRecognizer::GuardedClone() const {
-    CueRecognizer* copy = nullptr;
-    guard(*this, [&] { copy = Clone(); });
+std::unique_ptr<CueRecognizer> CueRecognizer::GuardedClone() const {
+    std::unique_ptr<CueRecognizer> copy;
+    guard(*this, [&] { copy.reset(Clone()); });
     return copy;
 }
 
 std::string CueRecognizer::ConfigFileName() const {
     const char* dir = CuePrefs::MiscDir();
-    return KLFmt("%s/%s.config", dir ? dir : ".", Name());
+    return KLFilePath::Join(dir ? dir : ".", KLFmt("%s.config", Name()).c_str());
 }

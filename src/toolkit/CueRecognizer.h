@@ -1,6 +1,7 @@
 #pragma once
 
 #include <iosfwd>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -50,7 +51,7 @@ class CueRecognizer {
     int shown = 0;  // 1 while the settings panel is up
     // Time between two results; ResetSettings restores defaultStep (one frame at 30 frames
     // per second unless the plug-in sets another).
-    CueTime defaultStep = CueTime::FromTicks(CueTime::kTicksPerSecond / 30);
+    CueTime defaultStep = CueTime::FromTicks(CueTime::kTicksPerSecond / CueTime::kDefaultFps);
     CueTime step = defaultStep;
     std::vector<Result> results;
     std::vector<Target> targets;
@@ -84,7 +85,7 @@ class CueRecognizer {
     bool GuardedWriteSettings(std::ostream& out) const;
     bool GuardedResetSettings();
     bool GuardedRecognize(const CueSound& sound);
-    CueRecognizer* GuardedClone() const;
+    std::unique_ptr<CueRecognizer> GuardedClone() const;
 
     // The recognizer's settings file "%s/%s.config": the data directory (CuePrefs::MiscDir)
     // when a project is set, else the current directory ".", and the recognizer's name.

@@ -7,16 +7,12 @@
 #include <limits>
 #include <ostream>
 
-int CueTime::default_fps = 30;
+int CueTime::default_fps = CueTime::kDefaultFps;
 int CueTime::binaryIO = 0;
 
-namespace {
-
-int rate_or_default(int fps) {
-    return fps > 0 ? fps : (CueTime::default_fps > 0 ? CueTime::default_fps : 30);
+int CueTime::Rate(int fps) {
+    return fps > 0 ? fps : (default_fps > 0 ? default_fps : kDefaultFps);
 }
-
-}  // namespace
 
 int32_t CueTime::ClampTicks(double ticks) {
     if (std::isnan(ticks))
@@ -38,7 +34,7 @@ CueTime CueTime::Saturated(int64_t ticks) {
 }
 
 CueTime::CueTime(double frames, int fps)
-    : ticks_(ClampTicks(frames * kTicksPerSecond / rate_or_default(fps))) {}
+    : ticks_(ClampTicks(frames * kTicksPerSecond / Rate(fps))) {}
 
 CueTime::CueTime(int hours, int minutes, int seconds, int frames, int fps) {
     SetTimecode(hours, minutes, seconds, frames, fps);
@@ -50,12 +46,11 @@ CueTime CueTime::FromSeconds(double seconds) {
 
 void CueTime::SetTimecode(int hours, int minutes, int seconds, int frames, int fps) {
     const double secs = hours * 3600.0 + minutes * 60.0 + seconds;
-    ticks_ = ClampTicks(secs * kTicksPerSecond +
-                        double(frames) * kTicksPerSecond / rate_or_default(fps));
+    ticks_ = ClampTicks(secs * kTicksPerSecond + double(frames) * kTicksPerSecond / Rate(fps));
 }
 
 double CueTime::Frames(int fps) const {
-    return ticks_ * (rate_or_default(fps) / double(kTicksPerSecond));
+    return ticks_ * (Rate(fps) / double(kTicksPerSecond));
 }
 
 int CueTime::Frame(int fps) const {
@@ -74,7 +69,7 @@ void CueTime::Timecode(int* hours, int* minutes, int* seconds, int* frames, bool
     if (seconds)
         *seconds = int(whole % 60);
     if (frames)
-        *frames = int(rest * rate_or_default(fps) / kTicksPerSecond);
+        *frames = int(rest * Rate(fps) / kTicksPerSecond);
     if (negative)
         *negative = ticks_ < 0;
 }

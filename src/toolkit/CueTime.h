@@ -12,8 +12,12 @@
 class CueTime {
   public:
     static constexpr int32_t kTicksPerSecond = 6000;
-    static int default_fps;  // the workspace frame rate, 30 unless Imp::SetFps changes it
-    static int binaryIO;     // nonzero: Write/Read use the binary form
+    static constexpr int kDefaultFps = 30;  // the frame rate when none is set
+    static int default_fps;  // the workspace frame rate, kDefaultFps unless Imp::SetFps changes it
+    // The frame rate that conversions use: `fps` when positive, else default_fps when
+    // positive, else kDefaultFps.
+    static int Rate(int fps = 0);
+    static int binaryIO;  // nonzero: Write/Read use the binary form
 
     constexpr CueTime() = default;
     // `frames` frames at `fps` frames per second; fps <= 0 means default_fps.

@@ -13,10 +13,8 @@
 #include "scene/KLKeyFrameList.h"
 #include "scene/KLScene.h"
 #include "scene/KLWireSource.h"
-#include "toolkit/CuePrefs.h"
 #include "toolkit/CueSound.h"
 #include "toolkit/KLImageSGI.h"
-#include "toolkit/KLString.h"
 #include "toolkit/KLString.h"
 #include "toolkit/OnSignal.h"
 #include "workspace/ConsoleGhost.h"
@@ -36,7 +34,7 @@ const int kCrashSignals[] = {SIGSEGV, SIGSYS,  SIGTERM, SIGBUS,  SIGFPE,
 Imp::Imp() {
     // The display settings reach the scene again at the next keyset clear or load, once the
     // entry has set the tesselation levels.
-    scene = make_scene(true);
+    scene = make_scene();
     duration = CueTime(0, 0, 5, 0, 0);
     for (int sig : kCrashSignals)
         OnSignal(sig, &Imp::save_on_crash, nullptr);
@@ -51,28 +49,14 @@ Imp::~Imp() {
     }
 }
 
-std::unique_ptr<KLScene> Imp::make_scene(bool deltaShape) {
+std::unique_ptr<KLScene> Imp::make_scene() {
     auto made = std::make_unique<KLScene>();
     if (evaluateDags)
         made->EvaluateDags();
     else
         made->DontEvaluateDags();
     made->SetDetail(tessU, tessV);
-    if (deltaShape)
-        made->DoDeltaShape();
-    made->HideTransparency();
-    made->HideShaders();
     return made;
-}
-
-const char* Imp::GetPixDirectory() {
-    return CuePrefs::PixDir();
-}
-const char* Imp::GetWireDirectory() {
-    return CuePrefs::WireDir();
-}
-const char* Imp::GetDataDirectory() {
-    return CuePrefs::MiscDir();
 }
 
 void Imp::Inform(const char* message, const char* button) {
@@ -105,7 +89,7 @@ void Imp::SetFps(int n) {
             report(message);
         n = kMaxFps;
     }
-    fps = n > 0 ? n : 30;
+    fps = n > 0 ? n : CueTime::kDefaultFps;
     CueTime::default_fps = fps;
 }
 

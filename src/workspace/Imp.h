@@ -50,10 +50,7 @@ class Imp : public KLStdImp {
     Imp();
     ~Imp() override;
 
-    // --- KLStdImp
-    const char* GetPixDirectory() override;
-    const char* GetWireDirectory() override;
-    const char* GetDataDirectory() override;
+    // --- KLStdImp (the directories are the base's: the preference directories)
     float DefaultKeyFrame() override { return wireFrame; }
     void SetTrackModified() override { trackModified = 1; }
     int KeyFramePreparation() override { return geometryActive; }
@@ -159,9 +156,13 @@ class Imp : public KLStdImp {
     void parse_shapeset(CueStatement& s, std::istream& in);
     void parse_recog(std::istream& in, const char* recognizer, const char* keyset);
     void parse_recog_links(std::istream& in, const char* recognizer, const char* keyset);
+    // Keyset description loading, in the order LoadKeyset runs them.
+    void check_project(const char* name);
+    bool load_wire_file();
     int read_wire_file(const char* name);
+    void show_keysets();
     // A new scene with the workspace's display settings.
-    std::unique_ptr<KLScene> make_scene(bool deltaShape);
+    std::unique_ptr<KLScene> make_scene();
     // Reports a load failure: Inform with "Dismiss" interactively, a line on the error
     // stream in batch mode.
     void report(const std::string& message);

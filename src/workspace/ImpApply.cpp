@@ -24,7 +24,6 @@ int Imp::ApplyWire(KLWireSource* source, const char* keyset, const char* dag, Cu
                    CueTime end, CueTime offset) {
     if (!source || !keyset)
         return 0;
-    source->Activate();
     int result = 0;
     // Every keyset of that name, in slot order; a failure does not stop the later ones.
     for (int i = 0; i < keysetCount; ++i) {
@@ -32,8 +31,6 @@ int Imp::ApplyWire(KLWireSource* source, const char* keyset, const char* dag, Cu
         if (name && !std::strcmp(name, keyset))
             result = keyTracks[i]->Apply(source, dag, start, end, offset);
     }
-    if (wireSource)
-        wireSource->Activate();
     return result;
 }
 

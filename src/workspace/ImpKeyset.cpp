@@ -98,18 +98,20 @@ void Imp::parse_recog(std::istream& in, const char* recognizer, const char* keys
         report(KLFmt("Failed to find key set [%s].", keyset));
         return;  // the block is left to the top level, which skips its lines
     }
+    // A recognizer the keyset already holds is read again in place, not listed twice.
     CueRecognizer* r = set->GetRecognizer(recognizer);
-    const bool fetched = r == nullptr;
-    if (fetched)
-        r = recognizers.FetchRecognizer(recognizer);
+    std::unique_ptr<CueRecognizer> fetched;
+    if (!r) {
+        fetched = recognizers.FetchRecognizer(recognizer);
+        r = fetched.get();
+    }
     if (!r) {
         report(KLFmt("Failed to find recognizer plugin [%s].", recognizer));
         return;
     }
     r->GuardedReadSettings(in);
-    // A recognizer the keyset already holds is read again in place, not listed twice.
     if (fetched)
-        set->AddRecognizer(r);
+        set->AddRecognizer(std::move(fetched));
 }
 
 void Imp::parse_recog_links(std::istream& in, const char* recognizer, const char* keyset) {
@@ -150,7 +152,7 @@ int Imp::read_wire_file(const char* name) {
     if (!source->Valid())
         return 0;  // the caller tells that the scene could not be read
     wireSource = std::move(source);
-    std::unique_ptr<OrDagNode> root(wireSource->RootNode());
+    std::unique_ptr<OrDagNode> root = wireSource->RootNode();
     KLWire::NukeBlendSurfaces(root.get());
 
     // The scene frames of the key shapes of all frame keysets, in keyset and key-shape order;
@@ -166,9 +168,8 @@ int Imp::read_wire_file(const char* name) {
         }
         KLInform("KEYSET %s.\n", set->Name());
         if (set->sourceFile) {
-            std::unique_ptr<OrDagNode> node(
-                KLWire::FetchDagNode(root.get(), set->sourceFile->c_str()));
-            if (node)
+            if (std::unique_ptr<OrDagNode> node =
+                    KLWire::FetchDagNode(root.get(), set->sourceFile->c_str()))
                 set->ExtractKeys(node.get());
             else
                 KLWarning("Keyset [%s]: no node [%s] in the wire file, no key channels.\n",
@@ -183,6 +184,82 @@ int Imp::read_wire_file(const char* name) {
     return 1;
 }
 
+// A description outside the data directory may belong to another project: when its folder
+// is named like a data folder, offer to switch to the project above it.
+void Imp::check_project(const char* name) {
+    const std::string dir = KLFilePath::Directory(name);
+    const char* misc = GetDataDirectory();
+    if (misc && canonical_dir(dir) == canonical_dir(misc))
+        return;
+    const std::string last = KLFilePath::Basename(canonical_dir(dir).c_str());
+    const char* miscName = CuePrefs::Variable("TESSEL_MISC_DIR");
+    if ((miscName && last == miscName) || last == "misc_data") {
+        const std::string project = KLFilePath::Directory(canonical_dir(dir).c_str());
+        if (theGhost->Confirm(KLFmt("Change TESSEL_PROJECT to [%s]?", project.c_str()).c_str(),
+                              "Change", "Don't Change")) {
+            CuePrefs::SetProject(project.c_str());
+            theGhost->ResetFileManagers();
+        }
+    } else {
+        theGhost->Inform("Can't determine new TESSEL_PROJECT, unchanged", "OK");
+    }
+}
+
+// Reads the description's scene file (the wire file); false, told and with the keysets
+// cleared, when there is none or it cannot be read.
+bool Imp::load_wire_file() {
+    const std::string wirePath = KLFilePath::Join(GetWireDirectory(), wireFile.c_str());
+    // Parsed once, by read_wire_file.
+    bool readable = !wireFile.empty() && KLFilePath::Exists(wirePath.c_str()) &&
+                    KLFilePath::IsReadable(wirePath.c_str());
+    if (readable) {
+        const std::string written = wireFile;
+        KLStatus("Reading wire file [%s].", written.c_str());
+        readable = read_wire_file(written.c_str());
+    }
+    if (readable)
+        return true;
+    if (batchMode) {
+        if (wireFile.empty())
+            std::cerr << "No wire file!" << std::endl;
+        else
+            std::cerr << "Could not read wire file " << wirePath << ", cannot load keyset"
+                      << std::endl;
+        batchStop = 1;
+    } else {
+        theGhost->Inform("Could not read wire file, cannot load keyset", "Dismiss");
+    }
+    clear_keyset_data();
+    return false;
+}
+
+// Interactive: the window learns of the new keysets, and the scene's geometry is loaded with
+// each shape set's node made the control node of its key track.
+void Imp::show_keysets() {
+    for (int i = 0; i < keysetCount; ++i)
+        theGhost->InitKeyset(i);
+    theGhost->DressKeysetMenu();
+    theGhost->InitSound(sound.get());
+    theGhost->InitMarkTrack(markTrack.get());
+    if (geometryActive) {
+        scene->LoadGeometry(wireSource.get());
+        scene->SetDetail(tessU, tessV);
+        scene->Feedback(feedback, nullptr);
+        for (int i = 0; i < keysetCount; ++i) {
+            KLKeySet* set = keySets[i].get();
+            if (set->kind != 2 || !set->nodeName)
+                continue;
+            if (KLGraphNode* node = scene->FetchNode(set->nodeName->c_str()))
+                keyTracks[i]->SetControlGraphNode(node);
+            else
+                std::cerr << "Couldn't find keyset node " << *set->nodeName << std::endl;
+        }
+    }
+    theGhost->SetActiveKeyset(activeKeyset);
+    theGhost->CenterKeyView();
+    theGhost->CenterMixView();
+}
+
 int Imp::LoadKeyset(const char* name) {
     std::ifstream in(name ? name : "");
     if (!name || !in || KLFilePath::IsDirectory(name)) {
@@ -190,27 +267,8 @@ int Imp::LoadKeyset(const char* name) {
         return 0;
     }
     batchStop = 0;
-
-    if (!batchMode) {
-        // A description outside the data directory may belong to another project.
-        const std::string dir = KLFilePath::Directory(name);
-        const char* misc = GetDataDirectory();
-        if (!misc || canonical_dir(dir) != canonical_dir(misc)) {
-            const std::string last = KLFilePath::Basename(canonical_dir(dir).c_str());
-            const char* miscName = CuePrefs::Variable("TESSEL_MISC_DIR");
-            if ((miscName && last == miscName) || last == "misc_data") {
-                const std::string project = KLFilePath::Directory(canonical_dir(dir).c_str());
-                if (theGhost->Confirm(
-                        KLFmt("Change TESSEL_PROJECT to [%s]?", project.c_str()).c_str(), "Change",
-                        "Don't Change")) {
-                    CuePrefs::SetProject(project.c_str());
-                    theGhost->ResetFileManagers();
-                }
-            } else {
-                theGhost->Inform("Can't determine new TESSEL_PROJECT, unchanged", "OK");
-            }
-        }
-    }
+    if (!batchMode)
+        check_project(name);
 
     geometryActive = loadGeometry;
     activeKeyset = 0;
@@ -221,62 +279,11 @@ int Imp::LoadKeyset(const char* name) {
     if (!batchMode)
         KLStatus("Parsing keyset description.");
     parse_keyset_file(in);
-
-    if (wireFile.empty()) {
-        if (batchMode) {
-            std::cerr << "No wire file!" << std::endl;
-            batchStop = 1;
-        } else {
-            theGhost->Inform("Could not read wire file, cannot load keyset", "Dismiss");
-        }
-        clear_keyset_data();
+    if (!load_wire_file())
         return 0;
-    }
-    const std::string wirePath = KLFilePath::Join(GetWireDirectory(), wireFile.c_str());
-    const std::string written = wireFile;
-    // Parsed once, by read_wire_file.
-    bool readable =
-        KLFilePath::Exists(wirePath.c_str()) && KLFilePath::IsReadable(wirePath.c_str());
-    if (readable) {
-        KLStatus("Reading wire file [%s].", written.c_str());
-        readable = read_wire_file(written.c_str());
-    }
-    if (!readable) {
-        if (batchMode) {
-            std::cerr << "Could not read wire file " << wirePath << ", cannot load keyset"
-                      << std::endl;
-            batchStop = 1;
-        } else {
-            theGhost->Inform("Could not read wire file, cannot load keyset", "Dismiss");
-        }
-        clear_keyset_data();
-        return 0;
-    }
 
-    if (!batchMode) {
-        for (int i = 0; i < keysetCount; ++i)
-            theGhost->InitKeyset(i);
-        theGhost->DressKeysetMenu();
-        theGhost->InitSound(sound.get());
-        theGhost->InitMarkTrack(markTrack.get());
-        if (geometryActive) {
-            scene->LoadGeometry(wireSource.get());
-            scene->SetDetail(tessU, tessV);
-            scene->Feedback(feedback, nullptr);
-            for (int i = 0; i < keysetCount; ++i) {
-                KLKeySet* set = keySets[i].get();
-                if (set->kind != 2 || !set->nodeName)
-                    continue;
-                if (KLGraphNode* node = scene->FetchNode(set->nodeName->c_str()))
-                    keyTracks[i]->SetControlGraphNode(node);
-                else
-                    std::cerr << "Couldn't find keyset node " << *set->nodeName << std::endl;
-            }
-        }
-        theGhost->SetActiveKeyset(activeKeyset);
-        theGhost->CenterKeyView();
-        theGhost->CenterMixView();
-    }
+    if (!batchMode)
+        show_keysets();
     keysetModified = 0;
     if (!batchMode) {
         theGhost->MakeKeysetImages();
@@ -304,12 +311,12 @@ int Imp::VerifyKeysets() {
     // Every ordered pair of keysets: a clash is reported once from each side.
     for (int i = 0; i < keysetCount; ++i) {
         KLKeySet* a = keySets[i].get();
-        for (KLKeyChannel* ca : a->keyChannels) {
+        for (const auto& ca : a->keyChannels) {
             for (int j = 0; j < keysetCount; ++j) {
                 if (j == i)
                     continue;
                 KLKeySet* b = keySets[j].get();
-                for (KLKeyChannel* cb : b->keyChannels) {
+                for (const auto& cb : b->keyChannels) {
                     if (ca->channel != cb->channel || !ca->name || !cb->name ||
                         *ca->name != *cb->name)
                         continue;
@@ -337,7 +344,7 @@ void Imp::clear_keyset_data() {
     }
     keysetCount = 0;
     markTrack = std::make_unique<KLMarkTrack>();
-    scene = make_scene(false);
+    scene = make_scene();
     wireSource.reset();
     wireFile.clear();
     KLWire::EmptyDumpster();
@@ -369,7 +376,7 @@ int Imp::SaveKeyset(const char* name) {
         out << "end\n\n";
         // Oldest first, so that reading the file back (each one put first) keeps the order.
         for (auto it = set->recognizers.rbegin(); it != set->recognizers.rend(); ++it) {
-            CueRecognizer* r = *it;
+            const CueRecognizer* r = it->get();
             const std::string rName = KLQuote(r->Name());
             out << "begin recognizer " << rName << " " << setName << "\n";
             r->GuardedWriteSettings(out);

@@ -18,10 +18,10 @@ class ApplyTest : public ModelTest {
     }
     // A kind-1 channel with one value per key shape; channels are applied in the order added.
     void AddChannel(const char* node, int channel, std::vector<float> values) {
-        auto* c = new KLKeyChannel(node, channel, int(values.size()));
+        auto c = std::make_unique<KLKeyChannel>(node, channel, int(values.size()));
         for (size_t i = 0; i < values.size(); ++i)
             c->Set(int(i), values[i]);
-        set.keyChannels.push_back(c);
+        set.keyChannels.push_back(std::move(c));
     }
     void Key(int shape, double frame, int smoothing, float value) {
         track.InsertKey(shape, Frames(frame), set.GetKeyShape(shape), smoothing, value);
@@ -107,6 +107,8 @@ TEST_F(ApplyTest, NameRulesContinueAndCancel) {
     EXPECT_EQ(Keys("lip#2", KLKeyChannel::kTZ), "1 2 2 2");
     EXPECT_EQ(Keys("lip", KLKeyChannel::kTX), "-");
     EXPECT_EQ(Keys("brow", KLKeyChannel::kTX), "-") << "after the cancel";
+    EXPECT_FALSE(KLWire::NamesDemangled() || KLWire::alwaysClearChannel)
+        << "the settings apply switches on are off again, after a cancel too";
 }
 
 // Kind 2 writes the values as they stand on its node and channel; a missing node asks.

@@ -8,6 +8,7 @@
 #include "scene/EulerRotation.h"
 #include "scene/KLChannel.h"
 #include "scene/KLKeyFrameList.h"
+#include "scene/KLSplineChannel.h"
 #include "toolkit/CueTime.h"
 
 namespace {

@@ -6,15 +6,17 @@
 
 #include "scene/KLGraphNode.h"
 #include "scene/KLScene.h"
+#include "scene/KLWireSetting.h"
 #include "scene/SceneDocument.h"
 #include "scene/scene_util.h"
+#include "testkit/CaptureStderr.h"
 
 namespace {
 std::string NamesOf(OrDagNode* top, int withTop) {
-    std::unique_ptr<KLDagList> list(KLWire::BuildDagList(top, withTop));
+    std::unique_ptr<KLDagList> list = KLWire::BuildDagList(top, withTop);
     std::string out;
-    for (OrDagNode* n : list->nodes) {
-        out += std::string(out.empty() ? "" : " ") + KLWire::NodeName(n);
+    for (const auto& n : list->nodes) {
+        out += std::string(out.empty() ? "" : " ") + KLWire::NodeName(n.get());
     }
     return out;
 }
@@ -58,7 +60,7 @@ TEST_P(FaceScene, ReadsAndRoundTrips) {
     ASSERT_TRUE(face.Open(dir + (GetParam() == kBinary ? "/f.glb" : "/f.gltf")));
     OrDagNode* root = face.root.get();
     EXPECT_EQ(NamesOf(root, 1), "face head jaw lip#2 brow node3 lip");
-    Node head(root->childNode()), jaw = face.Fetch("jaw"), brow = face.Fetch("brow");
+    Node head = root->childNode(), jaw = face.Fetch("jaw"), brow = face.Fetch("brow");
     ASSERT_TRUE(head && jaw && brow);
     EXPECT_EQ(NamesOf(head.get(), 0), "jaw lip#2 brow node3 lip");
     EXPECT_TRUE(root->asGroupNodePtr() == root && !brow->asGroupNodePtr() && !head->nextNode());
@@ -67,9 +69,12 @@ TEST_P(FaceScene, ReadsAndRoundTrips) {
     EXPECT_TRUE(KLWire::UniqueDagName(jaw.get(), "lip"));  // only lip#2 is below the jaw
     // Demangling finds "lip" as lip#2 below the jaw; an exact name still wins over a suffixed one.
     EXPECT_EQ(face.Fetch("lip", jaw.get()), nullptr);
-    KLWire::DemangleNames(1);
-    Node found = face.Fetch("lip", jaw.get()), lip = face.Fetch("lip");
-    KLWire::DemangleNames(0);
+    Node found, lip;
+    {
+        KLWireSetting demangle(KLWireSetting::kDemangleNames);
+        found = face.Fetch("lip", jaw.get()), lip = face.Fetch("lip");
+    }
+    EXPECT_FALSE(KLWire::NamesDemangled()) << "off again after the scope";
     ASSERT_TRUE(found && lip);
     EXPECT_STREQ(found->name(), "lip#2");
     EXPECT_STREQ(lip->name(), "lip");
@@ -153,12 +158,14 @@ TEST(SceneEdges, NamesStoreRejectsAndFailures) {
     ASSERT_EQ(StoreKeys(box.get(), 2, {}), 1);
     EXPECT_EQ(KLWire::FindChannel(box.get(), 2), nullptr);
     // A failed store names the file and writes nothing.
-    testing::internal::CaptureStderr();
-    EXPECT_EQ(scene.source->Store(bad.c_str()), 0);
-    EXPECT_NE(testing::internal::GetCapturedStderr().find(bad), std::string::npos);
-    testing::internal::CaptureStderr();
-    EXPECT_EQ(KLWireSource((dir + "/missing.glb").c_str()).Store(out.c_str()), 0);
-    EXPECT_NE(testing::internal::GetCapturedStderr().find(out), std::string::npos);
+    int stored = -1;
+    EXPECT_NE(testkit::StdErr([&] { stored = scene.source->Store(bad.c_str()); }).find(bad),
+              std::string::npos);
+    EXPECT_EQ(stored, 0);
+    const std::string told = testkit::StdErr(
+        [&] { stored = KLWireSource((dir + "/missing.glb").c_str()).Store(out.c_str()); });
+    EXPECT_EQ(stored, 0);
+    EXPECT_NE(told.find(out), std::string::npos);
     // Stored twice over the same file: replaced whole, no temporary file left behind.
     ASSERT_EQ(scene.source->Store(out.c_str()), 1);
     ASSERT_EQ(scene.source->Store(out.c_str()), 1);

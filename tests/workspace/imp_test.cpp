@@ -149,7 +149,6 @@ TEST_F(ImpTest, ApplyCoversTheWorkspaceAndEveryKeysetOfTheName) {
                 ElementsAre("Inform(Cannot find base dag [nothere] for apply ...|Dismiss)",
                             "Inform(Cannot find base dag [nothere] for apply ...|Dismiss)"));
     EXPECT_EQ(apply("mouth", "head", target), 1);
-    EXPECT_EQ(KLWireSource::Active(), theImp.wireSource.get()) << "the workspace's scene again";
     const std::string out = dir / "wire/out.gltf";
     ASSERT_EQ(event.StoreWire(out.c_str()), 1);
     EXPECT_NEAR(*EvalChannel(out, "jaw", 1, 6), 2.0, 1e-4) << "from the first keyset";

@@ -45,7 +45,7 @@ TEST_F(KeysetTest, LoadExtractsTheChangingChannelsAndABatchLoadOnlyClears) {
     KLKeySet* mouth = theImp.GetKeySet(0);
     EXPECT_EQ(mouth->keyShapeCount, 3);
     std::vector<std::string> channels;
-    for (KLKeyChannel* c : mouth->keyChannels)
+    for (const auto& c : mouth->keyChannels)
         channels.push_back(std::string(c->Name()) + "." + c->GetChannelName());
     std::sort(channels.begin(), channels.end());
     EXPECT_THAT(channels, ElementsAre("jaw.TY", "lip.TX", "lip.TZ"));

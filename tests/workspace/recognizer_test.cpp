@@ -161,7 +161,7 @@ TEST(PluginLifetime, RecognizersOutliveTheirCatalogue) {
     {
         CueRecognizerCatalog catalog;
         ASSERT_EQ(catalog.ScanDirectory(kGoodPlugins.c_str()), 1);
-        r.reset(catalog.FetchRecognizer("Level"));
+        r = catalog.FetchRecognizer("Level");
     }
     ASSERT_TRUE(r->GuardedRecognize(*steps_of({0.9f})));
     EXPECT_THAT(target_indices(*r), ElementsAre(2));

@@ -1,4 +1,4 @@
-#include "scene/KLGraphNode.h"
+#include "scene/KLTransform.h"
 
 KLChannel* KLTransform::AnimateChannel(int c) {
     if (c < 0 || c >= 9) {
