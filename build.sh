@@ -49,6 +49,8 @@ bench)
             "$b"
         fi
     done
+    bench/startup.sh build
+    bench/batch-memory.sh build
     ;;
 *)
     echo "usage: ./build.sh demo|test|fuzz|bench" >&2

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "scene/KLWire.h"
+#include "scene/KLWireSetting.h"
 #include "scene/OrDagNode.h"
 #include "scene/SceneDocument.h"
 #include "toolkit/CueTime.h"
@@ -43,7 +44,7 @@ void run(const uint8_t* data, size_t size) {
     volatile double sink = walk(&root, 0);
     (void)sink;
     std::unique_ptr<KLDagList> list = KLWire::BuildDagList(&root, 1);
-    for (OrDagNode* n : list->nodes) {
+    for (const auto& n : list->nodes) {
         KLWire::UniqueDagName(&root, n->name());
     }
     // Replace two channels of the first node and write the scene out and back in: the writer
@@ -53,9 +54,10 @@ void run(const uint8_t* data, size_t size) {
                             CueTime::FromTicks(3000)};
         float values[3] = {0.0f, 1.5f, -2.0f};
         int in[3] = {0, 1, 2}, out[3] = {2, 0, 1};
-        KLWire::alwaysClearChannel = 1;
-        KLWire::StoreChannel(list->nodes[1], 1, 3, times, values, in, nullptr, out, nullptr);
-        KLWire::StoreChannel(list->nodes[1], 4, 3, times, values, in, nullptr, out, nullptr);
+        KLWireSetting clear(KLWireSetting::kAlwaysClearChannel);
+        OrDagNode* node = list->nodes[1].get();
+        KLWire::StoreChannel(node, 1, 3, times, values, in, nullptr, out, nullptr);
+        KLWire::StoreChannel(node, 4, 3, times, values, in, nullptr, out, nullptr);
         static const std::string path = "/tmp/scene_fuzz_" + std::to_string(getpid()) + ".glb";
         if (doc->Store(path, &error)) {
             auto back = SceneDocument::Load(path, &error);

@@ -7,6 +7,8 @@
 #include "scene/KLWire.h"
 #include "scene/OrDagNode.h"
 #include "toolkit/KLErrHandler.h"
+#include "toolkit/KLStdImp.h"
+#include "toolkit/KLString.h"
 
 void KLKeySet::extract_dag(CueTime t, int index, OrDagNode* top) {
     if (!top)
@@ -66,6 +68,9 @@ void KLKeySet::ExtractKeys(OrDagNode* scene) {
         }
     }
     if (keyChannels.empty() && keyShapeCount > 1)
-        KLWarning("Keyset [%s]: its key shapes differ in no channel, so it has no key channels.\n",
-                  Name() ? Name() : "");
+        KLStdImp::Workspace().Inform(
+            KLFmt("Keyset [%s]: its key shapes differ in no channel, so it has no key channels.",
+                  Name() ? Name() : "")
+                .c_str(),
+            "Dismiss");
 }

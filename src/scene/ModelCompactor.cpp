@@ -204,7 +204,7 @@ size_t ModelCompactor::appendToFirst(const std::vector<unsigned char>& bytes) {
     return at;
 }
 
-void ModelCompactor::PackIntoFirstBuffer() {
+void ModelCompactor::PackIntoFirstBuffer(bool moveBuffers) {
     bool images = false;
     for (const tinygltf::Image& image : m_.images) {
         images = images || (image.bufferView < 0 && !image.image.empty() &&
@@ -220,19 +220,9 @@ void ModelCompactor::PackIntoFirstBuffer() {
     if (!RenumberingSafe()) {
         return;  // buffer 0 still travels in the binary chunk; the others stay as they are
     }
-    std::vector<size_t> base(m_.buffers.size(), 0);
-    for (size_t b = 1; b < m_.buffers.size(); ++b) {
-        base[b] = appendToFirst(m_.buffers[b].data);
-        m_.buffers[b].data.clear();
-        m_.buffers[b].data.shrink_to_fit();
+    if (moveBuffers) {
+        moveIntoFirst();
     }
-    for (tinygltf::BufferView& v : m_.bufferViews) {
-        if (v.buffer > 0) {
-            v.byteOffset += base[size_t(v.buffer)];
-            v.buffer = 0;
-        }
-    }
-    m_.buffers.resize(1);
     for (tinygltf::Image& image : m_.images) {
         if (image.bufferView >= 0 || image.image.empty() ||
             !(image.uri.empty() || image.uri.rfind("data:", 0) == 0)) {
@@ -250,4 +240,20 @@ void ModelCompactor::PackIntoFirstBuffer() {
         image.image.clear();
         m_.bufferViews.push_back(view);
     }
+}
+
+void ModelCompactor::moveIntoFirst() {
+    std::vector<size_t> base(m_.buffers.size(), 0);
+    for (size_t b = 1; b < m_.buffers.size(); ++b) {
+        base[b] = appendToFirst(m_.buffers[b].data);
+        m_.buffers[b].data.clear();
+        m_.buffers[b].data.shrink_to_fit();
+    }
+    for (tinygltf::BufferView& v : m_.bufferViews) {
+        if (v.buffer > 0) {
+            v.byteOffset += base[size_t(v.buffer)];
+            v.buffer = 0;
+        }
+    }
+    m_.buffers.resize(1);
 }

@@ -21,12 +21,14 @@ class ModelCompactor {
     void RemoveUnusedAccessors(const std::set<int>& candidates);
     // Removes every buffer that no buffer view uses.
     void RemoveUnusedBuffers();
-    // Moves the bytes of every other buffer, and of every image held as bytes outside a buffer
-    // view, into buffer 0 (made when there is none), whose uri is cleared.
-    void PackIntoFirstBuffer();
+    // For a .glb: moves every image held as bytes outside a buffer view into buffer 0 (made
+    // when there is none), whose uri is cleared, and with `moveBuffers` the bytes of every
+    // other buffer too (without, the serialiser joins them as it writes the binary chunk).
+    void PackIntoFirstBuffer(bool moveBuffers);
 
   private:
     void compactBuffers(const std::set<int>& buffers);
+    void moveIntoFirst();
     // Appends bytes at a 16-byte boundary of buffer 0; returns their offset.
     size_t appendToFirst(const std::vector<unsigned char>& bytes);
 

@@ -79,7 +79,9 @@ bool slerp_fits(const std::vector<double>& times, const std::vector<EulerRotatio
     double dot = a[0] * b[0] + a[1] * b[1] + a[2] * b[2] + a[3] * b[3];
     double sign = dot < 0 ? -1.0 : 1.0;
     dot *= sign;
-    double angle = dot < 0.9999999 ? std::acos(dot) : 0.0, s = std::sin(angle);
+    // Between quaternions less than 0.01 radians apart the normalised straight line misses the
+    // spherical one by under 1e-5 degrees, far inside the margin: no sines needed.
+    double angle = dot < 0.99995 ? std::acos(dot) : 0.0, s = angle > 0 ? std::sin(angle) : 0.0;
     double limit = chord * chord;
     for (size_t k = i + 1; k < j; ++k) {
         double u = (times[k] - times[i]) / (times[j] - times[i]);
@@ -167,12 +169,10 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
         unionCubic(out);
         return true;
     }
-    std::vector<double> times;
-    if (!candidateTimes(&times, why)) {
+    std::vector<double> times, axis[3];
+    if (!sampleCandidates(&times, axis, HUGE_VAL, why)) {
         return false;
     }
-    std::vector<double> axis[3];
-    evaluate(times, axis);
     auto fits = [&](size_t i, size_t j) {
         for (int a = 0; a < 3; ++a) {
             if (!line_fits(times, axis[a], i, j, kVectorTolerance * 0.5)) {
@@ -197,19 +197,6 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     if (!lead_) {
         return true;
     }
-    std::vector<double> times;
-    if (!candidateTimes(&times, why)) {
-        return false;
-    }
-    std::vector<double> axis[3];
-    evaluate(times, axis);
-    auto quaternion = [&](size_t k) {
-        return EulerRotation::ToQuaternion({axis[0][k], axis[1][k], axis[2][k]});
-    };
-    // Float storage moves a quaternion by about 1e-5 degrees: well inside the margin.
-    const double tolerance = kRotationToleranceDegrees * 0.5;
-    std::vector<size_t> kept;
-    std::vector<EulerRotation::Quat> q;
     int moving = -1, movingAxes = 0;
     for (int a = 0; a < 3; ++a) {
         if (curves_[a] && !curves_[a]->Constant()) {
@@ -217,6 +204,19 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
             ++movingAxes;
         }
     }
+    // With one turning axis a straight span of it is followed exactly (see below), as long as
+    // it turns by less than half a turn, which a piece would go the other way round.
+    std::vector<double> times, axis[3];
+    if (!sampleCandidates(&times, axis, movingAxes <= 1 ? 90.0 : 0.0, why)) {
+        return false;
+    }
+    auto quaternion = [&](size_t k) {
+        return EulerRotation::ToQuaternion({axis[0][k], axis[1][k], axis[2][k]});
+    };
+    // Float storage moves a quaternion by about 1e-5 degrees: well inside the margin.
+    const double tolerance = kRotationToleranceDegrees * 0.5;
+    std::vector<size_t> kept;
+    std::vector<EulerRotation::Quat> q;
     if (movingAxes <= 1) {
         // One axis turning between fixed ones: the rotation is a fixed one, a turn about that
         // axis, and another fixed one, and interpolation commutes with fixed rotations on either
@@ -226,8 +226,23 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
             return std::fabs(axis[a][j] - axis[a][i]) < 180 &&
                    line_fits(times, axis[a], i, j, tolerance);
         });
+        // The fixed axes' half-angle sines and cosines once; only the turning one per sample.
+        double c[3], sn[3];
+        for (int b = 0; b < 3; ++b) {
+            double half = axis[b].empty() ? 0 : axis[b][0] * 3.14159265358979323846 / 360;
+            c[b] = std::cos(half);
+            sn[b] = std::sin(half);
+        }
+        q.reserve(kept.size());
         for (size_t k : kept) {
-            q.push_back(quaternion(k));
+            double half = axis[a][k] * 3.14159265358979323846 / 360;
+            c[a] = std::cos(half);
+            sn[a] = std::sin(half);
+            // qz * qy * qx, as EulerRotation::ToQuaternion
+            q.push_back({sn[0] * c[1] * c[2] - c[0] * sn[1] * sn[2],
+                         c[0] * sn[1] * c[2] + sn[0] * c[1] * sn[2],
+                         c[0] * c[1] * sn[2] - sn[0] * sn[1] * c[2],
+                         c[0] * c[1] * c[2] + sn[0] * sn[1] * sn[2]});
         }
     } else {
         q.resize(times.size());
@@ -337,7 +352,8 @@ std::vector<double> SamplerBuilder::unionTimes() const {
     return out;
 }
 
-std::vector<char> SamplerBuilder::stillSpans(const std::vector<double>& keys) const {
+std::vector<char> SamplerBuilder::plainSpans(const std::vector<double>& keys,
+                                             double straightUpTo) const {
     std::vector<char> still(keys.empty() ? 0 : keys.size() - 1, 1);
     for (const ChannelCurve* c : curves_) {
         if (!c) {
@@ -354,6 +370,10 @@ std::vector<char> SamplerBuilder::stillSpans(const std::vector<double>& keys) co
                 continue;  // held before the first key or after the last
             }
             size_t i = after - 1;
+            if (own[i].out == ChannelCurve::kLinear && own[i + 1].in == ChannelCurve::kLinear &&
+                std::fabs(own[i + 1].value - own[i].value) < straightUpTo) {
+                continue;  // a straight line, which the written pieces follow exactly
+            }
             if (own[i].value != own[i + 1].value ||
                 (own[i].out != ChannelCurve::kStep &&
                  (c->OutSlope(i) != 0 || c->InSlope(i + 1) != 0))) {
@@ -364,9 +384,10 @@ std::vector<char> SamplerBuilder::stillSpans(const std::vector<double>& keys) co
     return still;
 }
 
-bool SamplerBuilder::candidateTimes(std::vector<double>* out, std::string* why) const {
+bool SamplerBuilder::candidateTimes(std::vector<double>* out, double straightUpTo,
+                                    std::string* why) const {
     std::vector<double> keys = unionTimes();
-    std::vector<char> still = stillSpans(keys);
+    std::vector<char> still = plainSpans(keys, straightUpTo);
     // Count first, so that a curve that would need too many samples costs no memory.
     double count = double(keys.size());
     for (size_t k = 0; k + 1 < keys.size(); ++k) {
@@ -393,6 +414,15 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, std::string* why) 
             }
         }
     }
+    return true;
+}
+
+bool SamplerBuilder::sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
+                                      double straightUpTo, std::string* why) const {
+    if (!candidateTimes(times, straightUpTo, why)) {
+        return false;
+    }
+    evaluate(*times, axis);
     return true;
 }
 

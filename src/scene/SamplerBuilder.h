@@ -25,7 +25,9 @@ struct BuiltSampler {
 //     LINEAR samples taken from the keys and the whole frames between them, reduced to the
 //     fewest that keep the written curve within kVectorTolerance (units) or
 //     kRotationToleranceDegrees (the angle between the rotations) of the evaluated curve at
-//     every key and every frame. Spans where every axis holds still get no samples inside.
+//     every key and every frame. Spans where every axis holds still, or where the moving axes
+//     run in straight lines that the pieces follow exactly (translation and scale; a rotation
+//     turning about one axis by less than a quarter turn), get no samples inside.
 // A curve is never sampled before its first or after its last key; one whose keys would make it
 // need more than kMaxSampledFrames frames sampled is refused.
 class SamplerBuilder {
@@ -50,12 +52,16 @@ class SamplerBuilder {
     void unionCubic(BuiltSampler* out) const;
     // Every axis key time, ascending, one per distinct float.
     std::vector<double> unionTimes() const;
-    // The union key times plus the whole frames inside every span where some axis moves; false
-    // when that is more than kMaxSampledFrames.
-    bool candidateTimes(std::vector<double>* times, std::string* why) const;
-    // For each span between consecutive `keys` (the union key times), whether every axis holds
-    // still across it.
-    std::vector<char> stillSpans(const std::vector<double>& keys) const;
+    // The union key times plus the whole frames inside every span that is not plain (see
+    // plainSpans); false when that is more than kMaxSampledFrames.
+    bool candidateTimes(std::vector<double>* times, double straightUpTo, std::string* why) const;
+    // For each span between consecutive `keys` (the union key times), whether it needs no
+    // samples inside: every axis holds still across it or runs in a straight line that changes
+    // by less than `straightUpTo` (0 where the written pieces do not follow straight lines).
+    std::vector<char> plainSpans(const std::vector<double>& keys, double straightUpTo) const;
+    // The candidate times and every axis's value at each of them.
+    bool sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
+                          double straightUpTo, std::string* why) const;
     void evaluate(const std::vector<double>& times, std::vector<double> axis[3]) const;
 
     const ChannelCurve* curves_[3];

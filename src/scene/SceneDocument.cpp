@@ -336,6 +336,9 @@ bool SceneDocument::readSampler(const tinygltf::AnimationSampler& s, int path,
             return false;
         }
     }
+    for (auto& axis : *keys) {
+        axis.reserve(n);
+    }
     EulerRotation::Vec3 previous = {0, 0, 0};
     for (size_t k = 0; k < n; ++k) {
         const float* v = values.data() + (cubic ? (3 * k + 1) : k) * size_t(width);

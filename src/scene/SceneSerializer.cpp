@@ -1,6 +1,11 @@
 #include "scene/SceneSerializer.h"
 
+#include <unistd.h>
+
 #include <cctype>
+#include <cstdint>
+#include <cstdio>
+#include <sstream>
 #include <vector>
 
 #include "toolkit/SafeFile.h"
@@ -17,15 +22,136 @@ bool write_image_bytes(const std::string*, const std::string*, const tinygltf::I
     return true;
 }
 
+// A JSON string literal of `text`.
+std::string json_string(const std::string& text) {
+    std::string out = "\"";
+    for (unsigned char c : text) {
+        if (c == '"' || c == '\\') {
+            out += '\\';
+            out += char(c);
+        } else if (c < 0x20) {
+            char escaped[8];
+            std::snprintf(escaped, sizeof escaped, "\\u%04x", c);
+            out += escaped;
+        } else {
+            out += char(c);
+        }
+    }
+    return out + "\"";
+}
+
+void put_u32(std::ostream& out, uint32_t v) {
+    const char bytes[4] = {char(v & 0xFF), char(v >> 8 & 0xFF), char(v >> 16 & 0xFF),
+                           char(v >> 24 & 0xFF)};
+    out.write(bytes, 4);
+}
+
+// Where each buffer starts in a binary chunk that joins them all, 16-byte aligned, and the
+// chunk's length (before its padding to 4 bytes).
+std::vector<size_t> join_bases(const tinygltf::Model& model, size_t* length) {
+    std::vector<size_t> base(model.buffers.size(), 0);
+    size_t at = 0;
+    for (size_t b = 0; b < model.buffers.size(); ++b) {
+        at = (at + 15) & ~size_t(15);
+        base[b] = at;
+        at += model.buffers[b].data.size();
+    }
+    *length = at;
+    return base;
+}
+
+// Writes a .glb whose binary chunk is buffer 0 (with `join`, every buffer one after another)
+// straight from the model: the JSON comes from the serialiser with the buffers taken out, one
+// marked empty buffer in their place and the views moved onto it, and the marked buffer's object
+// is then replaced by the chunk's real length. False when the model does not allow it (the
+// caller then lets the serialiser write the whole container); the model is left as it was.
+bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool join,
+                      std::ostream& out) {
+    if (model->buffers.empty() || (!join && model->buffers.size() > 1) ||
+        !SceneSerializer::CanJoinBuffers(*model) || !model->buffers[0].uri.empty()) {
+        return false;
+    }
+    size_t length = 0;
+    const std::vector<size_t> base = join_bases(*model, &length);
+    if (length == 0 || length > 0xFFFFFFF0u) {
+        return false;
+    }
+    const std::string marker = "chirrup binary chunk " + std::to_string(::getpid()) + " " +
+                               std::to_string(reinterpret_cast<uintptr_t>(model));
+    std::vector<tinygltf::Buffer> buffers(1);
+    buffers[0].name = marker;
+    buffers.swap(model->buffers);
+    std::vector<std::pair<int, size_t>> placed;  // each view's buffer and offset, to restore
+    placed.reserve(model->bufferViews.size());
+    for (tinygltf::BufferView& v : model->bufferViews) {
+        placed.emplace_back(v.buffer, v.byteOffset);
+        if (v.buffer > 0 && size_t(v.buffer) < base.size()) {
+            v.byteOffset += base[size_t(v.buffer)];
+            v.buffer = 0;
+        }
+    }
+    std::ostringstream text;
+    bool ok = writer->WriteGltfSceneToStream(model, text, false, false);
+    buffers.swap(model->buffers);
+    for (size_t i = 0; i < placed.size(); ++i) {
+        model->bufferViews[i].buffer = placed[i].first;
+        model->bufferViews[i].byteOffset = placed[i].second;
+    }
+    std::string json = text.str();
+    const std::string quoted = json_string(marker);
+    size_t at = json.find(quoted);
+    if (!ok || at == std::string::npos || json.find(quoted, at + 1) != std::string::npos) {
+        return false;
+    }
+    size_t start = json.rfind('{', at), end = json.find('}', at);
+    if (start == std::string::npos || end == std::string::npos) {
+        return false;
+    }
+    const tinygltf::Buffer& first = model->buffers[0];
+    std::string object = "{\"byteLength\":" + std::to_string(length);
+    if (!first.name.empty()) {
+        object += ",\"name\":" + json_string(first.name);
+    }
+    json.replace(start, end + 1 - start, object + "}");
+    while (!json.empty() && (json.back() == '\n' || json.back() == ' ')) {
+        json.pop_back();
+    }
+    json.resize((json.size() + 3) & ~size_t(3), ' ');
+    size_t binLength = (length + 3) & ~size_t(3);
+    uint64_t total = 12 + 8 + json.size() + 8 + binLength;
+    if (total > 0xFFFFFFFFu) {
+        return false;
+    }
+    out.write("glTF", 4);
+    put_u32(out, 2);
+    put_u32(out, uint32_t(total));
+    put_u32(out, uint32_t(json.size()));
+    put_u32(out, 0x4E4F534A);  // "JSON"
+    out.write(json.data(), std::streamsize(json.size()));
+    put_u32(out, uint32_t(binLength));
+    put_u32(out, 0x004E4942);  // "BIN"
+    static const char kZeros[16] = {};
+    size_t written = 0;
+    for (size_t b = 0; b < model->buffers.size(); ++b) {
+        out.write(kZeros, std::streamsize(base[b] - written));
+        const std::vector<unsigned char>& data = model->buffers[b].data;
+        out.write(reinterpret_cast<const char*>(data.data()), std::streamsize(data.size()));
+        written = base[b] + data.size();
+    }
+    out.write(kZeros, std::streamsize(binLength - written));
+    return true;
+}
+
 // Serialises `model` through a SafeFile: `path` is either the old file or the whole new one.
-bool write_safely(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binary,
+bool write_safely(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binary, bool join,
                   const std::string& path, std::string* error) {
     SafeFile file(path);
     if (!file.IsOpen()) {
         *error = "Cannot write scene file [" + path + "]: " + file.ErrorText();
         return false;
     }
-    if (!writer->WriteGltfSceneToStream(model, file.Stream(), !binary, binary)) {
+    bool written = binary && write_glb_direct(writer, model, join, file.Stream());
+    if (!written && !writer->WriteGltfSceneToStream(model, file.Stream(), !binary, binary)) {
         *error = "Cannot write scene file [" + path + "]: the scene could not be serialised";
         return false;  // the SafeFile removes what was written
     }
@@ -74,7 +200,19 @@ std::string SceneSerializer::Base64(const unsigned char* bytes, size_t size) {
     return out;
 }
 
-bool SceneSerializer::Write(tinygltf::Model& model, const std::string& path, std::string* error) {
+bool SceneSerializer::CanJoinBuffers(const tinygltf::Model& model) {
+    size_t length = 0;
+    join_bases(model, &length);
+    for (const tinygltf::Buffer& b : model.buffers) {
+        if (b.extras.Type() != tinygltf::NULL_TYPE) {
+            return false;  // a joined buffer has no place for them
+        }
+    }
+    return length <= 0xFFFFFFF0u;
+}
+
+bool SceneSerializer::Write(tinygltf::Model& model, const std::string& path, bool joinBuffers,
+                            std::string* error) {
     // The serialiser writes an object with no properties as null, which no reader accepts:
     // such a node gets its (default) translation written out, such a scene a name.
     for (tinygltf::Node& n : model.nodes) {
@@ -93,5 +231,5 @@ bool SceneSerializer::Write(tinygltf::Model& model, const std::string& path, std
     }
     tinygltf::TinyGLTF writer;
     writer.SetImageWriter(write_image_bytes, nullptr);
-    return write_safely(&writer, &model, IsBinaryPath(path), path, error);
+    return write_safely(&writer, &model, IsBinaryPath(path), joinBuffers, path, error);
 }

@@ -14,6 +14,13 @@ class SceneSerializer {
     static bool IsBinaryPath(const std::string& path);
     // Base64 of `size` bytes (RFC 4648, with padding), as data URIs carry them.
     static std::string Base64(const unsigned char* bytes, size_t size);
-    // False with `error` naming the file when it cannot be written.
-    static bool Write(tinygltf::Model& model, const std::string& path, std::string* error);
+    // Whether every buffer can be joined into one binary chunk as the file is written (none
+    // has extras, and together they fit a .glb).
+    static bool CanJoinBuffers(const tinygltf::Model& model);
+    // False with `error` naming the file when it cannot be written. For a .glb, `joinBuffers`
+    // writes every buffer into the binary chunk, one after another at 16-byte boundaries, with
+    // the buffer views moved accordingly in the file (the model itself keeps its buffers);
+    // without it only buffer 0 goes there.
+    static bool Write(tinygltf::Model& model, const std::string& path, bool joinBuffers,
+                      std::string* error);
 };

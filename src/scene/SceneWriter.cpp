@@ -39,10 +39,15 @@ bool SceneWriter::Write(const std::string& path, std::string* error) {
         compactor.RemoveUnusedBuffers();
         doc_.ClearTouched();
     }
+    bool join = false;
     if (SceneSerializer::IsBinaryPath(path)) {
-        ModelCompactor(m_).PackIntoFirstBuffer();
+        // Every buffer goes into the binary chunk: joined as the file is written where the
+        // serialiser can (no copy of the bytes), else moved into buffer 0 first.
+        ModelCompactor compactor(m_);
+        join = compactor.RenumberingSafe() && SceneSerializer::CanJoinBuffers(m_);
+        compactor.PackIntoFirstBuffer(!join);
     }
-    return SceneSerializer::Write(m_, path, error);
+    return SceneSerializer::Write(m_, path, join, error);
 }
 
 bool SceneWriter::buildTargets(std::vector<Target>* targets, std::string* why) {
@@ -136,15 +141,23 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets) {
         }
     }
     if (any) {
-        if (m_.buffers.empty()) {
+        // The new bytes go into a buffer of their own, sized once, so that the scene's buffers
+        // are never copied; a scene with extensions that may refer to buffers by index, or
+        // without buffers, gets them at the end of buffer 0.
+        if (m_.buffers.empty() || !ModelCompactor(m_).RenumberingSafe()) {
+            buffer_ = 0;
+            if (m_.buffers.empty()) {
+                m_.buffers.emplace_back();
+            }
+        } else {
+            buffer_ = int(m_.buffers.size());
             m_.buffers.emplace_back();
         }
-        // One buffer view at the end of buffer 0, grown once to its final size.
         size_t bytes = 0;
         for (const Target& t : *targets) {
             bytes += (t.sampler.times.size() + t.sampler.values.size()) * sizeof(float);
         }
-        std::vector<unsigned char>& data = m_.buffers[0].data;
+        std::vector<unsigned char>& data = m_.buffers[size_t(buffer_)].data;
         data.reserve(((data.size() + 3) & ~size_t(3)) + bytes);
         data.resize((data.size() + 3) & ~size_t(3), 0);
         view_ = int(m_.bufferViews.size());
@@ -172,7 +185,7 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets) {
             t.sampler = BuiltSampler();  // its bytes are in the buffer now
         }
         tinygltf::BufferView view;
-        view.buffer = 0;
+        view.buffer = buffer_;
         view.byteOffset = viewStart_;
         view.byteLength = data.size() - viewStart_;
         m_.bufferViews.push_back(view);
@@ -200,7 +213,7 @@ void SceneWriter::makeNodeTrs(int node) {
 
 int SceneWriter::appendAccessor(const std::vector<float>& values, int type, size_t count,
                                 bool withMinMax) {
-    std::vector<unsigned char>& data = m_.buffers[0].data;
+    std::vector<unsigned char>& data = m_.buffers[size_t(buffer_)].data;
     tinygltf::Accessor a;
     a.bufferView = view_;
     a.byteOffset = data.size() - viewStart_;

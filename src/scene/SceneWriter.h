@@ -22,8 +22,10 @@ class SceneDocument;
 // without views. A path whose three channels were all removed ends up unanimated. Key times
 // before 0 never reach the file (the document cuts every set curve at 0). How each path's
 // sampler is written (exact keys, cubic pieces, or samples within a tolerance) is described at
-// SamplerBuilder. A .glb is written with every buffer and every embedded image in its binary
-// chunk. The document's model is updated in place, so that it matches what was written.
+// SamplerBuilder. The new animation bytes go into a buffer of their own. A .glb is written with
+// every buffer and every embedded image in its binary chunk. The document's model is updated in
+// place to hold what was written (for a .glb its buffers may still be separate in memory,
+// joined only in the file).
 class SceneWriter {
   public:
     explicit SceneWriter(SceneDocument& doc);
@@ -48,12 +50,14 @@ class SceneWriter {
     // first; returns the accessors of the samplers that nothing uses any more.
     std::set<int> removeOldChannels(std::vector<Target>* targets);
     void appendSamplers(std::vector<Target>* targets);
-    // Appends `values` to buffer 0 (already reserved) as a float accessor of the new view.
+    // Appends `values` to the new bytes' buffer (already reserved) as a float accessor of the
+    // new view.
     int appendAccessor(const std::vector<float>& values, int type, size_t count, bool withMinMax);
     void makeNodeTrs(int node);
 
     SceneDocument& doc_;
     tinygltf::Model& m_;
-    int view_ = -1;         // the buffer view of the new animation bytes, at the end of buffer 0
-    size_t viewStart_ = 0;  // its offset in buffer 0
+    int buffer_ = 0;        // the buffer holding the new animation bytes
+    int view_ = -1;         // their buffer view, at the end of that buffer
+    size_t viewStart_ = 0;  // its offset in the buffer
 };

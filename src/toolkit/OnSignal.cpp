@@ -46,12 +46,21 @@ bool OnSignal(int sig, KLSignalHandler handler, void* data) {
         return false;
     handlers[sig] = handler;
     handler_data[sig] = data;
-    struct sigaction action = {};
-    action.sa_handler = handler ? trampoline : SIG_DFL;
-    // The handled signals wait while the trampoline decides, until the defaults are back.
-    sigemptyset(&action.sa_mask);
+    // Every handled signal waits while the trampoline of any of them decides, until the
+    // defaults are back: the handlers installed before this one get the larger mask too.
+    sigset_t mask;
+    sigemptyset(&mask);
     for (int other = 1; other < kMaxSignal; ++other)
         if (handlers[other])
-            sigaddset(&action.sa_mask, other);
-    return sigaction(sig, &action, nullptr) == 0;
+            sigaddset(&mask, other);
+    bool ok = true;
+    for (int other = 1; other < kMaxSignal; ++other) {
+        if (other != sig && !handlers[other])
+            continue;
+        struct sigaction action = {};
+        action.sa_handler = handlers[other] ? trampoline : SIG_DFL;
+        action.sa_mask = mask;
+        ok = sigaction(other, &action, nullptr) == 0 && ok;
+    }
+    return ok;
 }

@@ -156,7 +156,11 @@ class Imp : public KLStdImp {
     void parse_shapeset(CueStatement& s, std::istream& in);
     void parse_recog(std::istream& in, const char* recognizer, const char* keyset);
     void parse_recog_links(std::istream& in, const char* recognizer, const char* keyset);
+    // Keyset description loading, in the order LoadKeyset runs them.
+    void check_project(const char* name);
+    bool load_wire_file();
     int read_wire_file(const char* name);
+    void show_keysets();
     // A new scene with the workspace's display settings.
     std::unique_ptr<KLScene> make_scene();
     // Reports a load failure: Inform with "Dismiss" interactively, a line on the error

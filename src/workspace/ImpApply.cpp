@@ -1,4 +1,6 @@
 // Imp: apply of the key tracks to a scene file, interactively and in batch mode.
+#include <sys/stat.h>
+
 #include <cstring>
 #include <iostream>
 
@@ -8,6 +10,7 @@
 #include "scene/KLWire.h"
 #include "scene/KLWireSource.h"
 #include "scene/OrDagNode.h"
+#include "toolkit/KLFilePath.h"
 #include "workspace/Ghost.h"
 #include "workspace/Imp.h"
 
@@ -51,7 +54,20 @@ void Imp::BatchApply(const char* keysetFile, const char* trackFile, const char* 
 
     applyEvent.reset();
     applyEvent = std::make_unique<KLEdlEvent>(applyFile, CueTime(), duration, CueTime(), duration);
-    applyEvent->OpenWire();
+    // The keyset's scene has given its key channels and batch mode shows nothing: when the
+    // apply scene is the same file it is taken over instead of read again, and otherwise let
+    // go before the apply scene is read, so that two scenes are never in memory together.
+    const char* wireDir = GetWireDirectory();
+    const std::string applyPath =
+        applyFile[0] != '/' && wireDir ? KLFilePath::Join(wireDir, applyFile) : applyFile;
+    struct stat a, b;
+    if (wireSource && wireSource->Valid() && ::stat(wireSource->Path().c_str(), &a) == 0 &&
+        ::stat(applyPath.c_str(), &b) == 0 && a.st_dev == b.st_dev && a.st_ino == b.st_ino) {
+        applyEvent->wire = std::move(wireSource);
+    } else {
+        wireSource.reset();
+        applyEvent->OpenWire();
+    }
     KLWireSource* target = applyEvent->wire.get();
     if (!target || !target->Valid()) {
         std::cerr << "Could not read apply file " << applyFile;

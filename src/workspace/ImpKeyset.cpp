@@ -184,6 +184,83 @@ int Imp::read_wire_file(const char* name) {
     return 1;
 }
 
+// A description outside the data directory may belong to another project: when its folder
+// is named like a data folder, offer to switch to the project above it.
+void Imp::check_project(const char* name) {
+    const std::string dir = KLFilePath::Directory(name);
+    const char* misc = GetDataDirectory();
+    if (misc && canonical_dir(dir) == canonical_dir(misc))
+        return;
+    const std::string last = KLFilePath::Basename(canonical_dir(dir).c_str());
+    const char* miscName = CuePrefs::Variable("TESSEL_MISC_DIR");
+    if ((miscName && last == miscName) || last == "misc_data") {
+        const std::string project = KLFilePath::Directory(canonical_dir(dir).c_str());
+        if (theGhost->Confirm(KLFmt("Change TESSEL_PROJECT to [%s]?", project.c_str()).c_str(),
+                              "Change", "Don't Change")) {
+            CuePrefs::SetProject(project.c_str());
+            theGhost->ResetFileManagers();
+        }
+    } else {
+        theGhost->Inform("Can't determine new TESSEL_PROJECT, unchanged", "OK");
+    }
+}
+
+// Reads the description's scene file (the wire file); false, told and with the keysets
+// cleared, when there is none or it cannot be read.
+bool Imp::load_wire_file() {
+    const std::string wirePath = KLFilePath::Join(GetWireDirectory(), wireFile.c_str());
+    // Parsed once, by read_wire_file.
+    bool readable = !wireFile.empty() && KLFilePath::Exists(wirePath.c_str()) &&
+                    KLFilePath::IsReadable(wirePath.c_str());
+    if (readable) {
+        const std::string written = wireFile;
+        KLStatus("Reading wire file [%s].", written.c_str());
+        readable = read_wire_file(written.c_str());
+    }
+    if (readable)
+        return true;
+    if (batchMode) {
+        if (wireFile.empty())
+            std::cerr << "No wire file!" << std::endl;
+        else
+            std::cerr << "Could not read wire file " << wirePath << ", cannot load keyset"
+                      << std::endl;
+        batchStop = 1;
+    } else {
+        theGhost->Inform("Could not read wire file, cannot load keyset", "Dismiss");
+    }
+    clear_keyset_data();
+    return false;
+}
+
+// Interactive: the window learns of the new keysets, and the scene's geometry is loaded with
+// each shape set's node made the control node of its key track.
+void Imp::show_keysets() {
+    for (int i = 0; i < keysetCount; ++i)
+        theGhost->InitKeyset(i);
+    theGhost->DressKeysetMenu();
+    theGhost->InitSound(sound.get());
+    theGhost->InitMarkTrack(markTrack.get());
+    if (geometryActive) {
+        scene->LoadGeometry(wireSource.get());
+        scene->SetRestFrame(wireFrame);
+        scene->SetDetail(tessU, tessV);
+        scene->Feedback(feedback, nullptr);
+        for (int i = 0; i < keysetCount; ++i) {
+            KLKeySet* set = keySets[i].get();
+            if (set->kind != 2 || !set->nodeName)
+                continue;
+            if (KLGraphNode* node = scene->FetchNode(set->nodeName->c_str()))
+                keyTracks[i]->SetControlGraphNode(node);
+            else
+                std::cerr << "Couldn't find keyset node " << *set->nodeName << std::endl;
+        }
+    }
+    theGhost->SetActiveKeyset(activeKeyset);
+    theGhost->CenterKeyView();
+    theGhost->CenterMixView();
+}
+
 int Imp::LoadKeyset(const char* name) {
     std::ifstream in(name ? name : "");
     if (!name || !in || KLFilePath::IsDirectory(name)) {
@@ -191,27 +268,8 @@ int Imp::LoadKeyset(const char* name) {
         return 0;
     }
     batchStop = 0;
-
-    if (!batchMode) {
-        // A description outside the data directory may belong to another project.
-        const std::string dir = KLFilePath::Directory(name);
-        const char* misc = GetDataDirectory();
-        if (!misc || canonical_dir(dir) != canonical_dir(misc)) {
-            const std::string last = KLFilePath::Basename(canonical_dir(dir).c_str());
-            const char* miscName = CuePrefs::Variable("TESSEL_MISC_DIR");
-            if ((miscName && last == miscName) || last == "misc_data") {
-                const std::string project = KLFilePath::Directory(canonical_dir(dir).c_str());
-                if (theGhost->Confirm(
-                        KLFmt("Change TESSEL_PROJECT to [%s]?", project.c_str()).c_str(), "Change",
-                        "Don't Change")) {
-                    CuePrefs::SetProject(project.c_str());
-                    theGhost->ResetFileManagers();
-                }
-            } else {
-                theGhost->Inform("Can't determine new TESSEL_PROJECT, unchanged", "OK");
-            }
-        }
-    }
+    if (!batchMode)
+        check_project(name);
 
     geometryActive = loadGeometry;
     activeKeyset = 0;
@@ -222,63 +280,11 @@ int Imp::LoadKeyset(const char* name) {
     if (!batchMode)
         KLStatus("Parsing keyset description.");
     parse_keyset_file(in);
-
-    if (wireFile.empty()) {
-        if (batchMode) {
-            std::cerr << "No wire file!" << std::endl;
-            batchStop = 1;
-        } else {
-            theGhost->Inform("Could not read wire file, cannot load keyset", "Dismiss");
-        }
-        clear_keyset_data();
+    if (!load_wire_file())
         return 0;
-    }
-    const std::string wirePath = KLFilePath::Join(GetWireDirectory(), wireFile.c_str());
-    const std::string written = wireFile;
-    // Parsed once, by read_wire_file.
-    bool readable =
-        KLFilePath::Exists(wirePath.c_str()) && KLFilePath::IsReadable(wirePath.c_str());
-    if (readable) {
-        KLStatus("Reading wire file [%s].", written.c_str());
-        readable = read_wire_file(written.c_str());
-    }
-    if (!readable) {
-        if (batchMode) {
-            std::cerr << "Could not read wire file " << wirePath << ", cannot load keyset"
-                      << std::endl;
-            batchStop = 1;
-        } else {
-            theGhost->Inform("Could not read wire file, cannot load keyset", "Dismiss");
-        }
-        clear_keyset_data();
-        return 0;
-    }
 
-    if (!batchMode) {
-        for (int i = 0; i < keysetCount; ++i)
-            theGhost->InitKeyset(i);
-        theGhost->DressKeysetMenu();
-        theGhost->InitSound(sound.get());
-        theGhost->InitMarkTrack(markTrack.get());
-        if (geometryActive) {
-            scene->LoadGeometry(wireSource.get());
-            scene->SetRestFrame(wireFrame);
-            scene->SetDetail(tessU, tessV);
-            scene->Feedback(feedback, nullptr);
-            for (int i = 0; i < keysetCount; ++i) {
-                KLKeySet* set = keySets[i].get();
-                if (set->kind != 2 || !set->nodeName)
-                    continue;
-                if (KLGraphNode* node = scene->FetchNode(set->nodeName->c_str()))
-                    keyTracks[i]->SetControlGraphNode(node);
-                else
-                    std::cerr << "Couldn't find keyset node " << *set->nodeName << std::endl;
-            }
-        }
-        theGhost->SetActiveKeyset(activeKeyset);
-        theGhost->CenterKeyView();
-        theGhost->CenterMixView();
-    }
+    if (!batchMode)
+        show_keysets();
     keysetModified = 0;
     if (!batchMode) {
         theGhost->MakeKeysetImages();

@@ -11,9 +11,9 @@
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLFilePath.h"
 #include "toolkit/KLString.h"
+#include "toolkit/SafeFile.h"
 #include "workspace/Ghost.h"
 #include "workspace/Imp.h"
-#include "toolkit/SafeFile.h"
 
 namespace {
 

@@ -10,29 +10,27 @@
 #include "toolkit/KLFilePath.h"
 #include "toolkit/KLImageSGI.h"
 
-using ::testing::internal::CaptureStderr;
-using ::testing::internal::GetCapturedStderr;
-
 namespace {
 
 // Out-of-range slots are ignored on Set and told on Get; an unknown channel is told, named
 // TX. Constant unless the set count equals the size and the values differ exactly.
 TEST(KLKeyChannel, SetGetNamesAndConstant) {
-    CaptureStderr();
-    KLKeyChannel c("jaw", KLKeyChannel::kRX, 2), u("u", 0, 2);
-    for (auto [i, v] : {std::pair{-1, 1.0f}, {2, 1.0f}, {1, 2.5f}, {1, 3.5f}})
-        c.Set(i, v);
-    EXPECT_TRUE(c.count == 2 && c.Get(1) == 3.5f && c.Get(2) == -10000.0f);
-    EXPECT_EQ(c.Constant(), 0) << "slot 0 never set: its zero differs";
-    u.Set(0, 1.0f);
-    const int partly = u.Constant();
-    u.Set(1, std::nextafter(1.0f, 2.0f));
-    EXPECT_TRUE(partly == 1 && u.Constant() == 0);
-    std::string names;
-    for (int i = 0; i <= 9; ++i)
-        names += KLKeyChannel("n", i, 1).GetChannelName();
-    EXPECT_EQ(names, "TXTYTZRXRYRZSXSYSZTX");
-    EXPECT_EQ(GetCapturedStderr(),
+    const std::string told = testkit::StdErr([&] {
+        KLKeyChannel c("jaw", KLKeyChannel::kRX, 2), u("u", 0, 2);
+        for (auto [i, v] : {std::pair{-1, 1.0f}, {2, 1.0f}, {1, 2.5f}, {1, 3.5f}})
+            c.Set(i, v);
+        EXPECT_TRUE(c.count == 2 && c.Get(1) == 3.5f && c.Get(2) == -10000.0f);
+        EXPECT_EQ(c.Constant(), 0) << "slot 0 never set: its zero differs";
+        u.Set(0, 1.0f);
+        const int partly = u.Constant();
+        u.Set(1, std::nextafter(1.0f, 2.0f));
+        EXPECT_TRUE(partly == 1 && u.Constant() == 0);
+        std::string names;
+        for (int i = 0; i <= 9; ++i)
+            names += KLKeyChannel("n", i, 1).GetChannelName();
+        EXPECT_EQ(names, "TXTYTZRXRYRZSXSYSZTX");
+    });
+    EXPECT_EQ(told,
               "KLKeyChannel::Get() out of range\nKLKeyChannel::GetChannelName() unknown channel\n");
 }
 
@@ -77,9 +75,7 @@ TEST_F(KLKeySetTest, ReadStatementsAndDefault) {
     std::istringstream in(
         "# a comment\nkey short\nkey a 5 pic.sgi extra\nkeys b 5\n\nkey c 5\nshape d 4\n"
         "key e 6\nkey f 5\nkey g 7\nend here\nkey after 5\n");
-    CaptureStderr();
-    set.Read(in);
-    EXPECT_EQ(GetCapturedStderr(), "");
+    EXPECT_EQ(testkit::StdErr([&] { set.Read(in); }), "");
     EXPECT_EQ(Shapes(set), "c 5 -, e 6 -, f 5 -, g 7 -, ");
     EXPECT_EQ(set.GetDefaultKeyShape(), set.keyShapes[2].get());
     EXPECT_EQ(std::string(std::istreambuf_iterator<char>(in), {}), "key after 5\n");
@@ -141,21 +137,21 @@ TEST_F(KLKeySetTest, WriteGoldenAndReadBack) {
 TEST_F(KLKeySetTest, ProgramPictureStandsBeforeTheFilePicture) {
     ASSERT_TRUE(KLImageSGI(32, 24).Store(File("p.sgi").c_str()));
     KLKey key(3, "a", "p.sgi"), bare(4, "b", nullptr), lost(5, "c", "gone.sgi");
-    CaptureStderr();
-    KLImageSGI* onFile = key.GetImage();
-    ASSERT_TRUE(onFile && onFile->Width() == 160 && onFile->Height() == 121);
-    EXPECT_EQ(key.GetImage(), onFile) << "loaded once";
-    KLImageSGI* fileIcon = key.GetIcon();
-    ASSERT_TRUE(fileIcon && fileIcon->Width() == 80 && fileIcon->Height() == 60);
-    key.SetImage(new KLImageSGI(300, 200));
-    EXPECT_TRUE(key.GetImage() != onFile && key.GetIcon() != fileIcon);
-    key.SetImage(nullptr);
-    EXPECT_NE(key.GetImage(), onFile) << "no picture changes nothing";
-    key.ClearImage();
-    EXPECT_TRUE(key.GetImage() == onFile && key.GetIcon() == fileIcon);
-    EXPECT_TRUE(!bare.GetImage() && !bare.GetIcon() && !lost.GetIcon());
-    EXPECT_EQ(GetCapturedStderr(),
-              "KLKey::SetImage() no image on input\nKLKey::GetImage() failed to get image\n");
+    const std::string told = testkit::StdErr([&] {
+        KLImageSGI* onFile = key.GetImage();
+        ASSERT_TRUE(onFile && onFile->Width() == 160 && onFile->Height() == 121);
+        EXPECT_EQ(key.GetImage(), onFile) << "loaded once";
+        KLImageSGI* fileIcon = key.GetIcon();
+        ASSERT_TRUE(fileIcon && fileIcon->Width() == 80 && fileIcon->Height() == 60);
+        key.SetImage(new KLImageSGI(300, 200));
+        EXPECT_TRUE(key.GetImage() != onFile && key.GetIcon() != fileIcon);
+        key.SetImage(nullptr);
+        EXPECT_NE(key.GetImage(), onFile) << "no picture changes nothing";
+        key.ClearImage();
+        EXPECT_TRUE(key.GetImage() == onFile && key.GetIcon() == fileIcon);
+        EXPECT_TRUE(!bare.GetImage() && !bare.GetIcon() && !lost.GetIcon());
+    });
+    EXPECT_EQ(told, "KLKey::SetImage() no image on input\nKLKey::GetImage() failed to get image\n");
 }
 
 // Only channels that change are kept and told; from a node: it and its later siblings. Two

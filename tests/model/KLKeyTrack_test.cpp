@@ -176,9 +176,7 @@ TEST_F(KLKeyTrackTest, PreviewKindTwo) {
     KLKeyTrack t(&brow);
     t.InsertKey(0, Ticks(600), nullptr, 1, 0.75f);
     t.PrepareKeyFrames(nullptr);  // no value channel yet: nothing to do
-    ::testing::internal::CaptureStderr();
-    t.SetControlGraphNode(nullptr);
-    EXPECT_EQ(::testing::internal::GetCapturedStderr(), "NO GRAPH NODE\n");
+    EXPECT_EQ(testkit::StdErr([&] { t.SetControlGraphNode(nullptr); }), "NO GRAPH NODE\n");
     KLGraphNode node("browNode");
     t.SetControlGraphNode(&node);
     KLChannel* channel = node.Transform()->Channel(5);

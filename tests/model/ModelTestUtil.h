@@ -12,6 +12,8 @@
 #include "scene/KLWire.h"
 #include "scene/KLWireSource.h"
 #include "scene/OrDagNode.h"
+#include "testkit/CaptureStderr.h"
+#include "testkit/TempDir.h"
 #include "toolkit/CueTime.h"
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLStdImp.h"
@@ -63,21 +65,12 @@ void ReadText(T& x, const std::string& text, Extra... extra) {
 class ModelTest : public ::testing::Test {
   protected:
     ModelTest() {
-        const auto* info = ::testing::UnitTest::GetInstance()->current_test_info();
-        dir = std::string(CHIRRUP_BINARY_DIR) + "/test-tmp/model/" + info->test_suite_name() + "." +
-              info->name();
-        std::filesystem::remove_all(dir);
-        std::filesystem::create_directories(dir);
         std::ofstream(File("face.gltf"))
             << R"({"asset":{"version":"2.0"},"scene":0,"scenes":[{"nodes":[0,6]}],"nodes":[)"
                R"({"name":"face","children":[1,3,4,5]},{"name":"neck","children":[2]},)"
                R"({"name":"jaw"},{"name":"brow"},{"name":"lip"},{"name":"lip"},{"name":"other"}]})";
     }
-    ~ModelTest() override {
-        CueTime::default_fps = 30;
-        std::error_code ignored;
-        std::filesystem::remove_all(dir, ignored);
-    }
+    ~ModelTest() override { CueTime::default_fps = 30; }
     static CueTime Ticks(int32_t t) { return CueTime::FromTicks(t); }
     static CueTime Frames(double f) { return CueTime(f, 0); }
     std::string File(const std::string& name) const { return dir + "/" + name; }
@@ -91,7 +84,8 @@ class ModelTest : public ::testing::Test {
         return nodes.back().get();
     }
     RecordingImp imp;
-    std::string dir;
+    testkit::TempDir temp;
+    const std::string dir = temp.path();
     std::unique_ptr<KLWireSource> wire;
     std::unique_ptr<OrDagNode> root;
     std::vector<std::unique_ptr<OrDagNode>> nodes;  // released before root and wire

@@ -9,6 +9,7 @@
 #include "scene/KLWireSetting.h"
 #include "scene/SceneDocument.h"
 #include "scene/scene_util.h"
+#include "testkit/CaptureStderr.h"
 
 namespace {
 std::string NamesOf(OrDagNode* top, int withTop) {
@@ -157,12 +158,14 @@ TEST(SceneEdges, NamesStoreRejectsAndFailures) {
     ASSERT_EQ(StoreKeys(box.get(), 2, {}), 1);
     EXPECT_EQ(KLWire::FindChannel(box.get(), 2), nullptr);
     // A failed store names the file and writes nothing.
-    testing::internal::CaptureStderr();
-    EXPECT_EQ(scene.source->Store(bad.c_str()), 0);
-    EXPECT_NE(testing::internal::GetCapturedStderr().find(bad), std::string::npos);
-    testing::internal::CaptureStderr();
-    EXPECT_EQ(KLWireSource((dir + "/missing.glb").c_str()).Store(out.c_str()), 0);
-    EXPECT_NE(testing::internal::GetCapturedStderr().find(out), std::string::npos);
+    int stored = -1;
+    EXPECT_NE(testkit::StdErr([&] { stored = scene.source->Store(bad.c_str()); }).find(bad),
+              std::string::npos);
+    EXPECT_EQ(stored, 0);
+    const std::string told = testkit::StdErr(
+        [&] { stored = KLWireSource((dir + "/missing.glb").c_str()).Store(out.c_str()); });
+    EXPECT_EQ(stored, 0);
+    EXPECT_NE(told.find(out), std::string::npos);
     // Stored twice over the same file: replaced whole, no temporary file left behind.
     ASSERT_EQ(scene.source->Store(out.c_str()), 1);
     ASSERT_EQ(scene.source->Store(out.c_str()), 1);

@@ -16,11 +16,12 @@
 #include "scene/KLWireSource.h"
 #include "scene/OrDagNode.h"
 #include "scene/SceneSerializer.h"
+#include "testkit/TempDir.h"
+#include "testkit/ValidateGltf.h"
 #include "toolkit/CueTime.h"
 
 enum SceneFormat { kEmbedded, kSideCar, kBinary };
 using Node = std::unique_ptr<OrDagNode>;
-
 
 // The face scene's buffer: each accessor's floats in turn, at the byte offsets in FaceSceneJson.
 // clang-format off
@@ -76,10 +77,11 @@ inline bool WriteFaceScene(const std::string& path, SceneFormat format) {
            io.WriteGltfSceneToFile(&m, path, true, format != kSideCar, true, format == kBinary);
 }
 
-// A fresh empty directory under the build tree.
+// A fresh empty directory, removed when the test program ends.
 inline std::string MakeTempDir() {
-    std::string name = std::string(CHIRRUP_BINARY_DIR) + "/scene-test-XXXXXX";
-    return mkdtemp(&name[0]) ? name : std::string("/tmp");
+    static std::vector<std::unique_ptr<testkit::TempDir>> made;
+    made.push_back(std::make_unique<testkit::TempDir>());
+    return made.back()->path();
 }
 inline void WriteFile(const std::string& path, const std::string& bytes) {
     std::ofstream(path, std::ios::binary) << bytes;
@@ -137,14 +139,4 @@ inline int StoreKeys(OrDagNode* node, int channel, const std::vector<StoreKey>& 
                                 in.data(), nullptr, out.data(), nullptr);
 }
 
-// Expects tools/validate-gltf.mjs to report no errors; skips the test when node is missing.
-inline void ExpectValidGltf(const std::string& path) {
-    if (std::system("node --version >/dev/null 2>&1") != 0) {
-        GTEST_SKIP() << "node is not installed";
-    }
-    std::string report = MakeTempDir() + "/validator.txt";
-    std::string command =
-        "node " CHIRRUP_SOURCE_DIR "/tools/validate-gltf.mjs '" + path + "' >'" + report + "' 2>&1";
-    EXPECT_EQ(std::system(command.c_str()), 0) << ReadFile(report);
-    EXPECT_NE(ReadFile(report).find(": 0 errors"), std::string::npos) << ReadFile(report);
-}
+using testkit::ExpectValidGltf;

@@ -1,13 +1,13 @@
 #pragma once
 
 #include <gtest/gtest.h>
-#include <stdlib.h>
 
 #include <filesystem>
 #include <string>
 #include <utility>
 #include <vector>
 
+#include "testkit/TempDir.h"
 #include "toolkit/KLErrHandler.h"
 
 // Keeps the toolkit's reports (level, text) instead of printing them, while it lives.
@@ -20,14 +20,10 @@ class CaptureErrors : public KLErrHandler {
 // Gives each test a fresh directory, removed afterwards, and keeps the reports made meanwhile.
 class TempDirTest : public ::testing::Test {
   protected:
-    void SetUp() override {
-        char name[] = "/tmp/chirrup-toolkit-XXXXXX";
-        ASSERT_NE(mkdtemp(name), nullptr);
-        dir_ = name;
-    }
-    void TearDown() override { std::filesystem::remove_all(dir_); }
-    std::string Path(const std::string& leaf) const { return (dir_ / leaf).string(); }
+    void SetUp() override { ASSERT_FALSE(temp_.path().empty()); }
+    std::string Path(const std::string& leaf) const { return temp_ / leaf; }
 
-    std::filesystem::path dir_;
+    testkit::TempDir temp_;
+    const std::filesystem::path dir_{temp_.path()};
     CaptureErrors errors_;
 };

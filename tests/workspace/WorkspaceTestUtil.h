@@ -9,6 +9,8 @@
 #include <utility>
 #include <vector>
 
+#include "testkit/CaptureStderr.h"
+#include "testkit/TempDir.h"
 #include "toolkit/CueRecognizer.h"
 #include "toolkit/CueTime.h"
 #include "toolkit/CueTokenList.h"
@@ -21,21 +23,8 @@ namespace wstest {
 std::string ReadFile(const std::string& path);  // empty when the file cannot be read
 void WriteFile(const std::string& path, const std::string& text);
 bool FileExists(const std::string& path);
-std::string StdErr(const std::function<void()>& f);  // what `f` writes on the error stream
-
-// A fresh temporary directory, removed with everything in it.
-class TempDir {
-  public:
-    TempDir();
-    ~TempDir();
-    TempDir(const TempDir&) = delete;
-    TempDir& operator=(const TempDir&) = delete;
-    const std::string& path() const { return path_; }
-    std::string operator/(const std::string& name) const { return path_ + "/" + name; }
-
-  private:
-    std::string path_;
-};
+using testkit::StdErr;  // what a function writes on the error stream
+using testkit::TempDir;
 
 // Sets (a null value: unsets) an environment variable while it lives; the preferences are
 // read again on both ends.

@@ -10,6 +10,7 @@
 #include <filesystem>
 
 #include "WorkspaceTestUtil.h"
+#include "testkit/ValidateGltf.h"
 
 using namespace wstest;
 using ::testing::HasSubstr;
@@ -32,14 +33,8 @@ class BatchBoundsTest : public ProjectTest {
                           dir / "work", {{"TESSEL_PROJECT", dir.path()}});
     }
     std::string Out() const { return dir / "wire/out.gltf"; }
-    // Expects tools/validate-gltf.mjs to find no error in the stored scene.
-    void ExpectValid() {
-        const std::string report = dir / "validator.txt";
-        const std::string command = "node " CHIRRUP_SOURCE_DIR "/tools/validate-gltf.mjs '" +
-                                    Out() + "' >'" + report + "' 2>&1";
-        EXPECT_EQ(std::system(command.c_str()), 0) << ReadFile(report);
-        EXPECT_THAT(ReadFile(report), HasSubstr(": 0 errors"));
-    }
+    // Expects the glTF validator to find no error in the stored scene.
+    void ExpectValid() { testkit::ExpectValidGltf(Out()); }
 };
 
 // A buffer or an image whose uri names a directory: the apply scene is refused with the reason.
@@ -152,6 +147,16 @@ TEST_F(BatchBoundsTest, AFarKeyInASmallSceneCostsLittle) {
     EXPECT_LT(ReadFile(Out()).size(), 10000u);
     EXPECT_NEAR(EvalChannel(Out(), "jaw", 3, 0).value_or(-99), 20, 1e-3);
     ExpectValid();
+}
+
+// A keyset whose key shapes are all the same pose has nothing to apply: the run says so.
+TEST_F(BatchBoundsTest, AKeysetWithoutChannelsIsTold) {
+    Data("x.kset", "wire face.gltf\nbegin keyset same\n    key a 0\n    key b 0\nend\n");
+    Data("x.track", "begin keytrack same\n    event 0 a\nend\n");
+    const RunResult r = Batch();
+    EXPECT_EQ(r.status, 0);
+    EXPECT_THAT(r.err, HasSubstr("Keyset [same]: its key shapes differ in no channel, so it has "
+                                 "no key channels."));
 }
 
 }  // namespace

@@ -8,6 +8,7 @@
 #include <tuple>
 
 #include "WorkspaceTestUtil.h"
+#include "testkit/ValidateGltf.h"
 
 using namespace wstest;
 using ::testing::HasSubstr;
@@ -196,12 +197,7 @@ TEST_F(ProgramTest, BatchAppliesEveryKeysetAndStoresTheScene) {
             << k.node << " channel " << k.channel << " frame " << k.frame;
     EXPECT_EQ(ReadFile(dir / "wire/face.gltf"), FaceSceneJson()) << "the apply file is unchanged";
 
-    const std::string validator = CHIRRUP_SOURCE_DIR "/tools/validate-gltf.mjs";
-    if (FileExists(validator)) {
-        const std::string command =
-            "node " + validator + " " + Out() + " > " + (dir / "validator.txt") + " 2>&1";
-        EXPECT_EQ(std::system(command.c_str()), 0) << ReadFile(dir / "validator.txt");
-    }
+    testkit::ExpectValidGltf(Out());
 }
 
 // Batch runs whose inputs differ from the good ones: what each says after the header, and

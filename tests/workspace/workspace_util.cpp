@@ -36,24 +36,6 @@ bool FileExists(const std::string& path) {
     return ::access(path.c_str(), F_OK) == 0;
 }
 
-std::string StdErr(const std::function<void()>& f) {
-    testing::internal::CaptureStderr();
-    f();
-    return testing::internal::GetCapturedStderr();
-}
-
-TempDir::TempDir() {
-    std::string name = std::filesystem::temp_directory_path().string() + "/chirrup-ws-XXXXXX";
-    if (::mkdtemp(name.data()))
-        path_ = name;
-}
-
-TempDir::~TempDir() {
-    std::error_code ignored;
-    if (!path_.empty())
-        std::filesystem::remove_all(path_, ignored);
-}
-
 ScopedEnv::ScopedEnv(const char* name, const char* value) : name_(name) {
     if (const char* old = std::getenv(name))
         old_ = old;
