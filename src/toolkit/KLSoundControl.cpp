@@ -23,7 +23,12 @@
 namespace {
 
 constexpr double kDriftLimit = 0.005;  // seconds of timer time before the position is cut
-constexpr int kGrainFade = 64;         // device frames faded at each end of a scrub grain
+// Below the limit the speed is trimmed in proportion to the difference (per second of
+// difference), within a few percent, so that a device whose clock runs a little fast or
+// slow is followed smoothly instead of by repeated cuts.
+constexpr double kTrimGain = 20.0;
+constexpr double kTrimLimit = 0.05;
+constexpr int kGrainFade = 64;  // device frames faded at each end of a scrub grain
 const double kSilent = std::numeric_limits<double>::quiet_NaN();
 
 enum class Mode { Idle, Play, Drag };
