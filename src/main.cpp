@@ -169,8 +169,7 @@ int main(int argc, char** argv) {
     if (!gnome.Initialize("chirrup", "Chirrup", widget_spec, &xargc, xargv,
                           chirrup_fallback_resources())) {
         theGhost = &ConsoleGhost::Instance();
-        std::cerr << "chirrup: no display to open the window on (is DISPLAY set?); use -B for "
-                     "batch mode."
+        std::cerr << "chirrup: no display to open the window on; use -B for batch mode."
                   << std::endl;
         return 1;
     }

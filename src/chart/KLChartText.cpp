@@ -42,6 +42,8 @@ bool render_table_font(Widget form, std::string* name, double* size, bool* xlfd)
 }  // namespace
 
 KLChartText::KLChartText(Widget form, bool* fontFound) {
+    for (int& w : widths_)
+        w = -1;
     display_ = XtDisplay(form);
     const int screen = XScreenNumberOfScreen(XtScreen(form));
     visual_ = DefaultVisual(display_, screen);
@@ -149,4 +151,14 @@ void KLChartText::Forget() {
         XftDrawDestroy(draw_);
     draw_ = nullptr;
     drawable_ = 0;
+}
+
+void KLChartText::DrawLetters(Drawable drawable, unsigned long pixel,
+                              const std::vector<XftCharSpec>& letters) {
+    if (letters.empty() || !target(drawable))
+        return;
+    const XftColor* c = colour(pixel);
+    if (!c)
+        return;
+    XftDrawCharSpec(draw_, c, font_, letters.data(), int(letters.size()));
 }

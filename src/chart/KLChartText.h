@@ -2,6 +2,7 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
 #include <X11/Intrinsic.h>
 #include <X11/Xft/Xft.h>
@@ -26,6 +27,9 @@ class KLChartText {
 
     // Draws the text with its baseline's left end at (x, y).
     void Draw(Drawable drawable, unsigned long pixel, int x, int y, const char* text, int length);
+    // Draws single characters at their own positions, in one request.
+    void DrawLetters(Drawable drawable, unsigned long pixel,
+                     const std::vector<XftCharSpec>& letters);
     // Draws the text on a filled rectangle of `background` as high as the font.
     void DrawImage(Drawable drawable, GC gc, unsigned long pixel, unsigned long background, int x,
                    int y, const char* text, int length);
@@ -47,4 +51,5 @@ class KLChartText {
     Drawable drawable_ = 0;
     std::map<unsigned long, XftColor> colours_;
     std::string fontName_;
+    mutable int widths_[256];  // widths of single characters, -1 until measured
 };

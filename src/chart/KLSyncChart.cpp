@@ -151,13 +151,15 @@ KLSyncChart::KLSyncChart(Widget parent, const char* name) : KLFiend(parent, name
     font = std::make_unique<KLChartText>(form, &found);
     if (!found)
         std::cerr << "Font failed" << std::endl;
+    // The pan bar shows the whole chart from the start, not the scroll bar's own default.
+    set_scrollbar_values();
 }
 
 KLSyncChart::~KLSyncChart() {
-    if (scrubTimer && dragMode == 4)
-        scrub(0, 2);
-    if (hitKey && keyTrack)
-        hitKey = nullptr;
+    // A chart that goes while scrubbing stops the sound without drawing (its window is gone).
+    if (dragMode == 4)
+        stop_scrub();
+    hitKey = nullptr;
     hitMark = nullptr;
     font.reset();
     free_pixmaps();

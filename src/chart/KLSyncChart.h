@@ -7,6 +7,7 @@
 #include <X11/Xlib.h>
 
 #include "chart/KLChartGeometry.h"
+#include "chart/KLKeyDrawing.h"
 #include "chart/KLWaveSummary.h"
 #include "toolkit/CueTime.h"
 #include "toolkit/xm/KLFiend.h"
@@ -112,6 +113,7 @@ class KLSyncChart : public KLFiend {
     long sampleCount = 0;
     float peak = 0.0f;
     KLWaveSummary waveSummary;  // min/max summaries of `samples`
+    KLKeyDrawing keyDrawing;    // the key layer of the last redraw
     KLFiendCallback showKeyframeCallback, showKeyframeImageCallback, showReferenceImageCallback;
     std::unique_ptr<KLChartText> font;  // the chart's text font
 
@@ -142,17 +144,15 @@ class KLSyncChart : public KLFiend {
     void draw_grid();
     void draw_sound();
     void draw_keys();
-    void draw_key_curve(Drawable d, const KLKeyEvent* previous, int px, const KLKeyEvent* event,
-                        int x);
     void draw_marks();
     void draw_indicator();
-    void draw_key_letter(Drawable d, const KLKeyEvent* event, int x);
     void full_expose() { expose(nullptr); }
     bool drawable() const { return window && chartPixmap && gc; }
 
     // Pointer and keyboard (KLSyncChartInput.cpp).
     void input(XEvent* event);
     void scrub(int x, int phase);
+    void stop_scrub();
     void drag_1(int x, int phase);
     void drag_key(int x, int phase);
     void drag_keystick(int y, int phase);
@@ -183,7 +183,7 @@ class KLSyncChart : public KLFiend {
     static CueTime lastTypedTime;  // time of the last typed mark
     static int lastTypedX;         // indicator column when it was typed (-2: none yet)
     static float scrubPosition;    // play position while scrubbing, 0..1 of the sound
-    static KLTimer* scrubTimer;    // the scrub's timer (owned while scrubbing)
+    static std::unique_ptr<KLTimer> scrubTimer;  // the scrub's timer, while scrubbing
 
     int dragX_ = -1;        // column of the object drawn while dragging, -1 none
     int regionAnchor_ = 0;  // column where the region sweep started

@@ -4,9 +4,8 @@
 #include <cmath>
 
 #include "chart/KLChartText.h"
+#include "chart/KLKeyDrawing.h"
 #include "chart/KLSyncChart.h"
-#include "model/InterpEase.h"
-#include "model/KLKey.h"
 #include "model/KLKeyTrack.h"
 #include "model/KLMarkTrack.h"
 
@@ -96,111 +95,60 @@ void KLSyncChart::draw_sound() {
         XDrawSegments(display, p, gc, segments, waveSegmentCount);
 }
 
-// The curve into `event` from the previous event at column px, cut to the pixmap's columns.
-void KLSyncChart::draw_key_curve(Drawable d, const KLKeyEvent* previous, int px,
-                                 const KLKeyEvent* event, int x) {
-    const int base = geometry.textBaseline;
-    const int left = -1, right = int(geometry.width) + 1;
-    if (event->shapeIndex == previous->shapeIndex) {
-        // A held shape: flat at the base line.
-        XSetForeground(display, gc, linearColor);
-        XDrawLine(display, d, gc, std::max(px, left - kMargin), base, std::min(x, right + kMargin),
-                  base);
-        return;
-    }
-    const double top = geometry.ValueRow(event->value);
-    if (event->smoothing == KLKeyEvent::kLinear) {
-        XSetForeground(display, gc, linearColor);
-        const int target = int(top);
-        const double n = double(x) - px;
-        auto row = [&](int c) { return base + (target - base) * ((c - px) / n); };
-        const int a = std::max(px, left - kMargin), b = std::min(x, right + kMargin);
-        if (a > b)
-            return;
-        XDrawLine(display, d, gc, a, int(std::lround(row(a))), b, int(std::lround(row(b))));
-        return;
-    }
-    float e1 = 0.2f, e2 = 0.8f;
-    XSetForeground(display, gc, easeColor);
-    if (event->smoothing == KLKeyEvent::kSmooth) {
-        e1 = e2 = 0.5f;
-        XSetForeground(display, gc, smoothColor);
-    }
-    const long n = long(x) - px;
-    const long first = std::max(0L, long(left) - px);
-    const long last = std::min(n, long(right) - px);
-    if (first > last)
-        return;
-    std::vector<XPoint> points;
-    points.reserve(size_t(last - first + 1));
-    for (long i = first; i <= last; i++) {
-        const float v = interp_ease(float(double(i) / double(n)), float(base), float(top), e1, e2);
-        points.push_back(XPoint{to_short(double(px + i)), to_short(std::trunc(v))});
-    }
-    if (points.size() == 1)
-        points.push_back(points.front());
-    XDrawLines(display, d, gc, points.data(), int(points.size()), CoordModeOrigin);
-}
-
-void KLSyncChart::draw_key_letter(Drawable d, const KLKeyEvent* event, int x) {
-    const char* name = event->key ? event->key->Name() : nullptr;
-    if (!name || !name[0] || !font)
-        return;
-    const int half = font->Width(name, 1) / 2;
-    font->Draw(d, foreground, x - half, geometry.textBaseline + 15, name, 1);
-}
-
 void KLSyncChart::draw_stick(Drawable d, int x, float value, unsigned long pixel) {
+    std::vector<KLChartRect> rects;
+    KLKeyDrawing::StickRects(geometry, x, value, rects);
     XSetForeground(display, gc, pixel);
-    XSetLineAttributes(display, gc, 3, LineSolid, CapButt, JoinRound);
-    XDrawLine(display, d, gc, x, geometry.lowerBandTop, x, geometry.textBaseline);
-    const int t = geometry.TickRow(value);
-    XDrawLine(display, d, gc, x - 4, t, x + 5, t);
-    XSetLineAttributes(display, gc, 0, LineSolid, CapButt, JoinRound);
+    XFillRectangles(display, d, gc, reinterpret_cast<XRectangle*>(rects.data()), int(rects.size()));
 }
 
 void KLSyncChart::draw_keys() {
     if (!keyTrack)
         return;
-    const double zs = geometry.zoomStart, ze = geometry.zoomEnd;
+    static_assert(sizeof(KLChartRect) == sizeof(XRectangle), "rectangle layouts differ");
+    keyDrawing.Build(geometry, *keyTrack);
+    std::vector<XftCharSpec> letters;
+    if (font) {
+        letters.reserve(keyDrawing.letters.size());
+        for (const auto& l : keyDrawing.letters)
+            letters.push_back(XftCharSpec{FcChar32(static_cast<unsigned char>(l.letter)),
+                                          to_short(l.column - font->Width(&l.letter, 1) / 2),
+                                          to_short(l.baseline)});
+    }
+    const std::pair<std::vector<KLWaveSegment>*, Pixel> curves[] = {
+        {&keyDrawing.linear, linearColor},
+        {&keyDrawing.ease, easeColor},
+        {&keyDrawing.smooth, smoothColor}};
     for (Pixmap p : {chartPixmap, regionPixmap}) {
         XSetLineAttributes(display, gc, 0, LineSolid, CapButt, JoinRound);
-        const KLKeyEvent* previous = nullptr;
-        double pf = 0.0;
-        int px = 0;
-        for (const KLKeyEvent* event : keyTrack->events) {
-            const double f = geometry.FractionFromTime(event->time);
-            const int x = geometry.ColumnFromFraction(f);
-            if (previous && f >= zs && pf <= ze && x != px)
-                draw_key_curve(p, previous, px, event, x);
-            previous = event;
-            pf = f;
-            px = x;
-            if (f > ze)
-                break;  // nothing later is drawn
-        }
-        for (const KLKeyEvent* event : keyTrack->events) {
-            const double f = geometry.FractionFromTime(event->time);
-            if (f < zs)
+        for (const auto& [list, colour] : curves) {
+            if (list->empty())
                 continue;
-            if (f > ze)
-                break;
-            const int x = geometry.ColumnFromFraction(f);
-            draw_stick(p, x, event->value, keyColor);
-            draw_key_letter(p, event, x);
+            XSetForeground(display, gc, colour);
+            XDrawSegments(display, p, gc, reinterpret_cast<XSegment*>(list->data()),
+                          int(list->size()));
         }
+        XSetForeground(display, gc, keyColor);
+        XFillRectangles(display, p, gc, reinterpret_cast<XRectangle*>(keyDrawing.sticks.data()),
+                        int(keyDrawing.sticks.size()));
+        if (font)
+            font->DrawLetters(p, foreground, letters);
     }
 }
 
 void KLSyncChart::draw_marks() {
     if (!markTrack || !font)
         return;
+    std::vector<XftCharSpec> letters;
     for (const KLMarkEvent* mark : markTrack->marks) {
+        // Marks are not limited to the visible part; those off the pixmap are left out.
         const int x = geometry.ColumnFromTime(mark->time);
         if (x < -kMargin || x > int(geometry.width) + kMargin)
             continue;
         const int half = font->Width(&mark->label, 1) / 2;
-        for (Pixmap p : {chartPixmap, regionPixmap})
-            font->Draw(p, foreground, x - half, 12, &mark->label, 1);
+        letters.push_back(
+            XftCharSpec{FcChar32(static_cast<unsigned char>(mark->label)), to_short(x - half), 12});
     }
+    for (Pixmap p : {chartPixmap, regionPixmap})
+        font->DrawLetters(p, foreground, letters);
 }

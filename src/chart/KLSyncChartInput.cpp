@@ -28,7 +28,7 @@ CueTime KLSyncChart::feedbackTime;
 CueTime KLSyncChart::lastTypedTime;
 int KLSyncChart::lastTypedX = -2;
 float KLSyncChart::scrubPosition = 0.0f;
-KLTimer* KLSyncChart::scrubTimer = nullptr;
+std::unique_ptr<KLTimer> KLSyncChart::scrubTimer;
 
 namespace {
 const CueTime kOneFrame(1.0, 0);
@@ -362,20 +362,25 @@ void KLSyncChart::scrub(int x, int phase) {
     if (phase == 0) {
         if (scrubTimer)
             return;
-        scrubTimer = new KLTimer(CueTime(), CueTime::FromTicks(INT32_MAX));
-        KLSoundControl::PlayDrag(sound, scrubTimer, 100, &scrubPosition);
+        scrubTimer = std::make_unique<KLTimer>(CueTime(), CueTime::FromTicks(INT32_MAX));
+        KLSoundControl::PlayDrag(sound, scrubTimer.get(), 100, &scrubPosition);
         KLTimerBeat::start();
         scrubTimer->start();
-    } else if (phase == 2 && scrubTimer) {
-        scrubTimer->stop();
-        KLTimerBeat::stop();
-        // Twenty system ticks (1/100 s each) for the last grain to drain.
-        std::this_thread::sleep_for(std::chrono::milliseconds(200));
-        KLSoundControl::Stop();
-        delete scrubTimer;
-        scrubTimer = nullptr;
-        scrubPosition = 0.0f;
+    } else if (phase == 2) {
+        stop_scrub();
     }
+}
+
+void KLSyncChart::stop_scrub() {
+    if (!scrubTimer)
+        return;
+    scrubTimer->stop();
+    KLTimerBeat::stop();
+    // Twenty system ticks (1/100 s each) for the last grain to drain.
+    std::this_thread::sleep_for(std::chrono::milliseconds(200));
+    KLSoundControl::Stop();
+    scrubTimer.reset();
+    scrubPosition = 0.0f;
 }
 
 // --- Active key and mark, feedback --------------------------------------------------------

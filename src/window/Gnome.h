@@ -147,6 +147,15 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void toggle_ref_view_cb(Widget, XtPointer, XtPointer);
     static void key_view_set_cb(Widget, XtPointer, XtPointer);
     static void key_view_clear_cb(Widget, XtPointer, XtPointer);
+    // Helpers of the views: the key view's hooks and the showTextures toggle (from
+    // DressWidgets); one arm or disarm of a camera button of view 1 (key) or 0 (mix).
+    void dress_scene_views();
+    static void show_textures_cb(Widget, XtPointer, XtPointer);
+    void camera_drag(Widget w, XtPointer clientData, XtPointer callData, int view);
+    // PlayForwardSave's frames: the mix view as drawn, kept as playblast frame i; the
+    // playblast from `start` shown in the reference view.
+    void grab_playblast_frame(int i);
+    void show_playblast(CueTime start);
 
     // --- Information bar, prompts, error flag, help, reference menu (GnomeInfo.cpp)
     void DisplayTimecode(CueTime t);
@@ -162,6 +171,8 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     // The status line: the latest status report of the toolkit, shown at once.
     void ShowStatus(const char* message);
     static void status_hook(const char* message, void* gnome);
+    // Once the event loop is idle again after status reports, the status line says "Ready.".
+    static Boolean status_idle_workproc(XtPointer gnome);
     static void help_cb(Widget, XtPointer, XtPointer);
     static void version_cb(Widget, XtPointer, XtPointer);
     static void open_audio_panel_cb(Widget, XtPointer, XtPointer);
@@ -174,6 +185,10 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void show_reference_image_cb(Widget, XtPointer, KLFiend*);
     // Makes the error flag and the status line in the information bar (outside the table).
     void create_error_flag();
+    // The workspace frees its mark track and sound before it tells the window about their
+    // replacements: hands the chart the current ones (the sound too unless `withSound` is
+    // false) before anything can make it draw with the freed ones.
+    void chart_follows_workspace(bool withSound = true);
 
     // --- Recognizer plug-ins and their settings panels (GnomeRecognizers.cpp)
     void ShowRecognizerGui(CueRecognizer* recognizer) override;
@@ -293,6 +308,7 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     // --- Fields: information bar
     Widget errorFlag = nullptr;
     Widget statusLine = nullptr;
+    XtWorkProcId statusIdle = 0;
 
     // --- Fields: recognizers and link dialog
     CueRecognizer* linkRecognizer = nullptr;  // borrowed: the recognizer the link dialog shows

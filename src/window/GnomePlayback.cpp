@@ -246,6 +246,9 @@ void Gnome::PlayForwardSave() {
     syncChart->GetRegionRange(start, end);
     const int frames = std::max(0, PlaybackPass::RegionFrames(start, end));
     // The playblast table: one picture per frame, filled as the mix view draws each frame.
+    // The reference view lets go of the old table's picture first.
+    if (refImageView)
+        refImageView->SetImage(nullptr);
     theImp.playblastImages = std::make_unique<std::unique_ptr<KLImageSGI>[]>(size_t(frames));
     theImp.playblastCount = frames;
     Widget mixScn = FindWidget("mixScn");
@@ -259,7 +262,10 @@ void Gnome::PlayForwardSave() {
             CueTime t = start + CueTime(double(i), 0);
             GoToTime(t);
             DisplayTimecode(t);
+            grab_playblast_frame(i);
         }
+    if (theImp.geometryActive && frames > 0)
+        show_playblast(start);
     if (!mixViewOn) {
         if (mixFake)
             XtManageChild(mixFake);

@@ -57,6 +57,11 @@ void Gnome::ShowKeySet(int k) {
     const char* name = shownKeyset ? shownKeyset->Name() : nullptr;
     set_label("keyVuLabel", name ? KLFmt("%s:", name) : std::string("Keyset:"));
     set_label("infoKeysetTitle", name ? std::string(name) : std::string("No Keyset Loaded"));
+    // The window's title names the active keyset, so that it shows in the task bar too.
+    if (Widget shell = AppShell()) {
+        std::string title = name ? KLFmt("Chirrup: %s", name) : std::string("Chirrup");
+        XtVaSetValues(shell, XmNtitle, title.c_str(), nullptr);
+    }
     if (syncChart)
         syncChart->SetKeyTrack(theImp.GetKeyTrack(k));
     for (int i = 0; i < kMaxKeysets; i++)
@@ -218,26 +223,24 @@ void Gnome::ClearKeysets(int index) {
 
 void Gnome::ClearKeyTracks() {
     halt_playback();
-    if (syncChart)
+    // The workspace replaces its mark track next: the chart must not draw the old one.
+    if (syncChart) {
         syncChart->SetKeyTrack(nullptr);
+        syncChart->SetMarkTrack(nullptr);
+    }
 }
 
 void Gnome::InitSound(CueSound* sound) {
     halt_playback();
-    if (syncChart) {
-        // A track load replaces the mark track before the sound: the chart must not draw
-        // the old one while it takes the new sound.
-        syncChart->SetMarkTrack(theImp.markTrack.get());
+    chart_follows_workspace(false);
+    if (syncChart)
         syncChart->SetSound(sound);
-    }
 }
 
 void Gnome::InitMarkTrack(KLMarkTrack* track) {
     if (syncChart)
         syncChart->SetMarkTrack(track);
 }
-
-void Gnome::MakeKeysetImages() {}
 
 void Gnome::update_keyset_tiles() {
     if (!shownKeyset || activeKeyset < 0 || activeKeyset >= kMaxKeysets)

@@ -29,6 +29,7 @@ KLAlert::KLAlert(Widget parent, const char* title) {
     XtAddCallback(dialog_, XmNokCallback, answer_cb, this);
     XtAddCallback(dialog_, XmNcancelCallback, answer_cb, this);
     XtAddCallback(dialog_, XmNhelpCallback, answer_cb, this);
+    XtAddCallback(dialog_, XmNdestroyCallback, forget_cb, this);
     Widget shell = XtParent(dialog_);
     XtVaSetValues(shell, XmNdeleteResponse, XmDO_NOTHING, nullptr);
     Atom wmDelete = XmInternAtom(XtDisplay(shell), const_cast<char*>("WM_DELETE_WINDOW"), False);
@@ -36,7 +37,15 @@ KLAlert::KLAlert(Widget parent, const char* title) {
 }
 
 KLAlert::~KLAlert() {
-    // The dialog belongs to its parent's widget tree and goes with it.
+    // The dialog goes with the alert, unless its widget tree went first.
+    if (dialog_) {
+        XtRemoveCallback(dialog_, XmNdestroyCallback, forget_cb, this);
+        XtDestroyWidget(XtParent(dialog_));
+    }
+}
+
+void KLAlert::forget_cb(Widget, XtPointer clientData, XtPointer) {
+    static_cast<KLAlert*>(clientData)->dialog_ = nullptr;
 }
 
 Widget KLAlert::Button(int position) const {

@@ -36,6 +36,7 @@ class KLAlert {
     void set_text(const char* text);
     static void answer_cb(Widget widget, XtPointer clientData, XtPointer callData);
     static void close_cb(Widget widget, XtPointer clientData, XtPointer callData);
+    static void forget_cb(Widget widget, XtPointer clientData, XtPointer callData);
 
     Widget dialog_ = nullptr;
     int answer_ = -1;
