@@ -10,6 +10,7 @@
 #include <string>
 
 #include "toolkit/CueSound.h"
+#include "toolkit/DeviceClock.h"
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLTimer.h"
 #include "toolkit/SoundVoice.h"
@@ -23,7 +24,12 @@
 namespace {
 
 constexpr double kDriftLimit = 0.005;  // seconds of timer time before the position is cut
-constexpr int kGrainFade = 64;         // device frames faded at each end of a scrub grain
+// Below the limit the speed is trimmed in proportion to the difference (per second of
+// difference), within a few percent, so that a device whose clock runs a little fast or
+// slow is followed smoothly instead of by repeated cuts.
+constexpr double kTrimGain = 20.0;
+constexpr double kTrimLimit = 0.05;
+constexpr int kGrainFade = 64;  // device frames faded at each end of a scrub grain
 const double kSilent = std::numeric_limits<double>::quiet_NaN();
 
 enum class Mode { Idle, Play, Drag };
@@ -53,14 +59,17 @@ struct Output {
     std::atomic<double> handedClock{0.0}, handedPosition{kSilent};
     std::atomic<long> buffers{0};
     std::atomic<long> cuts{0};
+    std::atomic<double> handedWoke{0.0};
+    DeviceClock deviceClock;  // sound thread only
 };
 
 Output out;
 float speed = 1.0f;
 
-void publish(double clock, double position) {
+void publish(double clock, double woke, double position) {
     out.seq.fetch_add(1, std::memory_order_acq_rel);
     out.handedClock.store(clock, std::memory_order_relaxed);
+    out.handedWoke.store(woke, std::memory_order_relaxed);
     out.handedPosition.store(position, std::memory_order_relaxed);
     out.buffers.fetch_add(1, std::memory_order_relaxed);
     out.seq.fetch_add(1, std::memory_order_acq_rel);
@@ -84,6 +93,10 @@ double render_pass(Pass& p, float* buffer, long frames, double now) {
         voice.Jump(expected);
         p.placed = true;
     }
+    // Seconds of timer time the voice is behind (positive) or ahead, in its direction.
+    const double behind =
+        (expected - voice.Position()) / (voice.Step() > 0 ? 1.0 : -1.0) / (p.speed * rate);
+    voice.SetTrim(1.0 + std::clamp(kTrimGain * behind, -kTrimLimit, kTrimLimit));
     const double start = voice.Position();
     const double left = (end - start) / voice.Step();
     const long count = std::clamp(long(std::ceil(left - 1e-9)), 0L, frames);
@@ -125,7 +138,9 @@ void feed(void*, Uint8* stream, int bytes) {
     auto* buffer = reinterpret_cast<float*>(stream);
     const long frames = bytes / long(sizeof(float) * out.channels);
     std::fill(buffer, buffer + frames * out.channels, 0.0f);
-    const double now = TimerClock::Now();
+    const double woke = TimerClock::Now();
+    // The device's steady clock, not the jittery moment this thread woke up.
+    const double now = out.deviceClock.Update(woke, double(frames) / out.rate);
     double position = kSilent;
     Pass& p = out.pass;
     if (p.mode == Mode::Play && p.clock)
@@ -133,7 +148,7 @@ void feed(void*, Uint8* stream, int bytes) {
     else if (p.mode == Mode::Drag && p.dragAt)
         position = render_drag(p, buffer, frames);
     out.handed.fetch_add(uint64_t(frames), std::memory_order_relaxed);
-    publish(now, position);
+    publish(now, woke, position);
 }
 
 // Swaps in a new pass; the old one's timer clock is released here, off the sound thread.
@@ -190,6 +205,7 @@ bool KLSoundControl::Open() {
     out.handed = 0;
     out.buffers = 0;
     out.cuts = 0;
+    out.deviceClock.Reset();
     out.pass = Pass{};
     SDL_PauseAudioDevice(out.device, 0);
     return true;
@@ -301,6 +317,7 @@ KLSoundControl::Handed KLSoundControl::LastHanded() {
     do {
         before = out.seq.load(std::memory_order_acquire);
         h.clock = out.handedClock.load(std::memory_order_relaxed);
+        h.woke = out.handedWoke.load(std::memory_order_relaxed);
         h.position = out.handedPosition.load(std::memory_order_relaxed);
         h.buffers = out.buffers.load(std::memory_order_relaxed);
         h.cuts = out.cuts.load(std::memory_order_relaxed);

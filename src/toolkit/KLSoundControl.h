@@ -42,11 +42,13 @@ class KLSoundControl {
     // Device frames handed to the device since Open, over its rate: the device's own clock.
     static double DeviceSeconds();
 
-    // The last buffer handed to the device: the clock time (TimerClock::Now) at which it
-    // was handed and the sound position, in seconds, of its first sample (NaN when it was
-    // silent). For measuring how closely sound follows the timer.
+    // The last buffer handed to the device: the device clock's time (TimerClock::Now
+    // seconds, filtered of the sound thread's wake-up jitter) at which it was handed, the
+    // moment the thread actually woke, and the sound position, in seconds, of its first
+    // sample (NaN when it was silent). For measuring how closely sound follows the timer.
     struct Handed {
         double clock;
+        double woke;
         double position;
         long buffers;  // buffers handed since Open
         long cuts;     // times the position was cut back into step with the timer since Open

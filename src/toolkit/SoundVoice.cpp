@@ -26,6 +26,7 @@ void SoundVoice::Set(const CueSound* sound, int direction, double speed) {
     sound_ = sound && sound->Valid() && sound->FrameCount() > 0 ? sound : nullptr;
     direction_ = direction < 0 ? -1 : 1;
     speed_ = speed > 0 ? speed : 1.0;
+    trim_ = 1.0;
 }
 
 void SoundVoice::Jump(double frame) {
@@ -38,14 +39,15 @@ void SoundVoice::Jump(double frame) {
 
 double SoundVoice::Step() const {
     double rate = sound_ ? sound_->Rate() : deviceRate_;
-    return direction_ * speed_ * rate / deviceRate_;
+    return direction_ * speed_ * trim_ * rate / deviceRate_;
 }
 
 void SoundVoice::Render(float* out, long frames) {
     long done = 0;
     if (state_ && sound_) {
         // Device frames per sound frame; libsamplerate accepts 1/256 to 256.
-        double ratio = std::clamp(deviceRate_ / (sound_->Rate() * speed_), 1.0 / 256, 256.0);
+        double ratio =
+            std::clamp(deviceRate_ / (sound_->Rate() * speed_ * trim_), 1.0 / 256, 256.0);
         done = std::max(0L, src_callback_read(state_, ratio, frames, out));
     }
     std::fill(out + done * channels_, out + frames * channels_, 0.0f);

@@ -29,6 +29,9 @@ class SoundVoice {
     double Position() const { return position_; }
     // Sound frames the position moves per device frame (signed).
     double Step() const;
+    // A fine correction of the speed (1 = none), to follow a device whose clock runs a
+    // little fast or slow; the pitch moves with it.
+    void SetTrim(double trim) { trim_ = trim; }
 
     // Writes `frames` interleaved device frames into `out` and moves the position on.
     void Render(float* out, long frames);
@@ -44,6 +47,7 @@ class SoundVoice {
     const CueSound* sound_ = nullptr;
     int direction_ = 1;
     double speed_ = 1.0;
+    double trim_ = 1.0;
     double position_ = 0.0;  // sound frame of the next output frame
     long next_ = 0;          // sound frame the next input block starts at
 };

@@ -355,6 +355,12 @@ void Gnome::show_keyframe_cb(Widget, XtPointer, KLFiend*) {
         CueTime t = g->syncChart->GetIndicatorTime();
         g->GoToTime(t);
         g->DisplayTimecode(t);
+        // A key became active: its value in the value field, its shape's tile selected.
+        if (const KLKeyEvent* key = g->syncChart->activeKey) {
+            g->SetKeyValue(key->value);
+            g->ActivateKeyValue(1);
+            g->HighlightKeyframe(key->shapeIndex);
+        }
     }
 #endif
 }

@@ -4,6 +4,9 @@
 #include <tuple>
 #include <vector>
 
+#include <random>
+
+#include "toolkit/DeviceClock.h"
 #include "toolkit/KLStopWatch.h"
 #include "toolkit/KLTimer.h"
 #include "toolkit/KLTimerBeat.h"
@@ -177,6 +180,39 @@ TEST_F(TimerTest, StopWatchReportsTheRateOfItsMarks) {
     watch.Reset();
     watch.Mark();
     EXPECT_EQ(watch.FrameRate(), 0.0) << "one mark is no rate";
+}
+
+// The device clock follows a device that asks for buffers at a steady pace (here 3% faster
+// than its nominal period, as a sleeping driver may) through wake-up jitter of +-4 ms.
+TEST(DeviceClockTest, FiltersWakeUpJitterAndFollowsTheDevicesRate) {
+    for (double pace : {1.0, 0.97, 1.03}) {
+        DeviceClock clock;
+        std::mt19937 random(7);
+        std::uniform_real_distribution<double> jitter(0.0, 0.004);  // waking is only ever late
+        const double period = 512.0 / 48000;
+        double worst = 0, worstRaw = 0;
+        for (int i = 0; i < 3000; i++) {  // half a minute
+            const double device = 10.0 + i * period * pace;
+            const double woke = device + jitter(random);
+            const double filtered = clock.Update(woke, period);
+            if (i > 1500) {
+                // The filter may settle with a constant offset (half the mean lateness).
+                worst = std::max(worst, std::fabs(filtered - device - 0.002));
+                worstRaw = std::max(worstRaw, std::fabs(woke - device - 0.002));
+            }
+        }
+        EXPECT_LT(worst, 0.001) << "pace " << pace;
+        EXPECT_GT(worstRaw, 0.0015) << "the raw wake-ups jitter";
+    }
+}
+
+TEST(DeviceClockTest, AJumpRelocksAtOnce) {
+    DeviceClock clock;
+    const double period = 0.01;
+    for (int i = 0; i < 100; i++)
+        clock.Update(i * period, period);
+    EXPECT_DOUBLE_EQ(clock.Update(5.0, period), 5.0) << "a pause of seconds starts afresh";
+    EXPECT_NEAR(clock.Update(5.01, period), 5.01, 1e-9);
 }
 
 }  // namespace

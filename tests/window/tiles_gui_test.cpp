@@ -182,6 +182,10 @@ TEST_F(TilesTest, TheValueFieldSetsTheActiveKeyOnlyForOneFiniteNumber) {
     chart->SetIndicatorTime(key->time);
     chart->UpdateDisplay();
     ASSERT_EQ(chart->activeKey, key);
+    char* shown = XmTextFieldGetString(W("valTypein"));
+    EXPECT_STREQ(shown, "1") << "the active key's value is shown";
+    XtFree(shown);
+    EXPECT_EQ(gnome->CurrentKeyShape(), 1) << "and its shape's tile selected";
     gnome->ActivateKeyValue(1);
     EXPECT_TRUE(XtIsSensitive(W("valTypein")));
     TypeValue("1.5");
@@ -198,7 +202,7 @@ TEST_F(TilesTest, TheValueFieldSetsTheActiveKeyOnlyForOneFiniteNumber) {
     TypeValue("0.25");
     EXPECT_FLOAT_EQ(key->value, -3.0f) << "no active key: nothing";
     gnome->SetKeyValue(0.125f);
-    char* shown = XmTextFieldGetString(W("valTypein"));
+    shown = XmTextFieldGetString(W("valTypein"));
     EXPECT_STREQ(shown, "0.125");
     XtFree(shown);
     gnome->ActivateKeyValue(0);
