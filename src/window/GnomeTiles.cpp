@@ -57,6 +57,11 @@ void Gnome::ShowKeySet(int k) {
     const char* name = shownKeyset ? shownKeyset->Name() : nullptr;
     set_label("keyVuLabel", name ? KLFmt("%s:", name) : std::string("Keyset:"));
     set_label("infoKeysetTitle", name ? std::string(name) : std::string("No Keyset Loaded"));
+    // The window's title names the active keyset, so that it shows in the task bar too.
+    if (Widget shell = AppShell()) {
+        std::string title = name ? KLFmt("Chirrup: %s", name) : std::string("Chirrup");
+        XtVaSetValues(shell, XmNtitle, title.c_str(), nullptr);
+    }
     if (syncChart)
         syncChart->SetKeyTrack(theImp.GetKeyTrack(k));
     for (int i = 0; i < kMaxKeysets; i++)
