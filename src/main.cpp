@@ -10,6 +10,8 @@
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLFilePath.h"
 #include "toolkit/KLString.h"
+#include "window/FallbackResources.h"
+#include "window/Gnome.h"
 #include "workspace/ConsoleGhost.h"
 #include "workspace/Imp.h"
 
@@ -158,8 +160,21 @@ int main(int argc, char** argv) {
         return 0;
     }
 
-    std::cerr << "chirrup: the main window is not built into this program yet; use -B for "
-                 "batch mode."
-              << std::endl;
-    return 1;
+    // The window: built from its widget table, then the infile is loaded once the event loop
+    // runs, so that the load's questions and status show in the window.
+    static Gnome gnome;
+    theGhost = &gnome;
+    int xargc = 1;  // the toolkit sees only the program name: the options are ours
+    char* xargv[] = {argv[0], nullptr};
+    if (!gnome.Initialize("chirrup", "Chirrup", widget_spec, &xargc, xargv,
+                          chirrup_fallback_resources())) {
+        theGhost = &ConsoleGhost::Instance();
+        std::cerr << "chirrup: no display to open the window on; use -B for batch mode."
+                  << std::endl;
+        return 1;
+    }
+    if (infile)
+        gnome.PostLoadKeyset(infile);
+    KLXmGnome::MainLoop();
+    return 0;
 }

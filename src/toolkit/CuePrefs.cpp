@@ -38,7 +38,7 @@ Dirs& dirs() {
         } else {
             d.location = ".";
         }
-        d.help = d.location + "/share/chirrup/help";
+        d.help = d.location + "/share/doc/chirrup/html";
     }
     return d;
 }

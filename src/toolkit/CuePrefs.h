@@ -11,7 +11,7 @@
 //   pictures: key-shape and reference images      <project>/pix
 //
 // With no project all four are null, and relative names are used as they stand, that is
-// relative to the current directory. HelpDir() is <Location()>/share/chirrup/help, where
+// relative to the current directory. HelpDir() is <Location()>/share/doc/chirrup/html, where
 // Location() is the directory above the one that holds the running program.
 // The strings returned stay valid until the next SetProject or Refresh.
 class CuePrefs {

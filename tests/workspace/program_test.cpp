@@ -112,16 +112,20 @@ TEST_F(ProgramTest, MissingArgumentsAreToldExactlyAndEndWithTheirStatus) {
         {with({"-fps"}), 0, ""},
         {with({"-tess", "3"}), 0, "-tess needs two numbers; the tesselation levels stay at 1 1.\n"},
         {with({"-e"}), 0, "-e needs a file name; the error log keeps its usual name.\n"},
-        {{"-B", "t", "a"}, 1, "-B needs five arguments: track apply dag off out\n"},
-        {{"-nogeom", "-a", "x.kset"},
-         1,
-         "chirrup: the main window is not built into this program yet; use -B for batch mode.\n"}};
+        {{"-B", "t", "a"}, 1, "-B needs five arguments: track apply dag off out\n"}};
     for (const auto& [args, status, err] : rows) {
         const RunResult r = Run(args);
         EXPECT_EQ(r.status, status) << args.back();
         EXPECT_EQ(r.err, err) << args.back();
         EXPECT_EQ(r.out, "");
     }
+    // Without a display the window cannot open: said plainly, status 1, nothing else done.
+    const RunResult r = Run({"-nogeom", "-a", "x.kset"}, {{"DISPLAY", std::nullopt}});
+    EXPECT_EQ(r.status, 1);
+    EXPECT_EQ(r.err,
+              "chirrup: cannot open the display \"\".\n"
+              "chirrup: no display to open the window on; use -B for batch mode.\n");
+    EXPECT_FALSE(FileExists(dir / "work/_m.keyset"));
 }
 
 // The track's key at frame 30 lands at 30 / fps seconds in the stored scene. The key shapes

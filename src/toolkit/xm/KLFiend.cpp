@@ -13,13 +13,15 @@ std::unordered_map<Widget, KLFiend*>& registry() {
 }  // namespace
 
 void KLFiendCallback::Call(KLFiend* fiend) const {
-    if (function) function(fiend ? fiend->GetWidget() : nullptr, clientData, fiend);
+    if (function)
+        function(fiend ? fiend->GetWidget() : nullptr, clientData, fiend);
 }
 
 KLFiend::KLFiend(Widget parent, const char* name) : parent_(parent), name_(name ? name : "") {}
 
 KLFiend::~KLFiend() {
-    if (!widget_) return;
+    if (!widget_)
+        return;
     registry().erase(widget_);
     if (!widgetGone_) {
         // Deleted by its owner rather than through the widget: the widget goes too, but must
@@ -29,10 +31,13 @@ KLFiend::~KLFiend() {
     }
 }
 
-bool KLFiend::SetFiendCallback(const char*, KLFiendProc, XtPointer) { return false; }
+bool KLFiend::SetFiendCallback(const char*, KLFiendProc, XtPointer) {
+    return false;
+}
 
 KLFiend* KLFiend::FromWidget(Widget widget) {
-    if (!widget) return nullptr;
+    if (!widget)
+        return nullptr;
     auto found = registry().find(widget);
     return found == registry().end() ? nullptr : found->second;
 }
@@ -43,7 +48,8 @@ void KLFiend::attach_widget(Widget widget) {
         XtRemoveCallback(widget_, XtNdestroyCallback, destroy_cb, this);
     }
     widget_ = widget;
-    if (!widget_) return;
+    if (!widget_)
+        return;
     registry()[widget_] = this;
     XtAddCallback(widget_, XtNdestroyCallback, destroy_cb, this);
 }

@@ -37,17 +37,21 @@ void unregister_cb(Widget widget, XtPointer, XtPointer) {
 
 bool is_under(Widget widget, Widget root) {
     for (Widget w = widget; w; w = XtParent(w))
-        if (w == root) return true;
+        if (w == root)
+            return true;
     return false;
 }
 
 int marker_depth(const char* marker) {
     int depth = 0;
-    while (marker[depth] == '.') depth++;
+    while (marker[depth] == '.')
+        depth++;
     return depth;
 }
 
-bool is_pulldown(KLWidgetCreateProc create) { return create == XmCreatePulldownMenu; }
+bool is_pulldown(KLWidgetCreateProc create) {
+    return create == XmCreatePulldownMenu;
+}
 
 bool is_cascade(Widget w) {
     return w && (XmIsCascadeButton(w) || XmIsCascadeButtonGadget(w));
@@ -59,7 +63,8 @@ Widget add_entry(Widget menu, const char* label, XtCallbackProc function, XtPoin
     Cardinal n = 0;
     XmString text = XmStringCreateLocalized(const_cast<char*>(label));
     XtSetArg(args[n], XmNlabelString, text), n++;
-    if (position >= 0) XtSetArg(args[n], XmNpositionIndex, position), n++;
+    if (position >= 0)
+        XtSetArg(args[n], XmNpositionIndex, position), n++;
     Widget entry = toggle ? XmCreateToggleButton(menu, const_cast<char*>(label), args, n)
                           : XmCreatePushButton(menu, const_cast<char*>(label), args, n);
     XmStringFree(text);
@@ -71,15 +76,19 @@ Widget add_entry(Widget menu, const char* label, XtCallbackProc function, XtPoin
 }
 }  // namespace
 
-KLXmGnome::KLXmGnome() { theGnome = this; }
-
-KLXmGnome::~KLXmGnome() {
-    if (theGnome == this) theGnome = nullptr;
+KLXmGnome::KLXmGnome() {
+    theGnome = this;
 }
 
-Widget KLXmGnome::OpenApplication(const char* appName, const char* appClass, int* argc,
-                                  char** argv, const char* const* fallbackResources) {
-    if (appShell) return appShell;
+KLXmGnome::~KLXmGnome() {
+    if (theGnome == this)
+        theGnome = nullptr;
+}
+
+Widget KLXmGnome::OpenApplication(const char* appName, const char* appClass, int* argc, char** argv,
+                                  const char* const* fallbackResources) {
+    if (appShell)
+        return appShell;
     XtToolkitInitialize();
     appContext = XtCreateApplicationContext();
     if (fallbackResources)
@@ -87,7 +96,8 @@ Widget KLXmGnome::OpenApplication(const char* appName, const char* appClass, int
     int count = argc ? *argc : 0;
     Display* display = XtOpenDisplay(appContext, nullptr, const_cast<char*>(appName),
                                      const_cast<char*>(appClass), nullptr, 0, &count, argv);
-    if (argc) *argc = count;
+    if (argc)
+        *argc = count;
     if (!display) {
         const char* name = getenv("DISPLAY");
         fprintf(stderr, "chirrup: cannot open the display \"%s\".\n", name ? name : "");
@@ -102,7 +112,8 @@ Widget KLXmGnome::OpenApplication(const char* appName, const char* appClass, int
 int KLXmGnome::Initialize(const char* appName, const char* appClass, const KLWidgetSpec* spec,
                           int* argc, char** argv, const char* const* fallbackResources) {
     Widget shell = OpenApplication(appName, appClass, argc, argv, fallbackResources);
-    if (!shell) return 0;
+    if (!shell)
+        return 0;
     BuildWidgetTree(shell, spec);
     DressWidgets();
     XtRealizeWidget(shell);
@@ -142,7 +153,8 @@ void KLXmGnome::BuildWidgetTree(Widget parent, const KLWidgetSpec* spec) {
         }
         RegisterWidget(created);
         // Pulldowns stay unmanaged: the cascade pops them up.
-        if (manage && !is_pulldown(row->create)) XtManageChild(created);
+        if (manage && !is_pulldown(row->create))
+            XtManageChild(created);
         parents.resize(depth + 1);
         parents.push_back(created);
         previous = created;
@@ -150,15 +162,18 @@ void KLXmGnome::BuildWidgetTree(Widget parent, const KLWidgetSpec* spec) {
 }
 
 Widget KLXmGnome::FindWidget(const char* name, Widget root) {
-    if (!name) return nullptr;
+    if (!name)
+        return nullptr;
     for (Widget w : registry()) {
-        if (strcmp(XtName(w), name) == 0 && (!root || is_under(w, root))) return w;
+        if (strcmp(XtName(w), name) == 0 && (!root || is_under(w, root)))
+            return w;
     }
     return nullptr;
 }
 
 void KLXmGnome::RegisterWidget(Widget widget) {
-    if (!widget) return;
+    if (!widget)
+        return;
     registry().push_back(widget);
     XtAddCallback(widget, XtNdestroyCallback, unregister_cb, nullptr);
 }
@@ -176,48 +191,65 @@ void KLXmGnome::AddCallback(const char* name, const char* callbackName, XtCallba
 
 Widget KLXmGnome::AddMenuEntry(Widget menu, const char* label, XtCallbackProc function,
                                XtPointer clientData, int position) {
-    if (!menu) return nullptr;
+    if (!menu)
+        return nullptr;
     return add_entry(menu, label ? label : "", function, clientData, position, false);
 }
 
 Widget KLXmGnome::AddMenuToggle(Widget menu, const char* label, XtCallbackProc function,
                                 XtPointer clientData, int position) {
-    if (!menu) return nullptr;
+    if (!menu)
+        return nullptr;
     return add_entry(menu, label ? label : "", function, clientData, position, true);
 }
 
 void KLXmGnome::EmptyMenu(Widget menu, int keep) {
-    if (!menu) return;
+    if (!menu)
+        return;
     WidgetList children = nullptr;
     Cardinal count = 0;
     XtVaGetValues(menu, XmNchildren, &children, XmNnumChildren, &count, nullptr);
     std::vector<Widget> doomed;
-    for (Cardinal i = keep < 0 ? 0 : keep; i < count; i++) doomed.push_back(children[i]);
-    for (Widget w : doomed) XtDestroyWidget(w);
+    for (Cardinal i = keep < 0 ? 0 : keep; i < count; i++)
+        doomed.push_back(children[i]);
+    for (Widget w : doomed)
+        XtDestroyWidget(w);
 }
 
 void KLXmGnome::LoadFiendResources(const char* const* resources) {
-    if (!appShell || !resources) return;
+    if (!appShell || !resources)
+        return;
     XrmDatabase fallback = nullptr;
-    for (const char* const* line = resources; *line; ++line) XrmPutLineResource(&fallback, *line);
+    for (const char* const* line = resources; *line; ++line)
+        XrmPutLineResource(&fallback, *line);
     XrmDatabase db = XtDatabase(XtDisplay(appShell));
     // Entries already in the database (resource files, -xrm) win over the fallbacks.
     XrmCombineDatabase(fallback, &db, False);
 }
 
 void KLXmGnome::MainLoop() {
-    if (appContext) XtAppMainLoop(appContext);
+    if (appContext)
+        XtAppMainLoop(appContext);
 }
 
 void KLXmGnome::ProcessUntil(const std::function<bool()>& done) {
-    while (appContext && !done()) XtAppProcessEvent(appContext, XtIMAll);
+    while (appContext && !done())
+        XtAppProcessEvent(appContext, XtIMAll);
 }
 
 void KLXmGnome::ProcessPending() {
-    if (!appContext) return;
-    while (XtAppPending(appContext)) XtAppProcessEvent(appContext, XtIMAll);
+    if (!appContext)
+        return;
+    while (XtAppPending(appContext))
+        XtAppProcessEvent(appContext, XtIMAll);
 }
 
-XtAppContext KLXmGnome::AppContext() { return appContext; }
-Widget KLXmGnome::AppShell() { return appShell; }
-Display* KLXmGnome::GetDisplay() { return appShell ? XtDisplay(appShell) : nullptr; }
+XtAppContext KLXmGnome::AppContext() {
+    return appContext;
+}
+Widget KLXmGnome::AppShell() {
+    return appShell;
+}
+Display* KLXmGnome::GetDisplay() {
+    return appShell ? XtDisplay(appShell) : nullptr;
+}

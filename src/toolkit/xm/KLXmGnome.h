@@ -25,13 +25,13 @@ class KLXmGnome {
     // the class is found. Returns the shell, or null with a message on the error stream when
     // the display cannot be opened. Runs once per process: a second call returns the shell
     // of the first (Xt cannot reopen a display after destroying its context).
-    static Widget OpenApplication(const char* appName, const char* appClass, int* argc,
-                                  char** argv, const char* const* fallbackResources);
+    static Widget OpenApplication(const char* appName, const char* appClass, int* argc, char** argv,
+                                  const char* const* fallbackResources);
 
     // OpenApplication, BuildWidgetTree of `spec` under the shell, the virtual DressWidgets,
     // then realize. Returns 1, or 0 when the display could not be opened.
-    int Initialize(const char* appName, const char* appClass, const KLWidgetSpec* spec,
-                   int* argc, char** argv, const char* const* fallbackResources = nullptr);
+    int Initialize(const char* appName, const char* appClass, const KLWidgetSpec* spec, int* argc,
+                   char** argv, const char* const* fallbackResources = nullptr);
 
     // Dresses the built widgets (callbacks, fiends, initial states); called once by
     // Initialize. Returns 1.

@@ -1,0 +1,312 @@
+// The information bar (time, frame, keyset, duration, status line, error flag), the window's
+// messages and questions, the Help menu, the audio panel, the error-log viewer and the
+// Reference menu.
+#include <Xm/Form.h>
+#include <Xm/Label.h>
+#include <Xm/MessageB.h>
+#include <Xm/PushB.h>
+#include <Xm/Text.h>
+#include <Xm/Xm.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <fstream>
+#include <iostream>
+#include <sstream>
+
+#include "dialogs/RefLoadDialog.h"
+#include "toolkit/CuePrefs.h"
+#include "toolkit/KLErrHandler.h"
+#include "toolkit/KLString.h"
+#include "toolkit/xm/KLAlert.h"
+#include "toolkit/xm/KLImageView.h"
+#include "window/Gnome.h"
+#include "workspace/Imp.h"
+
+#if __has_include("chart/KLSyncChart.h")
+#include "chart/KLSyncChart.h"
+#define GNOME_HAS_CHART 1
+#endif
+
+namespace {
+const char kBuildStamp[] = "9704300208";
+
+void set_label(Widget w, const std::string& text) {
+    if (!w)
+        return;
+    XmString s = XmStringCreateLocalized(const_cast<char*>(text.c_str()));
+    XtVaSetValues(w, XmNlabelString, s, nullptr);
+    XmStringFree(s);
+}
+
+// A time in the form the program writes times (text, or binary when times are in binary).
+std::string time_text(CueTime t) {
+    std::ostringstream out;
+    if (CueTime::binaryIO)
+        t.WriteBinary(out);
+    else
+        t.Write(out);
+    return out.str();
+}
+
+// The read-only error-log window used when no viewer program is set or installed.
+Widget log_dialog = nullptr;
+
+void close_log_cb(Widget w, XtPointer, XtPointer) {
+    XtUnmanageChild(w);
+}
+
+void show_log_in_window(const std::string& fileName) {
+    Widget parent = KLXmGnome::FindWidget("console");
+    if (!parent)
+        return;
+    if (!log_dialog) {
+        Arg args[1];
+        XtSetArg(args[0], XmNautoUnmanage, False);
+        log_dialog = XmCreateMessageDialog(parent, const_cast<char*>("errorLogDialog"), args, 1);
+        XtUnmanageChild(XmMessageBoxGetChild(log_dialog, XmDIALOG_CANCEL_BUTTON));
+        XtUnmanageChild(XmMessageBoxGetChild(log_dialog, XmDIALOG_HELP_BUTTON));
+        XtUnmanageChild(XmMessageBoxGetChild(log_dialog, XmDIALOG_MESSAGE_LABEL));
+        XtAddCallback(log_dialog, XmNokCallback, close_log_cb, nullptr);
+        Arg targs[4];
+        XtSetArg(targs[0], XmNeditable, False);
+        XtSetArg(targs[1], XmNeditMode, XmMULTI_LINE_EDIT);
+        XtSetArg(targs[2], XmNrows, 24);
+        XtSetArg(targs[3], XmNcolumns, 80);
+        Widget text = XmCreateScrolledText(log_dialog, const_cast<char*>("errorLogText"), targs, 4);
+        XtManageChild(text);
+        KLXmGnome::RegisterWidget(text);
+    }
+    std::ifstream in(fileName);
+    std::stringstream content;
+    content << in.rdbuf();
+    if (Widget text = KLXmGnome::FindWidget("errorLogText", log_dialog))
+        XmTextSetString(text, const_cast<char*>(content.str().c_str()));
+    XtManageChild(log_dialog);
+}
+}  // namespace
+
+void Gnome::create_error_flag() {
+    Widget form = FindWidget("infoBarForm");
+    if (!form)
+        return;
+    errorFlag = XmCreatePushButton(form, const_cast<char*>("errorFlag"), nullptr, 0);
+    XtAddCallback(errorFlag, XmNactivateCallback, view_errors_cb, nullptr);
+    XtManageChild(errorFlag);
+    RegisterWidget(errorFlag);
+    statusLine = XmCreateLabel(form, const_cast<char*>("statusLine"), nullptr, 0);
+    XtManageChild(statusLine);
+    RegisterWidget(statusLine);
+    KLErrHandler::SetStatusHook(status_hook, this);
+}
+
+void Gnome::ShowStatus(const char* message) {
+    if (!statusLine)
+        return;
+    std::string text = message ? message : "";
+    while (!text.empty() && (text.back() == '\n' || text.back() == ' '))
+        text.pop_back();
+    set_label(statusLine, text);
+    // Shown at once, also in the middle of a long load.
+    if (XtIsRealized(statusLine))
+        XmUpdateDisplay(statusLine);
+}
+
+void Gnome::status_hook(const char* message, void* gnome) {
+    static_cast<Gnome*>(gnome)->ShowStatus(message);
+}
+
+void Gnome::DisplayTimecode(CueTime t) {
+    set_label(timeValueLabel, time_text(t));
+    std::ostringstream frames;
+    frames << t.Ticks() * double(CueTime::default_fps) / 6000.0;
+    set_label(frameValueLabel, frames.str());
+    if (Display* dpy = GetDisplay())
+        XFlush(dpy);
+}
+
+void Gnome::DisplayDuration(CueTime duration) {
+#ifdef GNOME_HAS_CHART
+    if (syncChart)
+        syncChart->SetUserDuration(duration);
+#endif
+    set_label(durationValueButton, time_text(duration));
+}
+
+void Gnome::DisplayReferenceOffset(CueTime offset) {
+    set_label(refAdjustButton, KLFmt("Set Reference Time [%s]", time_text(offset).c_str()));
+}
+
+void Gnome::DisplayReference(CueTime t) {
+    if (!refImageView)
+        return;
+    if (theImp.referenceLoaded && refViewOn)
+        refImageView->SetImage(theImp.GetReference(t));
+    else if (theImp.playblastLoaded && playblastViewOn)
+        refImageView->SetImage(theImp.GetPlayblast(t));
+    else
+        refImageView->SetImage(nullptr);
+}
+
+void Gnome::Inform(const char* message, const char* button) {
+    std::cerr << (message ? message : "") << std::endl;
+    if (attentionAlert)
+        attentionAlert->Notify(message, button);
+}
+
+int Gnome::Confirm(const char* message, const char* yes, const char* no) {
+    if (theImp.batchMode || !attentionAlert) {
+        std::cerr << (message ? message : "") << std::endl << "Assuming OK" << std::endl;
+        return 1;
+    }
+    return attentionAlert->Confirm(message, yes, no);
+}
+
+void Gnome::ShowErrorFlag() {
+    if (!errorFlag)
+        return;
+    Pixel fg = 0;
+    XtVaGetValues(errorFlag, XmNforeground, &fg, nullptr);
+    XtVaSetValues(errorFlag, XmNbackground, fg, nullptr);
+    XBell(XtDisplay(errorFlag), 100);
+}
+
+void Gnome::ClearErrorFlag() {
+    if (!errorFlag)
+        return;
+    Pixel bg = 0;
+    XtVaGetValues(XtParent(errorFlag), XmNbackground, &bg, nullptr);
+    XtVaSetValues(errorFlag, XmNbackground, bg, nullptr);
+}
+
+int Gnome::AdjustRelLoad(char** prefix, char** ext, int* start, int* end, int* by, int* zoom) {
+    if (!refLoadDialog)
+        return 0;
+    RefLoadDialog& d = *refLoadDialog;
+    d.SetPrefix(*prefix);
+    d.SetExt(*ext);
+    d.SetStart(*start);
+    d.SetEnd(*end);
+    d.SetBy(*by);
+    d.SetZoom(*zoom);
+    int ok = d.Show();
+    std::string newPrefix = d.Prefix();
+    if (newPrefix != (*prefix ? *prefix : "")) {
+        delete[] * prefix;
+        *prefix = KLNewString(newPrefix.c_str());
+    }
+    std::string newExt = d.Ext();
+    if (newExt != (*ext ? *ext : "")) {
+        delete[] * ext;
+        *ext = KLNewString(newExt.c_str());
+    }
+    *start = d.Start();
+    *end = d.End();
+    *by = d.By();
+    *zoom = d.Zoom();
+    if (refImageView)
+        refImageView->SetZoom(*zoom);
+    return ok;
+}
+
+void Gnome::help_cb(Widget, XtPointer clientData, XtPointer) {
+    const char* page = long(clientData) == 1 ? "Chirrup.html" : "chirrup.2.html";
+    const char* location = CuePrefs::Location();
+    const char* help = CuePrefs::HelpDir();
+    std::string command =
+        KLFmt("%s/bin/.nethelp %s/%s & \n", location ? location : ".", help ? help : ".", page);
+    if (std::system(command.c_str()) != 0) {
+        // A viewer that fails to start is not reported (the shell has said why).
+    }
+}
+
+void Gnome::version_cb(Widget, XtPointer, XtPointer) {
+    if (Gnome* g = TheGnome())
+        g->Inform(KLFmt("Tessel|Marlin Parlando and Facial Animation Version 2.0 (%s)", kBuildStamp)
+                      .c_str(),
+                  "OK");
+}
+
+void Gnome::open_audio_panel_cb(Widget, XtPointer, XtPointer) {
+    const char* command = nullptr;
+    if (access("/usr/sbin/apanel", X_OK) == 0)
+        command = "/usr/sbin/apanel";
+    else if (access("/usr/bin/pavucontrol", X_OK) == 0)
+        command = "/usr/bin/pavucontrol";
+    if (command) {
+        if (std::system(command) != 0) {
+            // The panel's own exit status is of no interest.
+        }
+    } else if (Gnome* g = TheGnome()) {
+        g->Inform("No audio control panel is installed (apanel or pavucontrol).", "Dismiss");
+    }
+}
+
+void Gnome::view_errors_cb(Widget, XtPointer, XtPointer) {
+    Imp::KLErrorLog* log = theImp.errorLog.get();
+    bool ownWindow = !std::getenv("TESSEL_USER_ERROR_READER") && access("/usr/sbin/jot", X_OK) != 0;
+    if (!log || !ownWindow) {
+        theImp.ViewErrorLog();
+        return;
+    }
+    // No viewer program: the log in a window of our own, with the same separator rule.
+    show_log_in_window(log->fileName);
+    if (log->handled != log->handledAtView)
+        log->append_msg("\n---------------------------------------\n\n");
+    log->handledAtView = log->handled;
+    theImp.UIClearErrorFlag();
+}
+
+void Gnome::delete_reference_cb(Widget, XtPointer, XtPointer) {
+    theImp.DeleteReference();
+    if (Gnome* g = TheGnome())
+        g->DisplayReference(CueTime());
+}
+
+void Gnome::adjust_reference_cb(Widget, XtPointer, XtPointer) {
+#ifdef GNOME_HAS_CHART
+    Gnome* g = TheGnome();
+    if (g && g->syncChart)
+        theImp.SetReferenceOffset(g->syncChart->GetIndicatorTime());
+#endif
+}
+
+void Gnome::set_reference_region_cb(Widget, XtPointer, XtPointer) {
+#ifdef GNOME_HAS_CHART
+    Gnome* g = TheGnome();
+    if (g && g->syncChart)
+        g->syncChart->SetZoomRange(theImp.referenceOffset, theImp.ReferenceEnd());
+#endif
+}
+
+void Gnome::ShowKeyframeImage() {
+    // The key and mix views follow the indicator through GoToTime's view steps.
+#ifdef GNOME_HAS_CHART
+    if (syncChart)
+        GoToTime(syncChart->GetIndicatorTime());
+#endif
+}
+
+void Gnome::show_keyframe_cb(Widget, XtPointer, KLFiend*) {
+#ifdef GNOME_HAS_CHART
+    Gnome* g = TheGnome();
+    if (g && g->syncChart) {
+        CueTime t = g->syncChart->GetIndicatorTime();
+        g->GoToTime(t);
+        g->DisplayTimecode(t);
+    }
+#endif
+}
+
+void Gnome::show_keyframe_image_cb(Widget, XtPointer, KLFiend*) {
+    if (Gnome* g = TheGnome())
+        g->ShowKeyframeImage();
+}
+
+void Gnome::show_reference_image_cb(Widget, XtPointer, KLFiend*) {
+#ifdef GNOME_HAS_CHART
+    Gnome* g = TheGnome();
+    if (g && g->syncChart)
+        g->DisplayReference(g->syncChart->GetIndicatorTime());
+#endif
+}

@@ -1,0 +1,220 @@
+// The apply dialog: what typed times mean, how each field corrects the others, the selected-item
+// rule, the two alerts, and the apply-file manager's store with and without VX_RAWFILE.
+#include <gtest/gtest.h>
+
+#include <Xm/List.h>
+#include <Xm/TextF.h>
+#include <Xm/Xm.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <string>
+
+#include "guitest/GuiTest.h"
+#include "model/KLEdlEvent.h"
+#include "model/KLKeySet.h"
+#include "toolkit/xm/KLAlert.h"
+#include "window/Gnome.h"
+#include "window/ReferenceFileManager.h"
+#include "window/SoundFileManager.h"
+#include "window/WindowTestUtil.h"
+#include "window/WireFileApplyManager.h"
+#include "window/WireFileManager.h"
+#include "workspace/Imp.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+CueTime Frames(int f) {
+    return CueTime::FromTicks(f * 200);
+}  // at 30 frames a second
+
+struct TypeinCase {
+    const char* text;
+    int32_t ticks;
+};
+
+class ParseTypeinTest : public ::testing::TestWithParam<TypeinCase> {};
+
+TEST_P(ParseTypeinTest, TextBecomesTime) {
+    CueTime::default_fps = 30;
+    EXPECT_EQ(Gnome::parse_typein(GetParam().text).Ticks(), GetParam().ticks) << GetParam().text;
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Texts, ParseTypeinTest,
+    ::testing::Values(TypeinCase{"1:2", 6000 + 400},                // seconds and frames
+                      TypeinCase{"1.2.3", 62 * 6000 + 600},         // minutes, seconds, frames
+                      TypeinCase{"1:0:0:0", 3600 * 6000},           // hours
+                      TypeinCase{"7:", 1400},                       // one number: frames
+                      TypeinCase{"12", 2400},                       // a frame count
+                      TypeinCase{"2.5", 2 * 6000 + 1000},           // a point makes a time code
+                      TypeinCase{"  12", 2400}, TypeinCase{"", 0},  // empty: time 0
+                      TypeinCase{"abc", 0}, TypeinCase{":", 0},     // nothing read: time 0
+                      TypeinCase{"-3", -600}));
+
+struct FieldCase {
+    const char* field;
+    int typed;                         // frames
+    int srcIn, srcOut, dstIn, dstOut;  // the event after, in frames
+};
+
+class ApplyTypeinTest : public ::testing::TestWithParam<FieldCase> {};
+
+TEST_P(ApplyTypeinTest, FieldCorrectsTheOthers) {
+    const FieldCase& c = GetParam();
+    // Before: source 10..40, destination 100..130; duration 60 frames.
+    KLEdlEvent e("scene.glb", Frames(10), Frames(40), Frames(100), Frames(130));
+    Gnome::apply_typein(&e, c.field, Frames(c.typed), Frames(60));
+    EXPECT_EQ(e.sourceIn, Frames(c.srcIn));
+    EXPECT_EQ(e.sourceOut, Frames(c.srcOut));
+    EXPECT_EQ(e.destIn, Frames(c.dstIn));
+    EXPECT_EQ(e.destOut, Frames(c.dstOut));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Fields, ApplyTypeinTest,
+    ::testing::Values(FieldCase{"src_in", 20, 20, 40, 100, 120},
+                      FieldCase{"src_in", 50, 50, 50, 100, 100},  // out follows in
+                      FieldCase{"src_out", 30, 10, 30, 100, 120},
+                      FieldCase{"src_out", 90, 10, 60, 100, 150},  // cut to the duration
+                      FieldCase{"src_out", 5, 5, 5, 100, 100},     // in follows out
+                      FieldCase{"dst_in", 0, 10, 40, 0, 30},
+                      FieldCase{"dst_out", 200, 10, 40, 170, 200},  // keeps the length
+                      FieldCase{"nonsense", 7, 10, 40, 100, 130}));
+
+class ApplyDialogTest : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        gnome = &windowtest::TheWindow();
+        project = windowtest::DemoProject();
+        if (theImp.keysetCount == 0) {
+            ASSERT_EQ(theImp.LoadKeyset((project + "/misc_data/demo.kset").c_str()), 1);
+        }
+    }
+    Gnome* gnome = nullptr;
+    std::string project;
+};
+
+TEST_F(ApplyDialogTest, SelectedItemIsTheFirstWordOfTheNthSelection) {
+    Widget list = KLXmGnome::FindWidget("keyLister");
+    ASSERT_NE(list, nullptr);
+    gnome->update_apply_listers({});
+    int count = 0;
+    XtVaGetValues(list, XmNitemCount, &count, nullptr);
+    ASSERT_EQ(count, theImp.keysetCount);
+    EXPECT_EQ(Gnome::selected_item(list, 0), nullptr);  // nothing selected
+    XmListSelectPos(list, 2, False);
+    XmListSelectPos(list, 1, False);
+    ASSERT_NE(Gnome::selected_item(list, 0), nullptr);
+    EXPECT_STREQ(Gnome::selected_item(list, 0), theImp.GetKeySet(0)->Name());
+    EXPECT_STREQ(Gnome::selected_item(list, 1), theImp.GetKeySet(1)->Name());
+    EXPECT_EQ(Gnome::selected_item(list, 2), nullptr);
+    gnome->update_apply_listers({"two words", "<ROOT>"});
+    Widget dags = KLXmGnome::FindWidget("dagLister");
+    XmListSelectPos(dags, 1, False);
+    EXPECT_STREQ(Gnome::selected_item(dags, 0), "two");
+}
+
+TEST_F(ApplyDialogTest, OpeningTheApplyFileFillsTheDialog) {
+    theImp.OpenApplyWire((project + "/wire/face.glb").c_str());
+    ASSERT_TRUE(theImp.applyEvent);
+    Widget dialog = KLXmGnome::FindWidget("applyDialog");
+    EXPECT_TRUE(XtIsManaged(dialog));
+    Widget dags = KLXmGnome::FindWidget("dagLister");
+    int count = 0;
+    XtVaGetValues(dags, XmNitemCount, &count, nullptr);
+    EXPECT_GT(count, 1);
+    XmString first = XmStringCreateLocalized(const_cast<char*>("<ROOT>"));
+    EXPECT_EQ(XmListItemPos(dags, first), 1);
+    XmStringFree(first);
+    // A typed source out beyond the duration shows its corrected value.
+    Widget out = KLXmGnome::FindWidget("src_out");
+    XmTextFieldSetString(out, const_cast<char*>("100000"));
+    XtCallCallbacks(out, XmNactivateCallback, nullptr);
+    EXPECT_EQ(theImp.applyEvent->sourceOut, theImp.duration);
+    guitest::Settle();
+    guitest::Screenshot("window-apply-dialog");
+    Gnome::done_cb(nullptr, nullptr, nullptr);
+    EXPECT_FALSE(XtIsManaged(dialog));
+    EXPECT_FALSE(theImp.applyEvent->wire);
+}
+
+TEST_F(ApplyDialogTest, ApplyWithoutDagOrKeysetAlertsAndKeepsTheDialog) {
+    theImp.OpenApplyWire((project + "/wire/face.glb").c_str());
+    KLAlert* alert = gnome->attentionAlert.get();
+    for (bool withDag : {false, true}) {
+        XmListDeselectAllItems(KLXmGnome::FindWidget("keyLister"));
+        XmListDeselectAllItems(KLXmGnome::FindWidget("dagLister"));
+        if (withDag)
+            XmListSelectPos(KLXmGnome::FindWidget("dagLister"), 1, False);
+        std::string told;
+        windowtest::AnswerScript script({[&] {
+            if (!alert->Waiting() || !windowtest::Viewable(alert->Button(0)))
+                return false;
+            XmString s = nullptr;
+            XtVaGetValues(alert->GetDialog(), XmNmessageString, &s, nullptr);
+            char* text = nullptr;
+            XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+            told = text ? text : "";
+            XtFree(text);
+            XmStringFree(s);
+            return windowtest::ClickWhenViewable(alert->Button(0));
+        }});
+        Gnome::apply_cb(nullptr, nullptr, nullptr);
+        EXPECT_TRUE(script.Finished());
+        EXPECT_EQ(told, withDag ? "You must select one or more keysets to apply."
+                                : "You must select a dag node to apply under.");
+        EXPECT_TRUE(XtIsManaged(KLXmGnome::FindWidget("applyDialog")));
+    }
+    Gnome::done_cb(nullptr, nullptr, nullptr);
+}
+
+TEST_F(ApplyDialogTest, StoringTheApplyFileWritesRawGeometryOnlyWithVxRawfile) {
+    std::string out = project + "/wire/applied.glb";
+    for (bool raw : {false, true}) {
+        fs::remove(out);
+        fs::remove(out + ".raw");
+        if (raw)
+            setenv("VX_RAWFILE", "1", 1);
+        else
+            unsetenv("VX_RAWFILE");
+        theImp.OpenApplyWire((project + "/wire/face.glb").c_str());
+        theImp.applyEvent->OpenWire();
+        WireFileApplyManager manager(nullptr);
+        EXPECT_EQ(manager.StoreFile(out.c_str()), 1);
+        EXPECT_TRUE(fs::exists(out));
+        EXPECT_EQ(fs::exists(out + ".raw"), raw);
+        Gnome::done_cb(nullptr, nullptr, nullptr);
+    }
+    unsetenv("VX_RAWFILE");
+    std::ifstream in(out + ".raw");
+    std::string line;
+    int vertices = 0, faces = 0;
+    while (std::getline(in, line)) {
+        vertices += line.rfind("v ", 0) == 0;
+        faces += line.rfind("f ", 0) == 0;
+    }
+    EXPECT_GT(vertices, 3);
+    EXPECT_GT(faces, 0);
+}
+
+TEST(FileManagers, KindsFiltersAndStores) {
+    SoundFileManager sound(nullptr);
+    ReferenceFileManager reference(nullptr);
+    WireFileManager wire(nullptr);
+    EXPECT_STREQ(sound.FileTypeName(), "Sound");
+    EXPECT_EQ(KLFileManager::FilterMask(sound.Pattern(), sound.Extension()), "*.aif[cf]");
+    EXPECT_EQ(KLFileManager::FilterMask(reference.Pattern(), reference.Extension()), "*");
+    std::string nowhere = fs::temp_directory_path() / "chirrup-never-written";
+    fs::remove(nowhere);
+    EXPECT_EQ(sound.StoreFile(nowhere.c_str()), 1);  // succeeds and writes nothing
+    EXPECT_EQ(wire.StoreFile(nowhere.c_str()), 1);
+    EXPECT_EQ(wire.RetrieveFile(nowhere.c_str()), 1);
+    EXPECT_EQ(reference.StoreFile(nowhere.c_str()), 0);  // refused
+    EXPECT_FALSE(fs::exists(nowhere));
+}
+
+}  // namespace
