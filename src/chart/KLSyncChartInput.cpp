@@ -1,0 +1,501 @@
+// The sync chart's pointer and keyboard: the indicator, scrubbing, key, key-stick and mark
+// drags, the region sweep, typed marks, and the active key and mark that follow the indicator.
+#include <X11/XKBlib.h>
+#include <X11/Xutil.h>
+#include <X11/keysym.h>
+
+#include <algorithm>
+#include <cctype>
+#include <chrono>
+#include <climits>
+#include <cstdlib>
+#include <thread>
+
+#include "chart/KLChartText.h"
+#include "chart/KLSyncChart.h"
+#include "model/KLKey.h"
+#include "model/KLKeyTrack.h"
+#include "model/KLMarkTrack.h"
+#include "toolkit/KLSoundControl.h"
+#include "toolkit/KLTimer.h"
+#include "toolkit/KLTimerBeat.h"
+
+KLKeyEvent* KLSyncChart::hitKey = nullptr;
+KLMarkEvent* KLSyncChart::hitMark = nullptr;
+int KLSyncChart::keyHighlightX = -1;
+int KLSyncChart::markHighlightX = -1;
+CueTime KLSyncChart::feedbackTime;
+CueTime KLSyncChart::lastTypedTime;
+int KLSyncChart::lastTypedX = -2;
+float KLSyncChart::scrubPosition = 0.0f;
+std::unique_ptr<KLTimer> KLSyncChart::scrubTimer;
+
+namespace {
+const CueTime kOneFrame(1.0, 0);
+// Half the width of the strip restored around a key while it is dragged or highlighted.
+constexpr int kKeyStripHalf = 5;
+}  // namespace
+
+void KLSyncChart::input(XEvent* event) {
+    if (!event)
+        return;
+    switch (event->type) {
+        case ButtonPress: {
+            const int x = event->xbutton.x;
+            if (event->xbutton.button == Button1) {
+                if (sound && (event->xbutton.state & ShiftMask)) {
+                    dragMode = 4;
+                    scrub(x, 0);
+                } else if (handle_keyframe_hit(event)) {
+                    dragMode = 2;
+                    drag_key(x, 0);
+                } else if (handle_mark_hit(event)) {
+                    dragMode = 3;
+                    drag_mark(x, 0);
+                } else if (handle_keystick_hit(event)) {
+                    dragMode = 5;
+                    drag_keystick(event->xbutton.y, 0);
+                } else {
+                    dragMode = 1;
+                    drag_1(x, 0);
+                }
+            } else if (event->xbutton.button == Button2) {
+                drag_region(x, 0);
+            }
+            break;
+        }
+        case MotionNotify: {
+            const int x = event->xmotion.x;
+            if (event->xmotion.state & Button1Mask) {
+                switch (dragMode) {
+                    case 1:
+                        drag_1(x, 1);
+                        break;
+                    case 2:
+                        drag_key(x, 1);
+                        break;
+                    case 3:
+                        drag_mark(x, 1);
+                        break;
+                    case 4:
+                        scrub(x, 1);
+                        break;
+                    case 5:
+                        drag_keystick(event->xmotion.y, 1);
+                        break;
+                    default:
+                        break;
+                }
+            } else if (event->xmotion.state & Button2Mask) {
+                drag_region(x, 1);
+            }
+            break;
+        }
+        case ButtonRelease: {
+            const int x = event->xbutton.x;
+            if (event->xbutton.button == Button1) {
+                switch (dragMode) {
+                    case 1:
+                        drag_1(x, 2);
+                        break;
+                    case 2:
+                        drag_key(x, 2);
+                        break;
+                    case 3:
+                        drag_mark(x, 2);
+                        break;
+                    case 4:
+                        scrub(x, 2);
+                        break;
+                    case 5:
+                        drag_keystick(event->xbutton.y, 2);
+                        break;
+                    default:
+                        break;
+                }
+                dragMode = 0;
+            } else if (event->xbutton.button == Button2) {
+                drag_region(x, 2);
+            }
+            break;
+        }
+        case KeyPress: {
+            char text[20] = {0};
+            KeySym keysym = NoSymbol;
+            const int count = XLookupString(&event->xkey, text, sizeof(text) - 1, &keysym, nullptr);
+            handle_keyboard_input(keysym, count, text);
+            break;
+        }
+        default:
+            break;
+    }
+}
+
+// --- Hit tests --------------------------------------------------------------------------
+
+int KLSyncChart::handle_keyframe_hit(XEvent* event) {
+    const int x = event->xbutton.x, y = event->xbutton.y;
+    if (!keyTrack || !geometry.InKeyLetterStrip(y))
+        return 0;
+    KLKeyEvent *before = nullptr, *after = nullptr;
+    keyTrack->bracket_keys_from_time(geometry.TimeFromColumn(x), &before, &after);
+    for (KLKeyEvent* k : {before, after}) {
+        if (k && KLChartGeometry::Hits(geometry.ColumnFromTime(k->time), x)) {
+            hitKey = k;
+            return 1;
+        }
+    }
+    return 0;
+}
+
+int KLSyncChart::handle_keystick_hit(XEvent* event) {
+    const int x = event->xbutton.x, y = event->xbutton.y;
+    if (!keyTrack || !geometry.InStickBand(y))
+        return 0;
+    KLKeyEvent *before = nullptr, *after = nullptr;
+    keyTrack->bracket_keys_from_time(geometry.TimeFromColumn(x), &before, &after);
+    for (KLKeyEvent* k : {before, after}) {
+        if (k && KLChartGeometry::Hits(geometry.ColumnFromTime(k->time), x) &&
+            std::abs(y - geometry.TickRow(k->value)) < 5) {
+            hitKey = k;
+            return 1;
+        }
+    }
+    return 0;
+}
+
+int KLSyncChart::handle_mark_hit(XEvent* event) {
+    const int x = event->xbutton.x, y = event->xbutton.y;
+    if (!markTrack || !geometry.InMarkStrip(y))
+        return 0;
+    KLMarkEvent *before = nullptr, *after = nullptr;
+    markTrack->BracketMarks(geometry.TimeFromColumn(x), &before, &after);
+    for (KLMarkEvent* m : {before, after}) {
+        const int column = m ? geometry.ColumnFromTime(m->time) : -100;
+        if (m && KLChartGeometry::Hits(column, x)) {
+            hitMark = m;
+            return 1;
+        }
+    }
+    return 0;
+}
+
+// --- Drags ------------------------------------------------------------------------------
+
+void KLSyncChart::move_indicator(int x) {
+    if (geometry.ValidColumn(geometry.indicatorX))
+        reveal(geometry.indicatorX, 0, 1, int(geometry.height));
+    if (geometry.ValidColumn(x)) {
+        geometry.indicatorX = x;
+        draw_indicator();
+    }
+}
+
+void KLSyncChart::drag_1(int x, int) {
+    move_indicator(x);
+    feedback_meter_movement();
+}
+
+void KLSyncChart::drag_region(int x, int phase) {
+    if (phase == 0) {
+        geometry.ClearRegion();
+        full_expose();
+        regionAnchor_ = x;
+        regionLeft_ = x;
+        regionWidth_ = 0;
+        return;
+    }
+    const int left = std::min(regionAnchor_, x);
+    const int width = std::abs(x - regionAnchor_);
+    const int oldL = regionLeft_, oldR = regionLeft_ + regionWidth_;
+    const int newL = left, newR = left + width;
+    auto copy = [this](Pixmap from, int a, int b) {
+        a = std::max(a, 0);
+        b = std::min(b, int(geometry.width));
+        if (a < b && drawable())
+            XCopyArea(display, from, window, gc, a, 0, unsigned(b - a), geometry.height, a, 0);
+    };
+    // What the old rectangle no longer covers goes back to normal; what is new is region.
+    copy(chartPixmap, oldL, std::min(oldR, newL));
+    copy(chartPixmap, std::max(oldL, newR), oldR);
+    copy(regionPixmap, newL, std::min(newR, oldL));
+    copy(regionPixmap, std::max(newL, oldR), newR);
+    regionLeft_ = newL;
+    regionWidth_ = width;
+    if (phase == 2) {
+        if (width > 0) {
+            geometry.regionStart = float(std::max(geometry.FractionFromColumn(left), 0.0));
+            geometry.regionEnd =
+                float(std::min(geometry.FractionFromColumn(left + width - 1), 1.0));
+        } else {
+            geometry.ClearRegion();
+        }
+    }
+    draw_indicator();
+    if (display)
+        XFlush(display);
+}
+
+void KLSyncChart::erase_key_strip(int x) {
+    reveal(x - kKeyStripHalf, geometry.lowerBandTop, 2 * kKeyStripHalf + 1,
+           int(geometry.height) - geometry.lowerBandTop);
+}
+
+void KLSyncChart::erase_mark_strip(int x) {
+    const int w = font ? std::max(font->Width("M", 1), 1) : 10;
+    reveal(x - w / 2, 0, w, geometry.waveTop + 5);
+}
+
+void KLSyncChart::draw_dragged_key(int x) {
+    if (!window || !gc || !hitKey)
+        return;
+    draw_stick(window, x, hitKey->value, keyActiveColor);
+    const char* name = hitKey->key ? hitKey->key->Name() : nullptr;
+    if (name && name[0] && font) {
+        const int half = font->Width(name, 1) / 2;
+        font->DrawImage(window, gc, foreground, keyActiveColor, x - half,
+                        geometry.textBaseline + 15, name, 1);
+    }
+}
+
+void KLSyncChart::draw_dragged_mark(int x) {
+    if (!window || !gc || !hitMark || !font)
+        return;
+    const int half = font->Width(&hitMark->label, 1) / 2;
+    font->DrawImage(window, gc, foreground, keyActiveColor, x - half, 12, &hitMark->label, 1);
+}
+
+namespace {
+// A dragged object lands on a column inside the chart.
+int landing_column(int x, uint32_t width) {
+    return std::clamp(x, 0, std::max(int(width) - 1, 0));
+}
+}  // namespace
+
+void KLSyncChart::drag_key(int x, int phase) {
+    if (!keyTrack || !hitKey)
+        return;
+    if (dragX_ >= 0)
+        erase_key_strip(dragX_);
+    x = landing_column(x, geometry.width);
+    if (phase != 2) {
+        dragX_ = x;
+        draw_dragged_key(x);
+        XFlush(display);
+        return;
+    }
+    dragX_ = -1;
+    const KLKeyEvent moved = *hitKey;
+    const CueTime to = geometry.TimeFromColumn(x);
+    const bool wasActive = activeKey == hitKey;
+    if (to != moved.time && keyTrack->RemoveKey(moved.time)) {
+        if (wasActive)
+            activeKey = nullptr;
+        KLKeyEvent* landed =
+            keyTrack->InsertKey(moved.shapeIndex, to, moved.key, moved.smoothing, moved.value);
+        // A time that holds another key refuses it: the key goes back where it was.
+        if (!landed)
+            landed = keyTrack->InsertKey(moved.shapeIndex, moved.time, moved.key, moved.smoothing,
+                                         moved.value);
+        if (wasActive)
+            activeKey = landed;
+    }
+    hitKey = nullptr;
+    keyTrack->PrepareKeyFrames(nullptr);
+    needRedraw = true;
+    full_expose();
+    feedback_meter_movement();
+}
+
+void KLSyncChart::drag_keystick(int y, int phase) {
+    if (!keyTrack || !hitKey)
+        return;
+    const int x = geometry.ColumnFromTime(hitKey->time);
+    erase_key_strip(x);
+    hitKey->value = geometry.ValueFromRow(y);
+    if (phase != 2) {
+        draw_stick(window, x, hitKey->value, keyActiveColor);
+        XFlush(display);
+        return;
+    }
+    hitKey = nullptr;
+    keyTrack->PrepareKeyFrames(nullptr);
+    needRedraw = true;
+    full_expose();
+    feedback_meter_movement();
+}
+
+void KLSyncChart::drag_mark(int x, int phase) {
+    if (!markTrack || !hitMark)
+        return;
+    if (dragX_ >= 0)
+        erase_mark_strip(dragX_);
+    x = landing_column(x, geometry.width);
+    if (phase != 2) {
+        dragX_ = x;
+        draw_dragged_mark(x);
+        XFlush(display);
+        return;
+    }
+    dragX_ = -1;
+    const KLMarkEvent moved = *hitMark;
+    const CueTime to = geometry.TimeFromColumn(x);
+    if (to != moved.time && markTrack->RemoveMark(moved.time)) {
+        if (activeMark == hitMark)
+            activeMark = nullptr;
+        if (!markTrack->InsertMark(to, moved.label))
+            markTrack->InsertMark(moved.time, moved.label);
+    }
+    hitMark = nullptr;
+    needRedraw = true;
+    full_expose();
+    feedback_meter_movement();
+}
+
+void KLSyncChart::scrub(int x, int phase) {
+    move_indicator(x);
+    feedback_meter_movement();
+    const double s = geometry.FractionFromTime(CueTime());
+    const double e = geometry.FractionFromTime(sound_length());
+    const double f = geometry.IndicatorFraction();
+    scrubPosition = (s == e || f <= s) ? 0.0f : f >= e ? 1.0f : float((f - s) / (e - s));
+    if (phase == 0) {
+        if (scrubTimer)
+            return;
+        scrubTimer = std::make_unique<KLTimer>(CueTime(), CueTime::FromTicks(INT32_MAX));
+        KLSoundControl::PlayDrag(sound, scrubTimer.get(), 100, &scrubPosition);
+        KLTimerBeat::start();
+        scrubTimer->start();
+    } else if (phase == 2) {
+        stop_scrub();
+    }
+}
+
+void KLSyncChart::stop_scrub() {
+    if (!scrubTimer)
+        return;
+    scrubTimer->stop();
+    KLTimerBeat::stop();
+    // Twenty system ticks (1/100 s each) for the last grain to drain.
+    std::this_thread::sleep_for(std::chrono::milliseconds(200));
+    KLSoundControl::Stop();
+    scrubTimer.reset();
+    scrubPosition = 0.0f;
+}
+
+// --- Active key and mark, feedback --------------------------------------------------------
+
+void KLSyncChart::set_active_key(KLKeyEvent* event) {
+    activeKey = event;
+    if (keyHighlightX != -1) {
+        erase_key_strip(keyHighlightX);
+        keyHighlightX = -1;
+    }
+    if (!event)
+        return;
+    showKeyframeCallback.Call(this);
+    if (!window || !gc || activeKey != event)
+        return;
+    const int x = geometry.ColumnFromTime(event->time);
+    draw_stick(window, x, event->value, keyActiveColor);
+    keyHighlightX = x;
+}
+
+void KLSyncChart::set_active_mark(KLMarkEvent* mark) {
+    activeMark = mark;
+    if (markHighlightX != -1) {
+        erase_mark_strip(markHighlightX);
+        markHighlightX = -1;
+    }
+    if (!mark || !window || !gc || !font)
+        return;
+    const int x = geometry.ColumnFromTime(mark->time);
+    const int half = font->Width(&mark->label, 1) / 2;
+    font->DrawImage(window, gc, foreground, keyActiveColor, x - half, 12, &mark->label, 1);
+    markHighlightX = x;
+}
+
+void KLSyncChart::feedback_meter_movement() {
+    const CueTime t = GetIndicatorTime();
+    feedbackTime = t;
+    const int ix = geometry.indicatorX;
+    if (keyTrack) {
+        KLKeyEvent *before = nullptr, *after = nullptr;
+        feedbackBlend = keyTrack->bracket_keys_from_time(t, &before, &after);
+        KLKeyEvent* active = nullptr;
+        if (before && std::abs(geometry.ColumnFromTime(before->time) - ix) <= 4)
+            active = before;
+        else if (after && KLChartGeometry::Hits(geometry.ColumnFromTime(after->time), ix))
+            active = after;
+        set_active_key(active);
+        feedbackKeyBefore = before ? before->shapeIndex : -1;
+        feedbackKeyAfter = after ? after->shapeIndex : -1;
+        showKeyframeImageCallback.Call(this);
+    }
+    if (markTrack) {
+        KLMarkEvent *before = nullptr, *after = nullptr;
+        markTrack->BracketMarks(t, &before, &after);
+        KLMarkEvent* active = nullptr;
+        if (before && KLChartGeometry::Hits(geometry.ColumnFromTime(before->time), ix))
+            active = before;
+        else if (after && KLChartGeometry::Hits(geometry.ColumnFromTime(after->time), ix))
+            active = after;
+        set_active_mark(active);
+    }
+    showReferenceImageCallback.Call(this);
+}
+
+// --- Keyboard ---------------------------------------------------------------------------
+
+void KLSyncChart::handle_keyboard_input(unsigned long keysym, int count, char* text) {
+    if (keysym == XK_Return || keysym == XK_Escape || (keysym >= XK_F1 && keysym <= XK_F12))
+        return;
+    if (keysym == XK_BackSpace || keysym == XK_Delete) {
+        if (!markTrack)
+            return;
+        KLMarkEvent* before = nullptr;
+        if (activeMark) {
+            const CueTime removed = activeMark->time;
+            activeMark = nullptr;
+            markTrack->RemoveMark(removed);
+            set_active_mark(nullptr);
+            needRedraw = true;
+            full_expose();
+            markTrack->BracketMarks(removed, &before, nullptr);
+        } else {
+            markTrack->BracketMarks(GetIndicatorTime(), &before, nullptr);
+        }
+        if (before) {
+            SetIndicatorTime(before->time);
+            set_active_mark(before);
+        }
+        return;
+    }
+    if (keysym == XK_space) {
+        set_active_mark(nullptr);
+        SetIndicatorTime(GetIndicatorTime() + kOneFrame);
+        full_expose();
+        return;
+    }
+    if (count != 1 || !text || !std::isgraph(static_cast<unsigned char>(text[0])) || !markTrack)
+        return;
+    CueTime t;
+    if (activeMark) {
+        t = activeMark->time;
+        activeMark = nullptr;
+        markTrack->RemoveMark(t);
+        set_active_mark(nullptr);
+    } else if (geometry.indicatorX == lastTypedX) {
+        // Frames narrower than a pixel: the indicator's column cannot tell where the last
+        // letter went, so the next one goes one frame after it.
+        t = lastTypedTime + kOneFrame;
+    } else {
+        t = GetIndicatorTime();
+    }
+    markTrack->InsertMark(t, text[0]);
+    lastTypedTime = t;
+    SetIndicatorTime(t + kOneFrame);
+    lastTypedX = geometry.indicatorX;
+    needRedraw = true;
+    full_expose();
+}

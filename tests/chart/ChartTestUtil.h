@@ -1,0 +1,116 @@
+#pragma once
+
+// GoogleTest first: the X headers define macros (None, Bool) that its names collide with.
+#include <gtest/gtest.h>
+
+#include "guitest/GuiTest.h"
+
+#include <X11/Shell.h>
+#include <X11/Xutil.h>
+#include <Xm/Xm.h>
+
+#include <memory>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "chart/KLSyncChart.h"
+#include "model/KLKeySet.h"
+#include "model/KLKeyTrack.h"
+#include "model/KLMarkTrack.h"
+#include "toolkit/CueSound.h"
+#include "toolkit/xm/KLXmGnome.h"
+
+// Reaches the chart's private state and steps for the tests.
+class KLSyncChartTestAccess {
+  public:
+    static void Feedback(KLSyncChart* c) { c->feedback_meter_movement(); }
+    static void SetActiveKey(KLSyncChart* c, KLKeyEvent* e) { c->set_active_key(e); }
+    static void SetActiveMark(KLSyncChart* c, KLMarkEvent* m) { c->set_active_mark(m); }
+    static void FullExpose(KLSyncChart* c) { c->expose(nullptr); }
+    static void Keyboard(KLSyncChart* c, unsigned long keysym, const char* text) {
+        char buffer[20] = {0};
+        int count = 0;
+        for (; text && text[count] && count < 19; count++)
+            buffer[count] = text[count];
+        c->handle_keyboard_input(keysym, count, buffer);
+    }
+};
+
+namespace charttest {
+
+// A chart on a top-level window of its own, its drawing area `width` x `height` pixels.
+// Destroying the window deletes the chart.
+class ChartWindow {
+  public:
+    ChartWindow(const char* name, int width, int height, bool map = true) {
+        shell = XtVaCreatePopupShell("chartTestShell", topLevelShellWidgetClass, guitest::Shell(),
+                                     XmNallowShellResize, True, nullptr);
+        Widget top = KLSyncChart::Create(shell, const_cast<char*>(name), nullptr, 0);
+        chart = static_cast<KLSyncChart*>(KLFiend::FromWidget(top));
+        XtVaSetValues(chart->drawingArea, XmNwidth, width, XmNheight, height, nullptr);
+        XtManageChild(top);
+        if (!map)
+            return;
+        XtPopup(shell, XtGrabNone);
+        guitest::WaitMapped(shell);
+        // The drawing area is never narrower than the zoom and pan bar under it.
+        guitest::WaitFor([this] { return chart->geometry.width > 0 && !chart->needRedraw; });
+        guitest::Settle();
+    }
+    ~ChartWindow() {
+        XtDestroyWidget(shell);
+        guitest::Settle();
+    }
+    ChartWindow(const ChartWindow&) = delete;
+    ChartWindow& operator=(const ChartWindow&) = delete;
+
+    unsigned long Pixel(int x, int y) {
+        guitest::Settle();
+        return guitest::PixelAt(chart->drawingArea, x, y);
+    }
+
+    // The pixels of a rectangle of the window, row by row.
+    std::vector<unsigned long> Pixels(int x, int y, int w, int h) {
+        guitest::Settle();
+        std::vector<unsigned long> pixels;
+        XImage* image = XGetImage(guitest::GetDisplay(), XtWindow(chart->drawingArea), x, y,
+                                  unsigned(w), unsigned(h), AllPlanes, ZPixmap);
+        if (!image)
+            return pixels;
+        for (int j = 0; j < h; j++)
+            for (int i = 0; i < w; i++)
+                pixels.push_back(XGetPixel(image, i, j));
+        XDestroyImage(image);
+        return pixels;
+    }
+
+    Widget shell = nullptr;
+    KLSyncChart* chart = nullptr;
+};
+
+// A kind-1 keyset "mouth" with the given key-shape names, index order.
+inline std::unique_ptr<KLKeySet> Keyset(const std::string& names, int kind = 1) {
+    auto set = std::make_unique<KLKeySet>("mouth", "face.glb");
+    std::istringstream in(names);
+    std::string name, block;
+    for (int frame = 0; in >> name; frame++)
+        block += "key " + name + " " + std::to_string(frame) + "\n";
+    block += "end\n";
+    std::istringstream keys(block);
+    set->Read(keys);
+    set->kind = kind;
+    return set;
+}
+
+// A time `seconds` into the chart.
+inline CueTime Seconds(double seconds) {
+    return CueTime::FromSeconds(seconds);
+}
+
+// A mono sound of the given samples at `rate`.
+inline std::unique_ptr<CueSound> Sound(std::vector<float> samples, double rate) {
+    return CueSound::FromSamples({std::move(samples)}, rate);
+}
+
+}  // namespace charttest

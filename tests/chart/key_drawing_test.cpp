@@ -1,0 +1,101 @@
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+#include "chart/KLChartGeometry.h"
+#include "chart/KLKeyDrawing.h"
+#include "model/KLKeySet.h"
+#include "model/KLKeyTrack.h"
+
+namespace {
+
+// A 400 x 300 chart of ten seconds (lower band 200, base line 280) over a track of keyset
+// "rest AI E".
+class KeyDrawing : public testing::Test {
+  protected:
+    void SetUp() override {
+        std::istringstream keys("key rest 0\nkey AI 1\nkey E 2\nend\n");
+        keyset.Read(keys);
+        g.SetSize(400, 300);
+        g.duration = CueTime::FromSeconds(10);
+    }
+    void Key(int shape, double seconds, int smoothing, float value = 1.0f) {
+        track.InsertKey(shape, CueTime::FromSeconds(seconds), keyset.GetKeyShape(shape), smoothing,
+                        value);
+    }
+    KLKeySet keyset{"mouth", "face.glb"};
+    KLKeyTrack track{&keyset};
+    KLChartGeometry g;
+    KLKeyDrawing d;
+};
+
+TEST_F(KeyDrawing, HeldShapeIsOneFlatSegmentWhateverTheValues) {
+    Key(1, 1, 1, 0.2f);
+    Key(1, 3, 2, 2.0f);
+    d.Build(g, track);
+    ASSERT_EQ(d.linear.size(), 1u);
+    EXPECT_EQ(d.linear[0].x1, 40);
+    EXPECT_EQ(d.linear[0].x2, 120);
+    EXPECT_EQ(d.linear[0].y1, 280);
+    EXPECT_EQ(d.linear[0].y2, 280);
+    EXPECT_TRUE(d.ease.empty());
+    EXPECT_TRUE(d.smooth.empty());
+    ASSERT_EQ(d.letters.size(), 2u);
+    EXPECT_EQ(d.letters[0].letter, 'A');
+    EXPECT_EQ(d.letters[0].baseline, 295);
+}
+
+TEST_F(KeyDrawing, CurvesRiseIntoTheKeyTheyLeadToInItsShape) {
+    Key(0, 0, 0);
+    Key(1, 1, 0, 2.0f);  // Linear to the top of the band
+    Key(2, 2, 1);        // Ease: one segment per column
+    Key(0, 3, 2);        // Smooth
+    d.Build(g, track);
+    ASSERT_EQ(d.linear.size(), 1u);
+    EXPECT_EQ(d.linear[0].x1, 0);
+    EXPECT_EQ(d.linear[0].y1, 280);
+    EXPECT_EQ(d.linear[0].x2, 40);
+    EXPECT_EQ(d.linear[0].y2, 200);
+    EXPECT_EQ(d.ease.size(), 40u);
+    EXPECT_EQ(d.ease.front().y1, 280);
+    EXPECT_EQ(d.ease.back().y2, 240);
+    EXPECT_EQ(d.smooth.size(), 40u);
+}
+
+TEST_F(KeyDrawing, KeysInOneColumnShareTheirStick) {
+    for (int i = 0; i < 6; i++)
+        Key(i % 3, 1.0 + i * 0.001, 1, i < 3 ? 1.0f : 2.0f);
+    d.Build(g, track);
+    // One stick and two distinct ticks for the column, six letters.
+    EXPECT_EQ(d.sticks.size(), 3u);
+    EXPECT_EQ(d.letters.size(), 6u);
+}
+
+TEST_F(KeyDrawing, FarZoomsStayWithinTheDrawableRange) {
+    Key(0, 0, 1);
+    Key(1, 9, 1);
+    Key(2, 9.5, 2);
+    Key(0, 9.9, 0);
+    for (int i = 0; i < 60; i++)
+        g.ZoomIn();  // a span of 2^-60 around the middle
+    d.Build(g, track);
+    for (const auto* list : {&d.linear, &d.ease, &d.smooth}) {
+        EXPECT_LE(list->size(), 500u);
+        for (const auto& s : *list) {
+            EXPECT_GE(std::min(s.x1, s.x2), -17);
+            EXPECT_LE(std::max(s.x1, s.x2), 417);
+        }
+    }
+    EXPECT_TRUE(d.sticks.empty());  // no key lies in view
+}
+
+TEST_F(KeyDrawing, EmptyNamesDrawNoLetter) {
+    keyset.keyShapes.push_back(std::make_unique<KLKey>(3.0f, "", nullptr));
+    track.InsertKey(3, CueTime::FromSeconds(1), keyset.keyShapes.back().get(), 1, 1.0f);
+    track.InsertKey(1, CueTime::FromSeconds(2), nullptr, 1, 1.0f);
+    d.Build(g, track);
+    EXPECT_TRUE(d.letters.empty());
+    EXPECT_EQ(d.sticks.size(), 4u);
+}
+
+}  // namespace
