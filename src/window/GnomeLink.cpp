@@ -38,6 +38,7 @@ struct LinkWidgets {
     KLImageView* keyshapeImage = nullptr;
     Widget auditionButton = nullptr;
     Widget linkButton = nullptr;
+    Widget doneButton = nullptr;
 };
 LinkWidgets theLink;
 // The target's picture being shown (the view borrows it), and the sound being auditioned
@@ -53,6 +54,9 @@ Widget make(WidgetClass cls, const char* name, Widget parent, const char* label 
         XtVaSetValues(w, XmNlabelString, s, nullptr);
         XmStringFree(s);
     }
+    // Names other dialogs use too ("top_form", "frame", "done_button" ...) stay theirs.
+    if (!KLXmGnome::FindWidget(name))
+        KLXmGnome::RegisterWidget(w);
     return w;
 }
 
@@ -184,19 +188,18 @@ void Gnome::create_link_dialog() {
         Widget* widget;
     } const buttons[] = {{"link_button", "Link", &theLink.linkButton},
                          {"audition_button", "Audition", &theLink.auditionButton},
-                         {"done_button", "Dismiss", nullptr}};
+                         {"done_button", "Dismiss", &theLink.doneButton}};
     for (int i = 0; i < 3; ++i) {
         Widget w = make(xmPushButtonWidgetClass, buttons[i].name, bottom, buttons[i].label);
         XtVaSetValues(w, XmNleftAttachment, XmATTACH_POSITION, XmNleftPosition, i,
                       XmNrightAttachment, XmATTACH_POSITION, XmNrightPosition, i + 1, XmNleftOffset,
                       4, XmNrightOffset, 4, XmNtopAttachment, XmATTACH_FORM, XmNbottomAttachment,
                       XmATTACH_FORM, nullptr);
-        RegisterWidget(w);
-        if (buttons[i].widget)
-            *buttons[i].widget = w;
+        *buttons[i].widget = w;
     }
     XtSetSensitive(theLink.auditionButton, False);
-    AddCallback("done_button", XmNactivateCallback, link_done_cb, nullptr);
+    // Other dialogs have a "done_button" too: the callback goes on this one.
+    XtAddCallback(theLink.doneButton, XmNactivateCallback, link_done_cb, nullptr);
 }
 
 void Gnome::update_link_dialog(KLKeySet* keyset, CueRecognizer* recognizer) {
