@@ -13,6 +13,7 @@
 #include "WorkspaceTestUtil.h"
 #include "phoneme/PauseSplitter.h"
 #include "phoneme/PhoneTimeline.h"
+#include "toolkit/CueChirrup.h"
 #include "toolkit/CueRecognizerCatalog.h"
 #include "toolkit/CueSound.h"
 
@@ -76,6 +77,7 @@ class PhonemePlugin : public ::testing::Test {
     static void SetUpTestSuite() {
         catalog_ = new CueRecognizerCatalog;
         ASSERT_TRUE(catalog_->LoadPlugin(kPlugin.c_str()));
+        ASSERT_TRUE(catalog_->LoadPlugin(CHIRRUP_BINARY_DIR "/lib/chirrup/plugins/Loudness.so"));
         dialogue_ = new CueSound(kDialogue.c_str());
         ASSERT_TRUE(dialogue_->Valid()) << dialogue_->ErrorText();
     }
@@ -301,6 +303,104 @@ TEST_F(PhonemePlugin, RefusesSoundsItCannotAnalyse) {
     r->step = CueTime();
     EXPECT_FALSE(r->GuardedRecognize(*dialogue_));
     EXPECT_THAT(r->results, IsEmpty());
+}
+
+// What a plug-in asks of the window's panel, and the progress it reports, through a host
+// that records the calls.
+class RecordingHost : public CueChirrupHost {
+  public:
+    struct Control {
+        std::string name;
+        float minimum, maximum, value;
+        IntCallback intCallback = nullptr;
+        FloatCallback floatCallback = nullptr;
+        OptionCallback optionCallback = nullptr;
+        std::vector<std::string> labels;
+    };
+    std::vector<Control> controls;
+    std::vector<float> progress;
+
+    int CreateFloatSlider(CueRecognizer*, const char* name, float minimum, float maximum,
+                          float value, FloatCallback callback) override {
+        controls.push_back({name, minimum, maximum, value});
+        controls.back().floatCallback = callback;
+        return 1;
+    }
+    int SetFloatSlider(CueRecognizer*, const char*, float) override { return 1; }
+    int CreateIntSlider(CueRecognizer*, const char* name, int minimum, int maximum, int value,
+                        IntCallback callback) override {
+        controls.push_back({name, float(minimum), float(maximum), float(value)});
+        controls.back().intCallback = callback;
+        return 1;
+    }
+    int SetIntSlider(CueRecognizer*, const char*, int) override { return 1; }
+    int CreateOption(CueRecognizer*, const char* name, int count, const char* const* labels,
+                     int value, OptionCallback callback) override {
+        controls.push_back({name, 0.0f, float(count - 1), float(value)});
+        controls.back().optionCallback = callback;
+        controls.back().labels.assign(labels, labels + count);
+        return 1;
+    }
+    int SetOption(CueRecognizer*, const char*, int) override { return 1; }
+    void Progress(CueRecognizer*, float done) override { progress.push_back(done); }
+};
+
+class PluginPanels : public PhonemePlugin {
+  protected:
+    void SetUp() override {
+        PhonemePlugin::SetUp();
+        previous = CueChirrup::SetHost(&host);
+    }
+    void TearDown() override { CueChirrup::SetHost(previous); }
+    RecordingHost host;
+    CueChirrupHost* previous = nullptr;
+};
+
+TEST_F(PluginPanels, PhonemeHasStepMinimumAndSpeedAndReportsProgress) {
+    r->UpdatePanel();
+    ASSERT_EQ(host.controls.size(), 3u);
+    EXPECT_EQ(host.controls[0].name, "step");
+    EXPECT_EQ(host.controls[0].value, 1.0f);
+    EXPECT_EQ(host.controls[1].name, "minimum");
+    EXPECT_EQ(host.controls[1].value, 2.0f);
+    EXPECT_EQ(host.controls[2].name, "speed");
+    EXPECT_THAT(host.controls[2].labels, ElementsAre("fast", "balanced", "accurate"));
+    host.controls[0].intCallback(r.get(), 3);
+    host.controls[1].intCallback(r.get(), 4);
+    host.controls[2].optionCallback(r.get(), 2);
+    const std::string text = written(*r);
+    EXPECT_THAT(text, HasSubstr("    step 3\n"));
+    EXPECT_THAT(text, HasSubstr("    minimum 4\n    speed accurate\n"));
+
+    // Half a minute of speech takes long enough to report progress on the way.
+    std::vector<float> long_speech;
+    while (long_speech.size() < size_t(30 * dialogue_->Rate()))
+        long_speech.insert(long_speech.end(), dialogue_->Channel(0).begin(),
+                           dialogue_->Channel(0).end());
+    ASSERT_TRUE(read(*r, "speed fast\nend\n"));
+    ASSERT_TRUE(r->GuardedRecognize(*CueSound::FromSamples({long_speech}, dialogue_->Rate())));
+    ASSERT_FALSE(host.progress.empty());
+    EXPECT_TRUE(std::is_sorted(host.progress.begin(), host.progress.end()));
+    EXPECT_GE(host.progress.front(), 0.0f);
+    EXPECT_LE(host.progress.back(), 1.0f);
+}
+
+TEST_F(PluginPanels, LoudnessSlidersKeepHalfBelowOpen) {
+    std::unique_ptr<CueRecognizer> loudness(catalog_->FetchRecognizer("Loudness"));
+    ASSERT_TRUE(loudness);
+    loudness->UpdatePanel();
+    ASSERT_EQ(host.controls.size(), 3u);
+    EXPECT_EQ(host.controls[0].name, "step");
+    EXPECT_EQ(host.controls[1].name, "half");
+    EXPECT_EQ(host.controls[1].value, -36.0f);
+    EXPECT_EQ(host.controls[2].name, "open");
+    EXPECT_EQ(host.controls[2].value, -24.0f);
+    host.controls[1].floatCallback(loudness.get(), -20.0f);  // past "open": it moves up
+    EXPECT_THAT(written(*loudness), HasSubstr("    levels -20 -19\n"));
+    host.controls[2].floatCallback(loudness.get(), -30.0f);  // below "half": it moves down
+    EXPECT_THAT(written(*loudness), HasSubstr("    levels -31 -30\n"));
+    host.controls[0].intCallback(loudness.get(), 5);
+    EXPECT_THAT(written(*loudness), HasSubstr("    step 5\n"));
 }
 
 // The pure parts.
