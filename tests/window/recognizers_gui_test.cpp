@@ -357,4 +357,45 @@ TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
     click_panel("Phoneme", "Dismiss");
 }
 
+// A keyset without the recognizer hides its panel; coming back shows it again for the keyset.
+TEST_F(Recognizers, KeysetSwitchesHideAndShowPanels) {
+    choose_from_menu("Phoneme");
+    Widget container = panel_item("Phoneme", nullptr);
+    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
+    ASSERT_GE(theImp.keysetCount, 2);
+    ASSERT_EQ(theImp.GetKeySet(1)->GetRecognizer("Phoneme"), nullptr);
+    gnome->SetActiveKeyset(1);
+    gnome->update_recognizer_dialogs();
+    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(container); }));
+    EXPECT_EQ(mouth->GetRecognizer("Phoneme")->shown, 1) << "still wanted on the mouth";
+    gnome->SetActiveKeyset(0);
+    gnome->update_recognizer_dialogs();
+    EXPECT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
+    EXPECT_EQ(label_of(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
+    click_panel("Phoneme", "Dismiss");
+}
+
+// A menu entry whose plug-in cannot make a recognizer says so and adds nothing.
+TEST_F(Recognizers, UnknownRecognizerIsReported) {
+    KLAlert* alert = gnome->attentionAlert.get();
+    std::string told;
+    windowtest::AnswerScript script({[&] {
+        if (!alert->Waiting() || !windowtest::Viewable(alert->Button(0)))
+            return false;
+        XmString s = nullptr;
+        XtVaGetValues(alert->GetDialog(), XmNmessageString, &s, nullptr);
+        char* text = nullptr;
+        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+        told = text ? text : "";
+        XtFree(text);
+        XmStringFree(s);
+        return windowtest::ClickWhenViewable(alert->Button(0));
+    }});
+    const size_t before = mouth->recognizers.size();
+    Gnome::create_recognize_cb(nullptr, const_cast<char*>("Vowel"), nullptr);
+    EXPECT_TRUE(script.Finished());
+    EXPECT_EQ(told, "Failed to locate plug-in recognizer [Vowel].");
+    EXPECT_EQ(mouth->recognizers.size(), before);
+}
+
 }  // namespace
