@@ -31,11 +31,15 @@ times=()
 cpu=()
 for i in $(seq "$runs"); do
     start=$(date +%s.%N)
-    "$program" -e "$work/errlog.vx" demo.kset >/dev/null 2>&1 &
+    "$program" -e "$work/errlog.vx" demo.kset >"$work/run.txt" 2>&1 &
     pid=$!
     # Polled every few milliseconds (xdotool's own --sync waits half a second between looks).
     until xdotool search --onlyvisible --name '^Chirrup: ' >/dev/null 2>&1; do
-        kill -0 "$pid" 2>/dev/null || { echo "window-startup: the program ended" >&2; exit 1; }
+        kill -0 "$pid" 2>/dev/null || {
+            echo "window-startup: the program ended before its window was mapped:" >&2
+            cat "$work/run.txt" >&2
+            exit 1
+        }
         sleep 0.01
     done
     end=$(date +%s.%N)
@@ -58,7 +62,8 @@ for i in $(seq "$runs"); do
         rss=$(awk '/^VmRSS/ { print $2 }' "/proc/$pid/status")
         hwm=$(awk '/^VmHWM/ { print $2 }' "/proc/$pid/status")
     fi
-    kill "$pid"
+    # SIGKILL: a run killed otherwise makes its emergency save, which is not measured here.
+    kill -KILL "$pid"
     wait "$pid" 2>/dev/null || true
 done
 

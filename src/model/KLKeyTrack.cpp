@@ -36,6 +36,7 @@ KLKeyTrack::~KLKeyTrack() {
 KLKeyEvent* KLKeyTrack::InsertKey(int shapeIndex, CueTime t, KLKey* key, int smoothing,
                                   float value) {
     KLStdImp::Workspace().SetTrackModified();
+    ++previewRevision;
     KLKeyEvent* event = new KLKeyEvent(shapeIndex, t, key, smoothing, value);
     if (!events.Insert(event)) {
         delete event;
@@ -52,6 +53,7 @@ int KLKeyTrack::RemoveKey(CueTime t) {
     FinishFastAccess();
     delete event;
     KLStdImp::Workspace().SetTrackModified();
+    ++previewRevision;
     return 1;
 }
 
@@ -168,6 +170,7 @@ CueTime KLKeyTrack::Duration() const {
 }
 
 void KLKeyTrack::Clear() {
+    ++previewRevision;
     FinishFastAccess();
     events.DeleteAll();
     release_channels();

@@ -77,6 +77,11 @@ class KLKeyTrack {
     int Apply(KLWireSource* wire, const char* dagName, CueTime start, CueTime end, CueTime offset);
     // Fills the preview channels with one key per event (see KLKeyTrackApply.cpp).
     void PrepareKeyFrames(KLKeyFrameList* list);
+    // Fills the preview channels for the key-shape pictures instead: at each key shape's
+    // frame (as a time) the key-shape channel holds the shape and the value channel 1, so
+    // that the views show key shape i posed in full at that time (see KLKeyTrackApply.cpp).
+    // PrepareKeyFrames returns the track to its events.
+    void PrepareVuKeyFrames(KLKeyFrameList* list);
 
     // The key-track block: "event <frame> <key shape> [<smoothing> [<value>]]" lines up to
     // "end"; Read adds to the events already there, Write writes the event lines only.
@@ -93,9 +98,17 @@ class KLKeyTrack {
     int lookupMode = kPrevious;
     CueTime fastStart;  // time of entry 0
     CueTime fastEnd;    // end of the prepared range
+    // True between PrepareVuKeyFrames and the next PrepareKeyFrames: the preview channels
+    // hold the key shapes, not the events.
+    bool vuKeyFrames = false;
+    // Grows whenever the events or the preview channels change, so that the preview knows
+    // when to build its curves again.
+    int previewRevision = 0;
 
   private:
     KLKeyEvent* prev_event(CueTime t) const;
+    // Makes the two preview channels and registers them with `list` unless they exist.
+    void make_channels(KLKeyFrameList* list);
     void release_channels();
 
     std::unique_ptr<KLChannel> ownShape_;

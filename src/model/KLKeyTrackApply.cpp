@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "model/KLApplyCurve.h"
 #include "model/KLKey.h"
 #include "model/KLKeyChannel.h"
 #include "model/KLKeySet.h"
@@ -19,18 +20,6 @@
 
 namespace {
 using NodeHandle = std::unique_ptr<OrDagNode>;
-
-// The scene's tangent code for a key set with this smoothing.
-int tangent_code(int smoothing) {
-    switch (smoothing) {
-        case KLKeyEvent::kLinear:
-            return KLWire::kLinear;
-        case KLKeyEvent::kSmooth:
-            return KLWire::kSmooth;
-        default:
-            return KLWire::kFlat;
-    }
-}
 
 // The base node of an apply: the first top-level node named `dagName`, else the node of that
 // name anywhere below the root; null when there is none.
@@ -48,58 +37,6 @@ NodeHandle find_base(KLWireSource* wire, const char* dagName) {
     return NodeHandle(KLWire::FetchDagNode(root.get(), dagName));
 }
 
-// The keys of one curve, one per event inside the range. Arrays hold one spare entry: the
-// out-tangent of key k is written at k + 1.
-struct Curve {
-    explicit Curve(size_t events)
-        : times(events + 1), values(events + 1), in(events + 1), out(events + 1) {}
-    std::vector<CueTime> times;
-    std::vector<float> values;
-    std::vector<int> in;
-    std::vector<int> out;
-    int count = 0;
-
-    // Adds a key; each key leaves in the manner in which the key before it was set, the
-    // first one flat.
-    void Add(CueTime t, float value, int smoothing) {
-        if (count == 0)
-            out[0] = KLWire::kFlat;
-        times[count] = t;
-        values[count] = value;
-        in[count] = tangent_code(smoothing);
-        out[count + 1] = tangent_code(smoothing);
-        ++count;
-    }
-    void Store(OrDagNode* node, int channel) const {
-        if (count == 0)
-            return;
-        KLWire::alwaysClearChannel = 1;
-        KLWire::StoreChannel(node, channel, count, times.data(), values.data(), in.data(), nullptr,
-                             out.data(), nullptr);
-    }
-};
-
-// The node that a kind-1 key channel names, below `base`. A name that is not found whole is
-// cut at its first "#" and, when exactly one node bears the cut name, looked up again with
-// name demangling on. Sets *ambiguous when the cut name is not unique (or not there at all).
-NodeHandle find_channel_node(OrDagNode* base, const char* name, bool* ambiguous) {
-    *ambiguous = false;
-    NodeHandle node(KLWire::FetchDagNode(base, name));
-    if (node)
-        return node;
-    std::string cut(name);
-    const size_t hash = cut.find('#');
-    if (hash != std::string::npos)
-        cut.erase(hash);
-    if (KLWire::UniqueDagName(base, cut.c_str())) {
-        KLWire::DemangleNames(1);
-        node.reset(KLWire::FetchDagNode(base, cut.c_str()));
-        KLWire::DemangleNames(0);
-    } else {
-        *ambiguous = true;
-    }
-    return node;
-}
 }  // namespace
 
 // For each animated parameter of the keyset, one key per event with start <= time <= end (in
@@ -118,7 +55,6 @@ int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, Cu
     }
     if (!keySet)
         return 1;
-    const size_t eventCount = size_t(events.Count());
 
     if (keySet->kind == 1) {
         for (KLKeyChannel* kc : keySet->keyChannels) {
@@ -126,7 +62,7 @@ int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, Cu
             if (!kc->Constant())
                 KLInform("Apply [%s.%s]...\n", name, kc->GetChannelName());
             bool ambiguous = false;
-            NodeHandle node = find_channel_node(base.get(), name, &ambiguous);
+            NodeHandle node = KLFindChannelNode(base.get(), name, &ambiguous);
             if (!node) {
                 const std::string message =
                     ambiguous ? KLFmt("Dag name [%s] isn't unique, ignored.", name)
@@ -135,17 +71,7 @@ int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, Cu
                     return 0;
                 continue;
             }
-            const float rest = kc->Get(keySet->defaultIndex);
-            Curve curve(eventCount);
-            for (const KLKeyEvent* event : events) {
-                if (event->time < start || event->time > end)
-                    continue;
-                const int shape = event->key ? event->key->index : event->shapeIndex;
-                const float full = kc->Get(shape);
-                curve.Add(event->time + offset, rest + event->value * (full - rest),
-                          event->smoothing);
-            }
-            curve.Store(node.get(), kc->channel);
+            KLApplyCurve(*this, kc, start, end, offset).Store(node.get(), kc->channel);
         }
     } else if (keySet->kind == 2) {
         const char* name = keySet->nodeName ? keySet->nodeName->c_str() : "";
@@ -158,13 +84,7 @@ int KLKeyTrack::Apply(KLWireSource* wire, const char* dagName, CueTime start, Cu
                        ? 1
                        : 0;
         }
-        Curve curve(eventCount);
-        for (const KLKeyEvent* event : events) {
-            if (event->time < start || event->time > end)
-                continue;
-            curve.Add(event->time + offset, event->value, event->smoothing);
-        }
-        curve.Store(node.get(), keySet->channelIndex);
+        KLApplyCurve(*this, nullptr, start, end, offset).Store(node.get(), keySet->channelIndex);
     }
     return 1;
 }
@@ -181,19 +101,9 @@ void KLKeyTrack::PrepareKeyFrames(KLKeyFrameList* list) {
             list = keySet->keyFrameList;
         if (!list || !KLStdImp::Workspace().KeyFramePreparation())
             return;
-        if (!shapeChannel || !weightChannel) {
-            release_channels();
-            ownShape_ = std::make_unique<KLSplineChannel>();
-            ownWeight_ = std::make_unique<KLSplineChannel>();
-            ownShape_->SetStorageKeyed();
-            ownWeight_->SetStorageKeyed();
-            shapeChannel = ownShape_.get();
-            weightChannel = ownWeight_.get();
-            list->AddKeyChannel(shapeChannel, weightChannel);
-        } else {
-            shapeChannel->ClearAnimation();
-            weightChannel->ClearAnimation();
-        }
+        make_channels(list);
+        vuKeyFrames = false;
+        ++previewRevision;
         for (const KLKeyEvent* event : events) {
             const KLKey* key = event->key ? event->key : keySet->GetKeyShape(event->shapeIndex);
             if (key)
@@ -204,5 +114,53 @@ void KLKeyTrack::PrepareKeyFrames(KLKeyFrameList* list) {
         weightChannel->ClearAnimation();
         for (const KLKeyEvent* event : events)
             weightChannel->AddKey(event->time, event->value);
+        vuKeyFrames = false;
+        ++previewRevision;
     }
+}
+
+void KLKeyTrack::make_channels(KLKeyFrameList* list) {
+    if (shapeChannel && weightChannel) {
+        shapeChannel->ClearAnimation();
+        weightChannel->ClearAnimation();
+        return;
+    }
+    release_channels();
+    ownShape_ = std::make_unique<KLSplineChannel>();
+    ownWeight_ = std::make_unique<KLSplineChannel>();
+    ownShape_->SetStorageKeyed();
+    ownWeight_->SetStorageKeyed();
+    shapeChannel = ownShape_.get();
+    weightChannel = ownWeight_.get();
+    list->AddKeyChannel(shapeChannel, weightChannel);
+}
+
+// Kind 1: one key per key shape at the key shape's frame: the key-shape channel holds its
+// shapeValue and the value channel 1, so that the preview at that time is the key shape in
+// full. Under the same conditions as PrepareKeyFrames. Kind 2: the value channel, when there
+// is one, holds the keyset's rest value at every key shape (a single channel has no pose of
+// its own per key shape).
+void KLKeyTrack::PrepareVuKeyFrames(KLKeyFrameList* list) {
+    if (!keySet)
+        return;
+    if (keySet->kind == 1) {
+        if (!list)
+            list = keySet->keyFrameList;
+        if (!list || !KLStdImp::Workspace().KeyFramePreparation())
+            return;
+        make_channels(list);
+        for (const auto& key : keySet->keyShapes) {
+            const CueTime at = CueTime::FromFrames(key->frame);
+            shapeChannel->AddKey(at, float(key->shapeValue));
+            weightChannel->AddKey(at, 1.0f);
+        }
+    } else if (keySet->kind == 2 && weightChannel) {
+        weightChannel->ClearAnimation();
+        for (const auto& key : keySet->keyShapes)
+            weightChannel->AddKey(CueTime::FromFrames(key->frame), keySet->lowValue);
+    } else {
+        return;
+    }
+    vuKeyFrames = true;
+    ++previewRevision;
 }

@@ -191,3 +191,39 @@ void ChannelCurve::Merge(const Key& key) {
         keys_.insert(it, key);
     }
 }
+
+ChannelCurve::Kind ChannelCurve::KindFromCode(int code) {
+    switch (code) {
+        case KLWire::kSmooth:
+            return kSmooth;
+        case KLWire::kFlat:
+            return kFlat;
+        default:
+            return kLinear;
+    }
+}
+
+bool ChannelCurve::FromApplyArrays(int count, const CueTime* times, const float* values,
+                                   const int* inTangents, const int* outTangents,
+                                   std::vector<Key>* keys) {
+    keys->clear();
+    if (count < 0 || (count > 0 && (!times || !values))) {
+        return false;
+    }
+    keys->reserve(size_t(count));
+    for (int i = 0; i < count; ++i) {
+        if (!std::isfinite(values[i])) {
+            keys->clear();
+            return false;
+        }
+        Key k;
+        k.time = times[i].Seconds();
+        k.value = values[i];
+        k.in = KindFromCode(inTangents ? inTangents[i] : KLWire::kLinear);
+        k.out = KindFromCode(outTangents ? outTangents[i] : KLWire::kLinear);
+        keys->push_back(k);
+    }
+    std::stable_sort(keys->begin(), keys->end(),
+                     [](const Key& a, const Key& b) { return a.time < b.time; });
+    return true;
+}

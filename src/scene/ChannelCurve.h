@@ -55,6 +55,16 @@ class ChannelCurve : public OrChannel {
     // Inserts the key or replaces the one at the same time (within half a microsecond).
     void Merge(const Key& key);
 
+    // The curve kind of a scene tangent code (KLWire::Tangent); unknown codes are linear.
+    static Kind KindFromCode(int code);
+    // The keys of `count` apply keys (times in ticks, values, tangent codes; null code arrays
+    // mean linear), in time order; of two keys at one time the later given comes last. Null
+    // when a value is not finite. KLWire::StoreChannel stores exactly these keys, and the
+    // 3D preview evaluates them, so that the preview shows what apply writes.
+    static bool FromApplyArrays(int count, const CueTime* times, const float* values,
+                                const int* inTangents, const int* outTangents,
+                                std::vector<Key>* keys);
+
   private:
     double segment(size_t i, double seconds) const;  // inside the segment from key i to i + 1
     double smoothSlope(size_t i) const;

@@ -34,16 +34,6 @@ std::string base_name(const std::string& name) {
     return name.substr(0, name.find('#'));
 }
 
-ChannelCurve::Kind tangent_kind(int code) {
-    switch (code) {
-        case KLWire::kSmooth:
-            return ChannelCurve::kSmooth;
-        case KLWire::kFlat:
-            return ChannelCurve::kFlat;
-        default:
-            return ChannelCurve::kLinear;
-    }
-}
 }  // namespace
 
 KLDagList::~KLDagList() {
@@ -117,22 +107,9 @@ int KLWire::StoreChannel(OrDagNode* node, int channel, int count, const CueTime*
         return 0;
     }
     std::vector<ChannelCurve::Key> keys;
-    keys.reserve(size_t(count));
-    for (int i = 0; i < count; ++i) {
-        if (!std::isfinite(values[i])) {
-            return 0;
-        }
-        ChannelCurve::Key k;
-        k.time = times[i].Seconds();
-        k.value = values[i];
-        k.in = tangent_kind(inTangents ? inTangents[i] : kLinear);
-        k.out = tangent_kind(outTangents ? outTangents[i] : kLinear);
-        keys.push_back(k);
+    if (!ChannelCurve::FromApplyArrays(count, times, values, inTangents, outTangents, &keys)) {
+        return 0;
     }
-    // Keys in time order; of two at one time the later given wins (Merge replaces).
-    std::stable_sort(
-        keys.begin(), keys.end(),
-        [](const ChannelCurve::Key& a, const ChannelCurve::Key& b) { return a.time < b.time; });
     node->document()->SetCurve(node->index(), channel, keys, alwaysClearChannel != 0);
     return 1;
 }

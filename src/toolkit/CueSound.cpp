@@ -14,6 +14,7 @@
 #include <mutex>
 
 #include "toolkit/KLErrHandler.h"
+#include "toolkit/KLSoundControl.h"
 #include "toolkit/KLString.h"
 #include "toolkit/SoundReaderHeader.h"
 
@@ -157,6 +158,9 @@ bool read_whole_file(const char* path, std::vector<uint8_t>& bytes, std::string*
 }
 
 }  // namespace
+CueSound::~CueSound() {
+    KLSoundControl::Forget(this);
+}
 
 CueSound::CueSound(const char* path) {
     fileName_ = path ? path : "";

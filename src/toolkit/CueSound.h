@@ -12,6 +12,9 @@
 class CueSound {
   public:
     CueSound() = default;
+    // Stops the sound output first when it is playing this sound.
+    ~CueSound();
+    CueSound(const CueSound&) = default;
     // Reads the sound file `path`; check Valid() afterwards.
     explicit CueSound(const char* path);
 

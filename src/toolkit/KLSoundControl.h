@@ -23,6 +23,33 @@ class KLSoundControl {
     static int PlayDrag(CueSound* sound, KLTimer* timer, int grainMs, const float* position);
     // Stops whatever is playing.
     static void Stop();
+    // Stops when `sound` is what is playing (a sound being destroyed calls this).
+    static void Forget(const CueSound* sound);
     // Routes the audio library's own messages into the program's reports.
     static void DisableAudioLibraryErrors();
+
+    // Opens the output device (Play and PlayDrag do so when needed); without a usable device
+    // the silent "dummy" driver is used, so playback behaves the same. False only when even
+    // that fails. Close releases the device (tests reopen it with other settings).
+    static bool Open();
+    static void Close();
+    // The driver in use ("pulseaudio", "disk", "dummy"...), empty while closed.
+    static const char* DriverName();
+    static int DeviceRate();
+    static int DeviceChannels();
+    // Seconds of sound the device buffers ahead: the samples handed now are heard this late.
+    static double Latency();
+    // Device frames handed to the device since Open, over its rate: the device's own clock.
+    static double DeviceSeconds();
+
+    // The last buffer handed to the device: the clock time (TimerClock::Now) at which it
+    // was handed and the sound position, in seconds, of its first sample (NaN when it was
+    // silent). For measuring how closely sound follows the timer.
+    struct Handed {
+        double clock;
+        double position;
+        long buffers;  // buffers handed since Open
+        long cuts;     // times the position was cut back into step with the timer since Open
+    };
+    static Handed LastHanded();
 };

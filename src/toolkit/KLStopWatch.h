@@ -16,5 +16,5 @@ class KLStopWatch {
 
   private:
     double rate_;
-    std::vector<double> marks_;  // monotonic seconds
+    std::vector<double> marks_;  // TimerClock::Now seconds
 };

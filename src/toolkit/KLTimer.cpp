@@ -1,53 +1,65 @@
 #include "toolkit/KLTimer.h"
 
-#include <algorithm>
-#include <ctime>
-
-#include "toolkit/MonotonicClock.h"
 #include "toolkit/TimerRegistry.h"
 
-KLTimer::KLTimer(CueTime from, CueTime to) : from_(from), to_(to) { TimerRegistry::Add(this); }
+KLTimer::KLTimer(CueTime from, CueTime to)
+    : from_(from), to_(to), clock_(std::make_shared<TimerClock>(from.Seconds(), to.Seconds())) {
+    TimerRegistry::Add(this);
+}
 
-KLTimer::~KLTimer() { TimerRegistry::Remove(this); }
+KLTimer::~KLTimer() {
+    if (alive_)
+        *alive_ = false;
+    TimerRegistry::Remove(this);
+}
 
 void KLTimer::post_trigger(Trigger trigger, void* data, CueTime at) {
     triggers_.push_back({trigger, data, at, false});
 }
 
 void KLTimer::start() {
-    startClock_ = MonotonicSeconds() - frozenElapsed_;
-    running_ = true;
+    clock_->Start(TimerClock::Now());
 }
 
 void KLTimer::stop() {
-    if (!running_) return;
-    frozenElapsed_ = MonotonicSeconds() - startClock_;
-    running_ = false;
-}
-
-double KLTimer::elapsed() const {
-    return running_ ? MonotonicSeconds() - startClock_ : frozenElapsed_;
+    clock_->Stop(TimerClock::Now());
 }
 
 double KLTimer::CurrentSeconds() const {
-    double span = to_.Seconds() - from_.Seconds();
-    double run = std::min(elapsed(), span < 0 ? -span : span);
-    return from_.Seconds() + (span < 0 ? -run : run);
+    return clock_->At(TimerClock::Now());
 }
 
-CueTime KLTimer::Current() const { return CueTime::FromSeconds(CurrentSeconds()); }
+CueTime KLTimer::Current() const {
+    // At the end exactly `to`, whatever the rounding of the seconds.
+    double s = CurrentSeconds();
+    return s == to_.Seconds() ? to_ : CueTime::FromSeconds(s);
+}
 
 bool KLTimer::fire_due() {
+    if (!clock_->Started())
+        return false;
     CueTime now = Current();
     bool ended = now == to_;
-    if (ended && running_) stop();
+    if (ended)
+        stop();
+    // A trigger may post further triggers (so an index, not an iterator) or destroy this
+    // timer (then nothing of it is touched again).
+    bool alive = true;
+    bool* outer = alive_;
+    alive_ = &alive;
     for (size_t i = 0; i < triggers_.size(); i++) {
         Posted& p = triggers_[i];
         bool due = Reverse() ? now <= p.at : now >= p.at;
-        if (!p.fired && (due || (ended && p.at == to_))) {
+        if (!p.fired && due) {
             p.fired = true;
-            p.trigger(this, p.data);  // may post further triggers: index, not iterator
+            p.trigger(this, p.data);
+            if (!alive) {
+                if (outer)
+                    *outer = false;
+                return false;
+            }
         }
     }
-    return running_;
+    alive_ = outer;
+    return clock_->Running();
 }

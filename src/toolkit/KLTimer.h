@@ -1,8 +1,10 @@
 #pragma once
 
+#include <memory>
 #include <vector>
 
 #include "toolkit/CueTime.h"
+#include "toolkit/TimerClock.h"
 
 // A wall-clock timer on the workspace time line. Once started, its current time runs from
 // `from` towards `to` at the rate of the monotonic clock (backwards when `to` is earlier than
@@ -25,7 +27,7 @@ class KLTimer {
 
     CueTime From() const { return from_; }
     CueTime To() const { return to_; }
-    bool Running() const { return running_; }
+    bool Running() const { return clock_->Running(); }
     bool Reverse() const { return to_ < from_; }
     // The current time (from() before start, frozen after stop or at the end).
     CueTime Current() const;
@@ -35,6 +37,9 @@ class KLTimer {
     // Fires the triggers that are due; returns true while the timer still runs.
     bool fire_due();
 
+    // The timer's running state, for the sound thread; it outlives the timer.
+    std::shared_ptr<const TimerClock> Clock() const { return clock_; }
+
   private:
     struct Posted {
         Trigger trigger;
@@ -42,11 +47,8 @@ class KLTimer {
         CueTime at;
         bool fired;
     };
-    double elapsed() const;  // seconds of wall clock since start (frozen after stop)
-
     CueTime from_, to_;
-    bool running_ = false;
-    double startClock_ = 0.0;   // monotonic seconds at start
-    double frozenElapsed_ = 0.0;
+    std::shared_ptr<TimerClock> clock_;
     std::vector<Posted> triggers_;
+    bool* alive_ = nullptr;  // set false by the destructor while fire_due runs a trigger
 };

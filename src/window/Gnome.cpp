@@ -97,6 +97,7 @@ int Gnome::DressWidgets() {
     keyScene = dynamic_cast<KLSceneView*>(FindFiend("keyScn"));
     mixScene = dynamic_cast<KLSceneView*>(FindFiend("mixScn"));
 #endif
+    dress_scene_views();
 
     // 5. Alerts and prompt.
     Widget parent = console ? console : topShell;

@@ -21,6 +21,7 @@ class KLFileManager;
 class KLImageButton;
 class KLImageSGI;
 class KLImageView;
+class KLKey;
 class KLKeySet;
 class KLMarkTrack;
 class KLPrompt;
@@ -78,6 +79,12 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void play_forward_save_cb(Widget, XtPointer, XtPointer);
     static void change_speed_cb(Widget, XtPointer, XtPointer);
     static void change_repeat_cb(Widget, XtPointer, XtPointer);
+    // Helpers: a pass over the chart's region (reversed or not) at a speed; the key image
+    // view set by the display style; playback ended at once (before the workspace replaces
+    // what is playing).
+    void start_pass(bool reverse, float speed);
+    void show_key_images(KLKey* prev, KLKey* next, bool hasPrev, bool hasNext, float fraction);
+    void halt_playback();
 
     // --- Key editing commands and key value (GnomeKeyEdit.cpp)
     int CurrentKeyShape();
@@ -92,6 +99,9 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void smooth_keyframe_cb(Widget, XtPointer, XtPointer);
     static void val_typein_cb(Widget, XtPointer, XtPointer);
     static void set_duration_cb(Widget, XtPointer, XtPointer);
+    // Helper: a key of shape `index` of the shown keyset at the indicator (or in place of the
+    // active key), with the "-a" beep, and the key frames rebuilt.
+    void add_key(int index);
 
     // --- Keyset tiles, keyset menu, key shape display, start-up load (GnomeTiles.cpp)
     void DressKeyset(int k);
@@ -116,6 +126,9 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void TileButtonClick2(Widget, XtPointer, XtPointer);
     static void select_keyset_cb(Widget, XtPointer, XtPointer);
     static void display_style_cb(Widget, XtPointer, XtPointer);
+    // Helper: makes the pressed tile the only set one; its index, -1 when not a tile of the
+    // active keyset.
+    int select_tile(KLFiend* pressed);
 
     // --- Key and mix 3D views (GnomeViews.cpp)
     void CenterKeyView() override;
@@ -134,6 +147,15 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void toggle_ref_view_cb(Widget, XtPointer, XtPointer);
     static void key_view_set_cb(Widget, XtPointer, XtPointer);
     static void key_view_clear_cb(Widget, XtPointer, XtPointer);
+    // Helpers of the views: the key view's hooks and the showTextures toggle (from
+    // DressWidgets); one arm or disarm of a camera button of view 1 (key) or 0 (mix).
+    void dress_scene_views();
+    static void show_textures_cb(Widget, XtPointer, XtPointer);
+    void camera_drag(Widget w, XtPointer clientData, XtPointer callData, int view);
+    // PlayForwardSave's frames: the mix view as drawn, kept as playblast frame i; the
+    // playblast from `start` shown in the reference view.
+    void grab_playblast_frame(int i);
+    void show_playblast(CueTime start);
 
     // --- Information bar, prompts, error flag, help, reference menu (GnomeInfo.cpp)
     void DisplayTimecode(CueTime t);
@@ -149,6 +171,8 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     // The status line: the latest status report of the toolkit, shown at once.
     void ShowStatus(const char* message);
     static void status_hook(const char* message, void* gnome);
+    // Once the event loop is idle again after status reports, the status line says "Ready.".
+    static Boolean status_idle_workproc(XtPointer gnome);
     static void help_cb(Widget, XtPointer, XtPointer);
     static void version_cb(Widget, XtPointer, XtPointer);
     static void open_audio_panel_cb(Widget, XtPointer, XtPointer);
@@ -161,6 +185,10 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void show_reference_image_cb(Widget, XtPointer, KLFiend*);
     // Makes the error flag and the status line in the information bar (outside the table).
     void create_error_flag();
+    // The workspace frees its mark track and sound before it tells the window about their
+    // replacements: hands the chart the current ones (the sound too unless `withSound` is
+    // false) before anything can make it draw with the freed ones.
+    void chart_follows_workspace(bool withSound = true);
 
     // --- Recognizer plug-ins and their settings panels (GnomeRecognizers.cpp)
     void ShowRecognizerGui(CueRecognizer* recognizer) override;
@@ -273,6 +301,7 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     CueTime playFrom, playTo;
     float passSpeed = 1.0f;
     XtWorkProcId playbackWorkProc = 0;
+    double nextFrame = 0.0;  // monotonic seconds of the next display update while playing
 
     // --- Fields: keyset tiles
     KLImageButton* tiles[kMaxKeysets][kMaxTiles] = {};  // owned by their widgets
@@ -293,6 +322,7 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     // --- Fields: information bar
     Widget errorFlag = nullptr;
     Widget statusLine = nullptr;
+    XtWorkProcId statusIdle = 0;
 
     // --- Fields: recognizers and link dialog
     CueRecognizer* linkRecognizer = nullptr;  // borrowed: the recognizer the link dialog shows

@@ -15,6 +15,8 @@
 #include <sstream>
 
 #include "dialogs/RefLoadDialog.h"
+#include "model/KLKeyEvent.h"
+#include "model/KLKeyTrack.h"
 #include "toolkit/CuePrefs.h"
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLString.h"
@@ -26,6 +28,10 @@
 #if __has_include("chart/KLSyncChart.h")
 #include "chart/KLSyncChart.h"
 #define GNOME_HAS_CHART 1
+#endif
+#if __has_include("scene/gl/KLSceneView.h")
+#include "scene/gl/KLSceneView.h"
+#define GNOME_HAS_SCENE_VIEW 1
 #endif
 
 namespace {
@@ -113,7 +119,17 @@ void Gnome::ShowStatus(const char* message) {
 }
 
 void Gnome::status_hook(const char* message, void* gnome) {
-    static_cast<Gnome*>(gnome)->ShowStatus(message);
+    auto* g = static_cast<Gnome*>(gnome);
+    g->ShowStatus(message);
+    if (!g->statusIdle && AppContext())
+        g->statusIdle = XtAppAddWorkProc(AppContext(), status_idle_workproc, g);
+}
+
+Boolean Gnome::status_idle_workproc(XtPointer gnome) {
+    auto* g = static_cast<Gnome*>(gnome);
+    g->statusIdle = 0;
+    g->ShowStatus("Ready.");
+    return True;
 }
 
 void Gnome::DisplayTimecode(CueTime t) {
@@ -125,8 +141,24 @@ void Gnome::DisplayTimecode(CueTime t) {
         XFlush(dpy);
 }
 
+void Gnome::chart_follows_workspace(bool withSound) {
+#ifdef GNOME_HAS_CHART
+    if (!syncChart)
+        return;
+    // The mark track first: the chart's drawing reads it, while of the sound it only asks
+    // whether there is one.
+    if (syncChart->markTrack != theImp.markTrack.get())
+        syncChart->SetMarkTrack(theImp.markTrack.get());
+    if (withSound && syncChart->sound != theImp.sound.get())
+        syncChart->SetSound(theImp.sound.get());
+#else
+    (void)withSound;
+#endif
+}
+
 void Gnome::DisplayDuration(CueTime duration) {
 #ifdef GNOME_HAS_CHART
+    chart_follows_workspace();
     if (syncChart)
         syncChart->SetUserDuration(duration);
 #endif
@@ -149,6 +181,7 @@ void Gnome::DisplayReference(CueTime t) {
 }
 
 void Gnome::Inform(const char* message, const char* button) {
+    chart_follows_workspace();  // the alert's event loop may redraw the chart
     std::cerr << (message ? message : "") << std::endl;
     if (attentionAlert)
         attentionAlert->Notify(message, button);
@@ -159,6 +192,7 @@ int Gnome::Confirm(const char* message, const char* yes, const char* no) {
         std::cerr << (message ? message : "") << std::endl << "Assuming OK" << std::endl;
         return 1;
     }
+    chart_follows_workspace();
     return attentionAlert->Confirm(message, yes, no);
 }
 
@@ -183,6 +217,9 @@ int Gnome::AdjustRelLoad(char** prefix, char** ext, int* start, int* end, int* b
     if (!refLoadDialog)
         return 0;
     RefLoadDialog& d = *refLoadDialog;
+    // The sequence shown may be replaced by this load: the view lets go of its pictures.
+    if (refImageView)
+        refImageView->SetImage(nullptr);
     d.SetPrefix(*prefix);
     d.SetExt(*ext);
     d.SetStart(*start);
@@ -280,10 +317,34 @@ void Gnome::set_reference_region_cb(Widget, XtPointer, XtPointer) {
 }
 
 void Gnome::ShowKeyframeImage() {
-    // The key and mix views follow the indicator through GoToTime's view steps.
+    // The key and mix views at the indicator, as GoToTime shows them, without moving the
+    // indicator or the reference view.
 #ifdef GNOME_HAS_CHART
-    if (syncChart)
-        GoToTime(syncChart->GetIndicatorTime());
+    if (!syncChart)
+        return;
+    CueTime t = syncChart->GetIndicatorTime();
+    if (shownKeyset && keyViewOn) {
+        if (keyViewMode == 1 && theImp.geometryActive) {
+#ifdef GNOME_HAS_SCENE_VIEW
+            if (keyScene) {
+                keyScene->time = t;
+                keyScene->Draw();
+            }
+#endif
+        } else if (KLKeyTrack* track = theImp.GetKeyTrack(activeKeyset)) {
+            KLKeyEvent* prev = nullptr;
+            KLKeyEvent* next = nullptr;
+            float fraction = track->bracket_keys_from_time(t, &prev, &next);
+            show_key_images(prev ? prev->key : nullptr, next ? next->key : nullptr, prev != nullptr,
+                            next != nullptr, fraction);
+        }
+    }
+#ifdef GNOME_HAS_SCENE_VIEW
+    if (mixViewOn && theImp.geometryActive && mixScene) {
+        mixScene->time = t;
+        mixScene->Draw();
+    }
+#endif
 #endif
 }
 

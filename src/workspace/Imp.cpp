@@ -10,6 +10,7 @@
 #include "model/KLKeySet.h"
 #include "model/KLKeyTrack.h"
 #include "model/KLMarkTrack.h"
+#include "model/KLTrackPreview.h"
 #include "scene/KLKeyFrameList.h"
 #include "scene/KLScene.h"
 #include "scene/KLWireSource.h"
@@ -60,6 +61,13 @@ std::unique_ptr<KLScene> Imp::make_scene(bool deltaShape) {
         made->DoDeltaShape();
     made->HideTransparency();
     made->HideShaders();
+    // The views preview every keyset's track as apply would write it.
+    made->SetPoseSource(std::make_unique<KLTrackPreview>([this]() {
+        std::vector<KLKeyTrack*> tracks;
+        for (int i = 0; i < keysetCount; ++i)
+            tracks.push_back(keyTracks[i].get());
+        return tracks;
+    }));
     return made;
 }
 

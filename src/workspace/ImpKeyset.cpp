@@ -262,6 +262,7 @@ int Imp::LoadKeyset(const char* name) {
         theGhost->InitMarkTrack(markTrack.get());
         if (geometryActive) {
             scene->LoadGeometry(wireSource.get());
+            scene->SetRestFrame(wireFrame);
             scene->SetDetail(tessU, tessV);
             scene->Feedback(feedback, nullptr);
             for (int i = 0; i < keysetCount; ++i) {

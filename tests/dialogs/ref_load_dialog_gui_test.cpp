@@ -137,7 +137,6 @@ TEST_F(RefLoadDialogTest, OkAndCancelAnswerTheModalShow) {
     dialog->SetStart(7);
     EXPECT_EQ(ShowAndPress(dialog->cancelButton), 0);
     EXPECT_EQ(dialog->Start(), 7) << "Cancel leaves the fields as they were";
-    guitest::Screenshot("ref-load-dialog");
 }
 
 TEST_F(RefLoadDialogTest, WindowManagerCloseIsCancel) {

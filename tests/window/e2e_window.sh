@@ -20,7 +20,13 @@ cleanup() {
 }
 trap cleanup EXIT
 
-fail() { echo "e2e: $*" >&2; import -window root "$shots/e2e-failure.png" || true; exit 1; }
+fail() {
+    echo "e2e: $*" >&2
+    echo "e2e: the program said:" >&2
+    cat "$work/out.txt" >&2 || true
+    import -window root "$shots/e2e-failure.png" || true
+    exit 1
+}
 # A screenshot once the screen has stopped changing (two grabs in a row the same).
 shot() {
     import -window root "$work/a.png"
@@ -75,6 +81,7 @@ browser=$(wait_window "Open Track")
 shot e2e-2-open-track-browser
 choose "$browser" "$work/project/misc_data/demo.track"
 wait_gone "Open Track"
+kill -0 "$pid" 2>/dev/null || fail "the program ended while opening the track"
 xdotool mousemove --window "$main" 600 600
 shot e2e-3-track-opened
 

@@ -6,7 +6,9 @@
 #include <Xm/Xm.h>
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <map>
+#include <vector>
 
 #include "toolkit/KLString.h"
 #include "toolkit/xm/KLAlert.h"
@@ -97,6 +99,9 @@ Widget KLFileManager::Browser() {
     Atom wmDelete = XmInternAtom(XtDisplay(shell), const_cast<char*>("WM_DELETE_WINDOW"), False);
     XmAddWMProtocolCallback(shell, wmDelete, close_cb, this);
     alert_ = std::make_unique<KLAlert>(parent_, "Attention");
+    XtVaGetValues(browser_, XmNfileSearchProc, &defaultSearch_, nullptr);
+    XtVaSetValues(browser_, XmNfileSearchProc, &KLFileManager::search_proc, XmNuserData,
+                  XtPointer(this), nullptr);
     return browser_;
 }
 
@@ -202,6 +207,37 @@ void KLFileManager::answer_cb(Widget, XtPointer clientData, XtPointer callData) 
     } else {
         manager->answer_ = 0;
     }
+}
+
+void KLFileManager::search_proc(Widget browser, XtPointer searchData) {
+    XtPointer self = nullptr;
+    XtVaGetValues(browser, XmNuserData, &self, nullptr);
+    auto* manager = static_cast<KLFileManager*>(self);
+    if (!manager || !manager->defaultSearch_)
+        return;
+    manager->defaultSearch_(browser, searchData);
+    if (!manager->DoPostFilter())
+        return;
+    XmStringTable items = nullptr;
+    int count = 0;
+    XtVaGetValues(browser, XmNfileListItems, &items, XmNfileListItemCount, &count, nullptr);
+    std::vector<std::string> names(count);
+    std::vector<char*> pointers(count);
+    for (int i = 0; i < count; i++) {
+        char* text = nullptr;
+        XmStringGetLtoR(items[i], const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+        names[i] = text ? text : "";
+        XtFree(text);
+        pointers[i] = names[i].data();
+    }
+    int kept = std::clamp(manager->FilterFileList(count, pointers.data()), 0, count);
+    std::vector<XmString> filtered(kept);
+    for (int i = 0; i < kept; i++)
+        filtered[i] = XmStringCreateLocalized(pointers[i]);
+    XtVaSetValues(browser, XmNfileListItems, filtered.data(), XmNfileListItemCount, kept,
+                  XmNlistUpdated, True, nullptr);
+    for (XmString x : filtered)
+        XmStringFree(x);
 }
 
 void KLFileManager::close_cb(Widget, XtPointer clientData, XtPointer) {

@@ -65,9 +65,12 @@ class KLFileManager {
     static void store_cb(Widget, XtPointer clientData, XtPointer);
     static void answer_cb(Widget, XtPointer clientData, XtPointer callData);
     static void close_cb(Widget, XtPointer clientData, XtPointer);
+    // The browser's file search: Motif's own, then FilterFileList when DoPostFilter.
+    static void search_proc(Widget browser, XtPointer searchData);
 
     Widget parent_;
     Widget browser_ = nullptr;
+    void (*defaultSearch_)(Widget, XtPointer) = nullptr;  // Motif's search, run first
     std::unique_ptr<KLAlert> alert_;
     std::string chosen_;
     int answer_ = -1;

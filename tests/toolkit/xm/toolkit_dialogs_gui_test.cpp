@@ -7,10 +7,12 @@
 #include <Xm/TextF.h>
 #include <Xm/Xm.h>
 
+#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <functional>
 #include <string>
+#include <vector>
 
 #include "guitest/GuiTest.h"
 #include "toolkit/KLImageSGI.h"
@@ -241,6 +243,46 @@ TEST_F(FileManagerTest, StoringOverAFileAsksFirstAndCancelIsMinusOne) {
     Poll fresh([&] { return Choose(m, dir + "/new.tst"); });
     EXPECT_EQ(m.StoreAs(1), 1);
     EXPECT_EQ(m.stored, dir + "/new.tst");
+}
+
+// A browser that lists only the names without "skip" in them.
+class FilteringManager : public RecordingManager {
+  public:
+    using RecordingManager::RecordingManager;
+    int DoPostFilter() override { return 1; }
+    int FilterFileList(int count, char** names) override {
+        int kept = 0;
+        for (int i = 0; i < count; i++)
+            if (!std::strstr(names[i], "skip"))
+                names[kept++] = names[i];
+        return kept;
+    }
+};
+
+TEST_F(FileManagerTest, PostFilterDropsNamesFromTheList) {
+    std::ofstream(dir + "/skip.tst") << "s\n";
+    FilteringManager m(form, dir);
+    std::vector<std::string> listed;
+    Poll look([&] {
+        if (!m.Waiting())
+            return false;
+        Widget cancel = XmFileSelectionBoxGetChild(m.Browser(), XmDIALOG_CANCEL_BUTTON);
+        if (!Viewable(cancel))
+            return false;
+        XmStringTable items = nullptr;
+        int count = 0;
+        XtVaGetValues(m.Browser(), XmNfileListItems, &items, XmNfileListItemCount, &count, nullptr);
+        for (int i = 0; i < count; i++) {
+            char* text = nullptr;
+            XmStringGetLtoR(items[i], const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+            listed.push_back(text ? text : "");
+            XtFree(text);
+        }
+        return PressWhenShown(cancel);
+    });
+    EXPECT_EQ(m.Retrieve(), -1);
+    ASSERT_EQ(listed.size(), 1u);
+    EXPECT_EQ(listed[0], dir + "/a.tst");
 }
 
 TEST_F(ToolkitTest, ImageViewMixesByFadeAndShowsBackgroundWithoutImage) {

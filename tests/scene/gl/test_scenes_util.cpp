@@ -1,0 +1,314 @@
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+
+#include <tiny_gltf.h>
+
+#include "scene/gl/TestScenes.h"
+
+namespace testscenes {
+namespace {
+
+// Appends `data` to buffer 0 as a new buffer view and accessor; returns the accessor.
+template <typename T>
+int add_accessor(tinygltf::Model& m, const std::vector<T>& data, int componentType, int type,
+                 int target, bool minMax = false) {
+    tinygltf::Buffer& buffer = m.buffers[0];
+    while (buffer.data.size() % 4) {
+        buffer.data.push_back(0);
+    }
+    tinygltf::BufferView view;
+    view.buffer = 0;
+    view.byteOffset = buffer.data.size();
+    view.byteLength = data.size() * sizeof(T);
+    view.target = target;
+    const auto* bytes = reinterpret_cast<const unsigned char*>(data.data());
+    buffer.data.insert(buffer.data.end(), bytes, bytes + view.byteLength);
+    m.bufferViews.push_back(view);
+    tinygltf::Accessor a;
+    a.bufferView = int(m.bufferViews.size()) - 1;
+    a.componentType = componentType;
+    a.type = type;
+    const int per = tinygltf::GetNumComponentsInType(uint32_t(type));
+    a.count = data.size() / size_t(per);
+    if (minMax) {
+        a.minValues.assign(size_t(per), 1e30);
+        a.maxValues.assign(size_t(per), -1e30);
+        for (size_t i = 0; i < data.size(); ++i) {
+            a.minValues[i % size_t(per)] = std::min(a.minValues[i % size_t(per)], double(data[i]));
+            a.maxValues[i % size_t(per)] = std::max(a.maxValues[i % size_t(per)], double(data[i]));
+        }
+    }
+    m.accessors.push_back(a);
+    return int(m.accessors.size()) - 1;
+}
+
+// A PNG file of `width` x `height` RGBA pixels, compressed with stored (uncompressed) deflate
+// blocks: enough for the tiny test textures.
+std::vector<unsigned char> png_of(int width, int height, const std::vector<unsigned char>& rgba) {
+    auto crc = [](const unsigned char* p, size_t n) {
+        uint32_t c = 0xffffffffu;
+        for (size_t i = 0; i < n; ++i) {
+            c ^= p[i];
+            for (int k = 0; k < 8; ++k) {
+                c = c & 1 ? 0xedb88320u ^ (c >> 1) : c >> 1;
+            }
+        }
+        return c ^ 0xffffffffu;
+    };
+    auto be32 = [](std::vector<unsigned char>& out, uint32_t v) {
+        out.insert(out.end(), {uint8_t(v >> 24), uint8_t(v >> 16), uint8_t(v >> 8), uint8_t(v)});
+    };
+    std::vector<unsigned char> png = {0x89, 'P', 'N', 'G', '\r', '\n', 0x1a, '\n'};
+    auto chunk = [&](const char* type, const std::vector<unsigned char>& data) {
+        be32(png, uint32_t(data.size()));
+        std::vector<unsigned char> body(type, type + 4);
+        body.insert(body.end(), data.begin(), data.end());
+        png.insert(png.end(), body.begin(), body.end());
+        be32(png, crc(body.data(), body.size()));
+    };
+    std::vector<unsigned char> header;
+    be32(header, uint32_t(width));
+    be32(header, uint32_t(height));
+    header.insert(header.end(), {8, 6, 0, 0, 0});  // 8-bit RGBA
+    chunk("IHDR", header);
+    std::vector<unsigned char> raw;
+    for (int y = 0; y < height; ++y) {
+        raw.push_back(0);  // no filter
+        raw.insert(raw.end(), rgba.begin() + y * width * 4, rgba.begin() + (y + 1) * width * 4);
+    }
+    std::vector<unsigned char> z = {0x78,
+                                    0x01,
+                                    1,
+                                    uint8_t(raw.size()),
+                                    uint8_t(raw.size() >> 8),
+                                    uint8_t(~raw.size()),
+                                    uint8_t(~raw.size() >> 8)};
+    z.insert(z.end(), raw.begin(), raw.end());
+    uint32_t a = 1, b = 0;
+    for (unsigned char c : raw) {
+        a = (a + c) % 65521;
+        b = (b + a) % 65521;
+    }
+    be32(z, (b << 16) | a);
+    chunk("IDAT", z);
+    chunk("IEND", {});
+    return png;
+}
+
+constexpr int kFloat = TINYGLTF_COMPONENT_TYPE_FLOAT;
+constexpr int kArray = TINYGLTF_TARGET_ARRAY_BUFFER;
+constexpr int kElements = TINYGLTF_TARGET_ELEMENT_ARRAY_BUFFER;
+
+// One sheet's primitive: positions in the plane z = `z`, facing +Z unless `flip`.
+tinygltf::Primitive sheet_primitive(tinygltf::Model& m, const Sheet& s, float z, bool flip,
+                                    bool skinned, bool morphed) {
+    const int cols = std::max(1, s.columns), rows = std::max(1, s.rows);
+    std::vector<float> pos, nrm, uv, weights;
+    std::vector<uint16_t> joints;
+    std::vector<uint32_t> idx;
+    for (int r = 0; r <= rows; ++r) {
+        for (int c = 0; c <= cols; ++c) {
+            const float x = -s.width / 2 + s.width * float(c) / float(cols);
+            const float y = -s.height / 2 + s.height * float(r) / float(rows);
+            pos.insert(pos.end(), {x, y, z});
+            nrm.insert(nrm.end(), {0, 0, flip ? -1.0f : 1.0f});
+            uv.insert(uv.end(), {float(c) / float(cols), 1.0f - float(r) / float(rows)});
+            if (skinned) {
+                const int band = std::min(s.joints - 1, c * s.joints / (cols + 1));
+                joints.insert(joints.end(), {uint16_t(band), 0, 0, 0});
+                weights.insert(weights.end(), {1, 0, 0, 0});
+            }
+        }
+    }
+    for (int r = 0; r < rows; ++r) {
+        for (int c = 0; c < cols; ++c) {
+            const uint32_t a = uint32_t(r * (cols + 1) + c), b = a + 1, d = a + uint32_t(cols + 1),
+                           e = d + 1;
+            if (flip) {
+                idx.insert(idx.end(), {a, d, b, b, d, e});
+            } else {
+                idx.insert(idx.end(), {a, b, d, b, e, d});
+            }
+        }
+    }
+    tinygltf::Primitive p;
+    p.mode = TINYGLTF_MODE_TRIANGLES;
+    p.material = 0;
+    p.attributes["POSITION"] = add_accessor(m, pos, kFloat, TINYGLTF_TYPE_VEC3, kArray, true);
+    p.attributes["NORMAL"] = add_accessor(m, nrm, kFloat, TINYGLTF_TYPE_VEC3, kArray);
+    p.attributes["TEXCOORD_0"] = add_accessor(m, uv, kFloat, TINYGLTF_TYPE_VEC2, kArray);
+    if (skinned) {
+        p.attributes["JOINTS_0"] = add_accessor(m, joints, TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT,
+                                                TINYGLTF_TYPE_VEC4, kArray);
+        p.attributes["WEIGHTS_0"] = add_accessor(m, weights, kFloat, TINYGLTF_TYPE_VEC4, kArray);
+    }
+    if (morphed) {
+        for (int k = 0; k < s.morphTargets; ++k) {
+            std::vector<float> delta(pos.size(), 0.0f);
+            const int start = k * cols / s.morphTargets, band = std::max(1, (cols + 1) / 4);
+            for (int r = 0; r <= rows; ++r) {
+                for (int c = start; c < start + band && c <= cols; ++c) {
+                    const size_t v = size_t(r * (cols + 1) + c) * 3;
+                    delta[v + 1] = s.morphLift;
+                    delta[v + 2] = 0.5f;
+                }
+            }
+            p.targets.push_back(
+                {{"POSITION", add_accessor(m, delta, kFloat, TINYGLTF_TYPE_VEC3, kArray, true)}});
+        }
+    }
+    p.indices =
+        add_accessor(m, idx, TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT, TINYGLTF_TYPE_SCALAR, kElements);
+    return p;
+}
+
+}  // namespace
+
+bool WriteSheet(const std::string& path, const Sheet& s) {
+    tinygltf::Model m;
+    m.asset.version = "2.0";
+    m.asset.generator = "chirrup view tests";
+    m.buffers.resize(1);
+
+    tinygltf::Material material;
+    material.name = "sheet";
+    material.pbrMetallicRoughness.baseColorFactor = {s.colour[0], s.colour[1], s.colour[2],
+                                                     s.colour[3]};
+    if (s.texture || s.corruptTexture) {
+        tinygltf::Image image;
+        image.mimeType = "image/png";
+        const char junk[] = "this is not a picture";
+        const std::vector<unsigned char> bytes =
+            s.corruptTexture ? std::vector<unsigned char>(junk, junk + sizeof junk)
+                             : png_of(2, 2,
+                                      {255, 0, 0, 255, 0, 0, 255, 255,  //
+                                       0, 0, 255, 255, 255, 0, 0, 255});
+        image.bufferView = int(m.bufferViews.size());
+        tinygltf::BufferView view;
+        view.buffer = 0;
+        view.byteOffset = m.buffers[0].data.size();
+        view.byteLength = bytes.size();
+        m.buffers[0].data.insert(m.buffers[0].data.end(), bytes.begin(), bytes.end());
+        m.bufferViews.push_back(view);
+        m.images.push_back(image);
+        tinygltf::Texture texture;
+        texture.source = 0;
+        m.textures.push_back(texture);
+        material.pbrMetallicRoughness.baseColorFactor = {1, 1, 1, 1};
+        material.pbrMetallicRoughness.baseColorTexture.index = 0;
+    }
+    m.materials.push_back(material);
+
+    const bool skinned = s.joints > 0, morphed = s.morphTargets > 0;
+    tinygltf::Mesh mesh;
+    mesh.name = "sheet";
+    mesh.primitives.push_back(sheet_primitive(m, s, 0.0f, false, skinned, morphed));
+    if (s.backSheet) {
+        mesh.primitives.push_back(sheet_primitive(m, s, -0.5f, true, skinned, morphed));
+    }
+    if (morphed) {
+        mesh.weights.assign(size_t(s.morphTargets), 0.0);
+        for (size_t k = 0; k < s.morphWeights.size() && k < mesh.weights.size(); ++k) {
+            mesh.weights[k] = s.morphWeights[k];
+        }
+    }
+    m.meshes.push_back(mesh);
+
+    tinygltf::Node sheetNode;
+    sheetNode.name = "sheet";
+    sheetNode.mesh = 0;
+    m.nodes.push_back(sheetNode);
+    tinygltf::Scene scene;
+    scene.nodes.push_back(0);
+    if (skinned) {
+        tinygltf::Skin skin;
+        std::vector<float> inverse;
+        const float step = s.width / float(s.joints);
+        for (int j = 0; j < s.joints; ++j) {
+            tinygltf::Node joint;
+            joint.name = "joint" + std::to_string(j);
+            joint.translation = {j == 0 ? -s.width / 2 : step, 0, 0};
+            m.nodes.push_back(joint);
+            const int index = int(m.nodes.size()) - 1;
+            if (j == 0) {
+                scene.nodes.push_back(index);
+            } else {
+                m.nodes[size_t(index) - 1].children.push_back(index);
+            }
+            skin.joints.push_back(index);
+            const float x = -s.width / 2 + step * float(j);
+            const float mat[16] = {1, 0, 0, 0, 0, 1, 0, 0, 0, 0, 1, 0, -x, 0, 0, 1};
+            inverse.insert(inverse.end(), mat, mat + 16);
+        }
+        skin.inverseBindMatrices = add_accessor(m, inverse, kFloat, TINYGLTF_TYPE_MAT4, -1);
+        skin.skeleton = skin.joints[0];
+        m.skins.push_back(skin);
+        m.nodes[0].skin = 0;
+    }
+    if (skinned && s.animatedFrames > 0) {
+        tinygltf::Animation anim;
+        anim.name = "shapes";
+        std::vector<float> times;
+        for (int f = 0; f < s.animatedFrames; ++f) {
+            times.push_back(float(f) / 30.0f);
+        }
+        const int input = add_accessor(m, times, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
+        for (int j = 0; j < s.joints; ++j) {
+            std::vector<float> quats;
+            for (int f = 0; f < s.animatedFrames; ++f) {
+                const double half = (j + 1) * f / 4.0 * M_PI / 360.0;
+                quats.insert(quats.end(), {0, 0, float(std::sin(half)), float(std::cos(half))});
+            }
+            tinygltf::AnimationSampler sampler;
+            sampler.input = input;
+            sampler.output = add_accessor(m, quats, kFloat, TINYGLTF_TYPE_VEC4, -1);
+            sampler.interpolation = "STEP";
+            anim.samplers.push_back(sampler);
+            tinygltf::AnimationChannel channel;
+            channel.sampler = int(anim.samplers.size()) - 1;
+            channel.target_node = m.skins[0].joints[size_t(j)];
+            channel.target_path = "rotation";
+            anim.channels.push_back(channel);
+        }
+        m.animations.push_back(anim);
+    }
+    if (morphed && !s.weightTimes.empty()) {
+        tinygltf::Animation anim;
+        anim.name = "weights";
+        tinygltf::AnimationSampler sampler;
+        sampler.input = add_accessor(m, s.weightTimes, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
+        sampler.output = add_accessor(m, s.weightValues, kFloat, TINYGLTF_TYPE_SCALAR, -1);
+        sampler.interpolation = "LINEAR";
+        anim.samplers.push_back(sampler);
+        tinygltf::AnimationChannel channel;
+        channel.sampler = 0;
+        channel.target_node = 0;
+        channel.target_path = "weights";
+        anim.channels.push_back(channel);
+        m.animations.push_back(anim);
+    }
+    if (!s.headLightOnly) {
+        tinygltf::Light light;
+        light.type = "directional";
+        light.color = {1, 0, 0};
+        light.intensity = 1;
+        m.lights.push_back(light);
+        tinygltf::Node lightNode;
+        lightNode.name = "sun";
+        tinygltf::Value::Object ext;
+        ext["light"] = tinygltf::Value(0);
+        lightNode.extensions["KHR_lights_punctual"] = tinygltf::Value(ext);
+        m.nodes.push_back(lightNode);
+        scene.nodes.push_back(int(m.nodes.size()) - 1);
+        m.extensionsUsed.push_back("KHR_lights_punctual");
+    }
+    m.scenes.push_back(scene);
+    m.defaultScene = 0;
+
+    const bool binary = path.size() > 4 && path.compare(path.size() - 4, 4, ".glb") == 0;
+    tinygltf::TinyGLTF writer;
+    return writer.WriteGltfSceneToFile(&m, path, true, true, true, binary);
+}
+
+}  // namespace testscenes

@@ -1,0 +1,331 @@
+// Sound output through SDL's "disk" driver: every buffer handed to the device is written to a
+// file as fast as it is asked for, and the timers run on the device's own sample count, so a
+// pass of a second takes milliseconds and the file holds exactly what a listener would hear.
+
+#include <SDL2/SDL.h>
+#include <samplerate.h>
+#include <stdlib.h>
+
+#include <chrono>
+#include <cmath>
+#include <fstream>
+#include <memory>
+#include <thread>
+#include <tuple>
+
+#include "toolkit/CueSound.h"
+#include "toolkit/KLSoundControl.h"
+#include "toolkit/KLTimer.h"
+#include "toolkit/TimerClock.h"
+#include "toolkit_test_util.h"
+
+namespace {
+
+using Samples = std::vector<float>;
+
+// The device clock, moved back by the output latency so that the samples handed at a timer
+// time are the ones a timer on the wall clock would hear then.
+double device_clock() {
+    return KLSoundControl::DeviceSeconds() - KLSoundControl::Latency();
+}
+
+// A second of a rising tone (200 Hz to 3 kHz) at half the device's rate: no two stretches
+// of it look alike, and every sound frame falls on a device frame.
+std::unique_ptr<CueSound> chirp(double rate, double seconds = 1.0) {
+    Samples s(size_t(rate * seconds));
+    for (size_t i = 0; i < s.size(); i++) {
+        double t = double(i) / rate;
+        s[i] = float(0.5 * std::sin(2 * M_PI * (200 * t + 1400 * t * t / seconds)));
+    }
+    return CueSound::FromSamples({s}, rate);
+}
+
+Samples resampled(const Samples& in, double ratio) {
+    Samples out(size_t(double(in.size()) * ratio) + 16);
+    SRC_DATA d{};
+    d.data_in = in.data();
+    d.input_frames = long(in.size());
+    d.data_out = out.data();
+    d.output_frames = long(out.size());
+    d.src_ratio = ratio;
+    d.end_of_input = 1;
+    EXPECT_EQ(src_simple(&d, SRC_SINC_FASTEST, 1), 0);
+    out.resize(size_t(d.output_frames_gen));
+    return out;
+}
+
+// Stretches of `out` louder than silence, as [first, end) frame ranges.
+std::vector<std::pair<long, long>> segments(const Samples& out) {
+    std::vector<std::pair<long, long>> found;
+    long quiet = 1 << 30, start = -1;
+    for (long i = 0; i < long(out.size()); i++) {
+        if (std::fabs(out[size_t(i)]) > 1e-4f) {
+            if (start < 0 || quiet > 256)
+                found.push_back({i, i + 1});
+            start = i, quiet = 0;
+            found.back().second = i + 1;
+        } else {
+            quiet++;
+        }
+    }
+    return found;
+}
+
+// Where in `ref` the stretch `out`[at, at + 512) is found (the least squared difference).
+long locate(const Samples& out, long at, const Samples& ref) {
+    long best = -1;
+    double bestError = 1e30;
+    for (long r = 0; r + 512 <= long(ref.size()); r++) {
+        double e = 0;
+        for (long i = 0; i < 512 && e < bestError; i++) {
+            double d = out[size_t(at + i)] - ref[size_t(r + i)];
+            e += d * d;
+        }
+        if (e < bestError)
+            bestError = e, best = r;
+    }
+    return best;
+}
+
+// The largest difference between a segment of `out` and `ref`, matched where the middle of
+// the segment lies in `ref`, leaving `edge` frames at each end of the segment.
+float mismatch(const Samples& out, std::pair<long, long> seg, const Samples& ref, long edge) {
+    long middle = (seg.first + seg.second) / 2 - 256;
+    long lag = middle - locate(out, middle, ref);
+    float worst = 0;
+    for (long i = seg.first + edge; i < seg.second - edge; i++) {
+        long r = i - lag;
+        float expected = r >= 0 && r < long(ref.size()) ? ref[size_t(r)] : 0.0f;
+        worst = std::max(worst, std::fabs(out[size_t(i)] - expected));
+    }
+    return worst;
+}
+
+class SoundOutputTest : public TempDirTest {
+  protected:
+    void SetUp() override {
+        TempDirTest::SetUp();
+        file_ = Path("device.raw");
+        setenv("SDL_AUDIODRIVER", "disk", 1);
+        setenv("SDL_DISKAUDIOFILE", file_.c_str(), 1);
+        setenv("SDL_DISKAUDIODELAY", "0", 1);
+        ASSERT_TRUE(KLSoundControl::Open());
+        ASSERT_STREQ(KLSoundControl::DriverName(), "disk");
+        rate_ = KLSoundControl::DeviceRate();
+        channels_ = KLSoundControl::DeviceChannels();
+        ASSERT_GT(rate_, 0);
+        TimerClock::SetSource(device_clock);
+        KLSoundControl::PlaySpeed(1.0f);
+    }
+    void TearDown() override {
+        KLSoundControl::Stop();
+        KLSoundControl::Close();
+        TimerClock::SetSource(nullptr);
+        TempDirTest::TearDown();
+    }
+
+    // Lets the device run for `seconds` of its own clock (ten seconds of real time at most).
+    static void Run(double seconds) {
+        double until = KLSoundControl::DeviceSeconds() + seconds;
+        auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+        while (KLSoundControl::DeviceSeconds() < until && std::chrono::steady_clock::now() < limit)
+            std::this_thread::yield();
+        ASSERT_GE(KLSoundControl::DeviceSeconds(), until) << "the disk device stalled";
+    }
+
+    // One pass over [from, to] seconds of `sound` at `speed`, as the transport runs it: the
+    // timer spans the region stretched by the speed; the device runs a little past its end.
+    int Pass(CueSound* sound, double from, double to, float speed) {
+        KLSoundControl::PlaySpeed(speed);
+        double stretched = from + (to - from) / speed;
+        KLTimer timer(CueTime::FromSeconds(from), CueTime::FromSeconds(stretched));
+        int started = KLSoundControl::Play(sound, &timer, CueTime());
+        timer.start();
+        Run(std::fabs(stretched - from) + 0.1);
+        return started;
+    }
+
+    // Channel 0 of everything written since Open (the device is closed to flush the file).
+    Samples Written() {
+        KLSoundControl::Close();
+        std::ifstream in(file_, std::ios::binary);
+        std::vector<float> all;
+        float frame[8];
+        while (in.read(reinterpret_cast<char*>(frame), std::streamsize(sizeof(float) * channels_)))
+            all.push_back(frame[0]);
+        return all;
+    }
+
+    std::string file_;
+    int rate_ = 0, channels_ = 0;
+};
+
+// Forwards and backwards at each transport speed: one stretch of sound, as long as the
+// region over the speed, equal to the sound resampled at that speed (reversed backwards).
+class SoundPassTest : public SoundOutputTest,
+                      public ::testing::WithParamInterface<std::tuple<float, bool>> {};
+
+TEST_P(SoundPassTest, WritesTheResampledSoundForTheWholePass) {
+    auto [speed, reverse] = GetParam();
+    auto sound = chirp(rate_ / 2.0);
+    const double length = sound->Length();
+    ASSERT_EQ(Pass(sound.get(), reverse ? length : 0, reverse ? 0 : length, speed), 1);
+    Samples out = Written();
+    auto seg = segments(out);
+    ASSERT_EQ(seg.size(), 1u) << "one unbroken stretch of sound";
+    Samples ref = resampled(sound->Channel(0), rate_ / (sound->Rate() * speed));
+    if (reverse)
+        std::reverse(ref.begin(), ref.end());
+    // The first output latency of the pass is heard before the device could play it.
+    const long latency = long(KLSoundControl::Latency() * rate_) + 1;
+    long extent = seg[0].second - seg[0].first;
+    EXPECT_NEAR(double(extent), double(ref.size()), double(latency + 64)) << "lasts length / speed";
+    EXPECT_LT(mismatch(out, seg[0], ref, 64), 0.01f);
+}
+
+INSTANTIATE_TEST_SUITE_P(SpeedsAndDirections, SoundPassTest,
+                         ::testing::Combine(::testing::Values(1.0f, 0.75f, 0.5f, 0.25f, 1.25f),
+                                            ::testing::Bool()));
+
+TEST_F(SoundOutputTest, HalfSpeedLastsTwiceAsLongAsFullSpeed) {
+    auto sound = chirp(rate_ / 2.0);
+    Pass(sound.get(), 0, sound->Length(), 1.0f);
+    Pass(sound.get(), 0, sound->Length(), 0.5f);
+    auto seg = segments(Written());
+    ASSERT_EQ(seg.size(), 2u);
+    double full = double(seg[0].second - seg[0].first);
+    double half = double(seg[1].second - seg[1].first);
+    EXPECT_NEAR(half / full, 2.0, 0.03);
+}
+
+// A looped region is a new timer and a new Play each time: each repeat is the whole region.
+TEST_F(SoundOutputTest, ALoopRepeatsTheRegion) {
+    auto sound = chirp(rate_ / 2.0);
+    Samples ref = resampled(sound->Channel(0), 2.0);
+    Samples region(ref.begin() + long(ref.size() / 4), ref.begin() + long(ref.size() / 2));
+    for (int i = 0; i < 3; i++)
+        Pass(sound.get(), 0.25, 0.5, 1.0f);
+    Samples out = Written();
+    auto seg = segments(out);
+    ASSERT_EQ(seg.size(), 3u);
+    for (auto s : seg) {
+        EXPECT_NEAR(double(s.second - s.first), double(region.size()), 600.0);
+        EXPECT_LT(mismatch(out, s, ref, 64), 0.01f);
+        long middle = (s.first + s.second) / 2 - 256;
+        long at = locate(out, middle, ref) - (middle - s.first);
+        EXPECT_NEAR(double(at), double(ref.size() / 4), 600.0) << "each repeat starts at 0.25 s";
+    }
+}
+
+TEST_F(SoundOutputTest, AScrubGrainIsTheSoundAtThePointerAndRestingIsSilent) {
+    auto sound = chirp(rate_ / 2.0);
+    Samples ref = resampled(sound->Channel(0), 2.0);
+    float pointer = 0.5f;
+    ASSERT_EQ(KLSoundControl::PlayDrag(sound.get(), nullptr, 100, &pointer), 1);
+    Run(0.3);
+    const float moved = 0.25f;
+    __atomic_store(&pointer, &moved, __ATOMIC_RELAXED);
+    Run(0.3);
+    Samples out = Written();
+    auto seg = segments(out);
+    ASSERT_EQ(seg.size(), 2u) << "one grain per move, nothing while resting";
+    const long grain = rate_ / 10;
+    for (int i = 0; i < 2; i++) {
+        long first = seg[size_t(i)].first;
+        EXPECT_NEAR(double(seg[size_t(i)].second - first), double(grain), 2.0);
+        // The grain is the sound from the pointer's place (after a fade of 64 frames).
+        EXPECT_LT(mismatch(out, seg[size_t(i)], ref, 64), 0.01f);
+        long at = locate(out, first + 1024, ref) - 1024;
+        long expected = long(ref.size()) * (i == 0 ? 2 : 1) / 4;
+        EXPECT_NEAR(double(at), double(expected), 2.0) << "grain " << i;
+    }
+}
+
+// The workspace may replace its sound while a pass plays it: the output lets go first.
+TEST_F(SoundOutputTest, ASoundDestroyedWhilePlayingFallsSilent) {
+    auto sound = chirp(rate_ / 2.0, 2.0);
+    KLTimer timer(CueTime(), CueTime::FromSeconds(2));
+    ASSERT_EQ(KLSoundControl::Play(sound.get(), &timer, CueTime()), 1);
+    timer.start();
+    Run(0.5);
+    sound.reset();
+    const double cut = KLSoundControl::DeviceSeconds();
+    Run(0.5);
+    auto seg = segments(Written());
+    ASSERT_EQ(seg.size(), 1u);
+    EXPECT_LE(double(seg[0].second) / rate_, cut + 0.05) << "nothing after the sound went";
+}
+
+TEST_F(SoundOutputTest, NothingToPlayIsSilentAndSaysSo) {
+    KLTimer timer(CueTime(), CueTime::FromSeconds(0.5));
+    EXPECT_EQ(KLSoundControl::Play(nullptr, &timer, CueTime()), 0);
+    auto empty = CueSound::FromSamples({{}}, 8000);
+    EXPECT_EQ(KLSoundControl::Play(empty.get(), &timer, CueTime()), 0);
+    float pointer = 0.5f;
+    EXPECT_EQ(KLSoundControl::PlayDrag(empty.get(), nullptr, 100, &pointer), 0);
+}
+
+// Odd sounds play for as long as they last, whatever their rate and channel count; a region
+// past the end of the sound is silence; the speed out of range plays at 1.
+struct OddSound {
+    double rate;
+    int channels;
+    long frames;
+    double from, to;  // region, seconds
+    float speed;
+    long expected;  // device frames of sound at 48 kHz (0: silent)
+};
+
+class OddSoundTest : public SoundOutputTest, public ::testing::WithParamInterface<OddSound> {};
+
+TEST_P(OddSoundTest, PlaysWithoutHarm) {
+    const OddSound c = GetParam();
+    ASSERT_EQ(rate_, 48000);
+    std::vector<Samples> channels(size_t(c.channels), Samples(size_t(c.frames)));
+    for (auto& ch : channels)
+        for (long i = 0; i < c.frames; i++)
+            ch[size_t(i)] = i % 2 ? 0.5f : -0.5f;
+    auto sound = CueSound::FromSamples(channels, c.rate);
+    ASSERT_EQ(Pass(sound.get(), c.from, c.to, c.speed), 1);
+    auto seg = segments(Written());
+    long heard = seg.empty() ? 0 : seg.back().second - seg.front().first;
+    EXPECT_NEAR(double(heard), double(c.expected), 1100.0);
+}
+
+INSTANTIATE_TEST_SUITE_P(Odd, OddSoundTest,
+                         ::testing::Values(OddSound{8000, 1, 8000, 0, 1, 1.0f, 48000},
+                                           OddSound{192000, 6, 96000, 0, 0.5, 1.0f, 24000},
+                                           OddSound{44100, 2, 1, 0, 0.5, 1.0f, 0},
+                                           OddSound{16000, 1, 16000, 2, 3, 1.0f, 0},
+                                           OddSound{16000, 1, 16000, 0.5, 2, 1.0f, 24000}));
+
+// Without a usable device the silent driver takes over, the user is told once, and passes
+// still run; the audio library's own messages become the program's reports.
+class SoundFallback : public ::testing::Test {
+  protected:
+    void TearDown() override { KLSoundControl::Close(); }
+    CaptureErrors errors;
+};
+
+TEST_F(SoundFallback, NoDeviceFallsBackToTheSilentDriverAndReportsThroughTheProgram) {
+    setenv("SDL_AUDIODRIVER", "nosuchdriver", 1);
+    ASSERT_TRUE(KLSoundControl::Open());
+    EXPECT_STREQ(KLSoundControl::DriverName(), "dummy");
+    ASSERT_FALSE(errors.reports.empty());
+    EXPECT_EQ(errors.reports[0].first, KLErr::kWarning);
+    EXPECT_NE(errors.reports[0].second.find("No audio output could be opened"), std::string::npos);
+    auto sound = chirp(24000);
+    KLTimer timer(CueTime(), CueTime::FromSeconds(0.2));
+    EXPECT_EQ(KLSoundControl::Play(sound.get(), &timer, CueTime()), 1);
+    timer.start();
+    KLSoundControl::Stop();
+
+    errors.reports.clear();
+    KLSoundControl::DisableAudioLibraryErrors();
+    SDL_LogError(SDL_LOG_CATEGORY_AUDIO, "device %d lost", 3);
+    ASSERT_EQ(errors.reports.size(), 1u);
+    EXPECT_EQ(errors.reports[0].first, KLErr::kError);
+    EXPECT_NE(errors.reports[0].second.find("device 3 lost"), std::string::npos);
+}
+
+}  // namespace

@@ -1,0 +1,182 @@
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <tuple>
+#include <vector>
+
+#include "toolkit/KLStopWatch.h"
+#include "toolkit/KLTimer.h"
+#include "toolkit/KLTimerBeat.h"
+#include "toolkit/TimerClock.h"
+
+namespace {
+
+double fakeNow = 100.0;
+double fake_clock() {
+    return fakeNow;
+}
+
+// Runs timers on a clock the test moves by hand.
+class TimerTest : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        fakeNow = 100.0;
+        TimerClock::SetSource(fake_clock);
+    }
+    void TearDown() override {
+        TimerClock::SetSource(nullptr);
+        KLTimerBeat::SetDriver(nullptr);
+    }
+    static void Advance(double seconds) { fakeNow += seconds; }
+
+    // Records each trigger's data and the timer's time when it fired.
+    static void Note(KLTimer* timer, void* data) {
+        fired.push_back({*static_cast<int*>(data), timer->CurrentSeconds()});
+    }
+    static inline std::vector<std::pair<int, double>> fired;
+};
+
+using Case = std::tuple<double, double, double, double>;  // from, to, elapsed, expected (s)
+
+class TimerArithmetic : public TimerTest, public ::testing::WithParamInterface<Case> {};
+
+TEST_P(TimerArithmetic, RunsTowardsItsEndAtWallClockRateAndStopsThere) {
+    auto [from, to, elapsed, expected] = GetParam();
+    KLTimer timer(CueTime::FromSeconds(from), CueTime::FromSeconds(to));
+    EXPECT_DOUBLE_EQ(timer.CurrentSeconds(), from) << "not started";
+    EXPECT_EQ(timer.Reverse(), to < from);
+    timer.start();
+    Advance(elapsed);
+    EXPECT_NEAR(timer.CurrentSeconds(), expected, 1e-9);
+    const bool atEnd = expected == to;
+    EXPECT_EQ(timer.fire_due(), !atEnd) << "the beat stops the timer at its end";
+    EXPECT_EQ(timer.Running(), !atEnd);
+    if (atEnd) {
+        EXPECT_EQ(timer.Current(), CueTime::FromSeconds(to));
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(ForwardReverseAndEnds, TimerArithmetic,
+                         ::testing::Values(Case{1.0, 3.0, 0.5, 1.5}, Case{1.0, 3.0, 2.0, 3.0},
+                                           Case{1.0, 3.0, 9.0, 3.0}, Case{3.0, 1.0, 0.5, 2.5},
+                                           Case{3.0, 1.0, 2.5, 1.0}, Case{-1.0, 1.0, 0.25, -0.75},
+                                           Case{0.0, -2.0, 1.0, -1.0}, Case{2.0, 2.0, 0.0, 2.0},
+                                           Case{2.0, 2.0, 5.0, 2.0}));
+
+TEST_F(TimerTest, TriggersFireOnceWhenTheirTimeIsReachedInTheTimersDirection) {
+    for (bool reverse : {false, true}) {
+        fired.clear();
+        CueTime a = CueTime::FromSeconds(1), b = CueTime::FromSeconds(2);
+        KLTimer timer(reverse ? b : a, reverse ? a : b);
+        int mid = 1, end = 2;
+        timer.post_trigger(Note, &end, timer.To());
+        timer.post_trigger(Note, &mid, CueTime::FromSeconds(reverse ? 1.25 : 1.75));
+        timer.fire_due();
+        EXPECT_TRUE(fired.empty()) << "nothing fires before start";
+        timer.start();
+        Advance(0.5);
+        timer.fire_due();
+        EXPECT_TRUE(fired.empty()) << "half way, neither is due";
+        Advance(0.3);
+        timer.fire_due();
+        ASSERT_EQ(fired.size(), 1u);
+        EXPECT_EQ(fired[0].first, 1);
+        Advance(0.3);
+        EXPECT_FALSE(timer.fire_due());
+        timer.fire_due();
+        ASSERT_EQ(fired.size(), 2u) << "each fires once";
+        EXPECT_EQ(fired[1].first, 2);
+        EXPECT_DOUBLE_EQ(fired[1].second, timer.To().Seconds());
+    }
+}
+
+TEST_F(TimerTest, StopFreezesTimeAndKeepsTriggersThatWereNotDue) {
+    fired.clear();
+    KLTimer timer(CueTime::FromSeconds(0), CueTime::FromSeconds(1));
+    int end = 7;
+    timer.post_trigger(Note, &end, timer.To());
+    timer.start();
+    Advance(0.4);
+    timer.stop();
+    Advance(10);
+    EXPECT_NEAR(timer.CurrentSeconds(), 0.4, 1e-9);
+    EXPECT_FALSE(timer.fire_due());
+    EXPECT_TRUE(fired.empty());
+    timer.start();  // resumes where it stopped
+    Advance(0.1);
+    EXPECT_NEAR(timer.CurrentSeconds(), 0.5, 1e-9);
+}
+
+TEST_F(TimerTest, AnEmptyTimerEndsOnTheFirstBeat) {
+    fired.clear();
+    KLTimer timer(CueTime::FromSeconds(3), CueTime::FromSeconds(3));
+    int end = 1;
+    timer.post_trigger(Note, &end, timer.To());
+    timer.start();
+    KLTimerBeat::Tick();
+    EXPECT_EQ(fired.size(), 1u);
+    EXPECT_FALSE(timer.Running());
+}
+
+// A trigger may end playback: destroy its own timer and another one during the beat.
+TEST_F(TimerTest, TheBeatSurvivesTriggersThatDestroyTimers) {
+    auto first = std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1));
+    auto second = std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1));
+    struct Owners {
+        std::unique_ptr<KLTimer>* a;
+        std::unique_ptr<KLTimer>* b;
+    } owners{&first, &second};
+    auto destroy = [](KLTimer*, void* data) {
+        auto* o = static_cast<Owners*>(data);
+        o->a->reset();
+        o->b->reset();
+    };
+    first->post_trigger(destroy, &owners, first->To());
+    second->post_trigger(destroy, &owners, second->To());
+    first->start();
+    second->start();
+    Advance(2);
+    KLTimerBeat::Tick();
+    EXPECT_EQ(first, nullptr);
+    EXPECT_EQ(second, nullptr);
+}
+
+TEST_F(TimerTest, TheBeatSwitchesItsDriver) {
+    static std::vector<bool> calls;
+    calls.clear();
+    KLTimerBeat::SetDriver([](bool run) { calls.push_back(run); });
+    KLTimerBeat::start();
+    EXPECT_TRUE(KLTimerBeat::Running());
+    KLTimerBeat::stop();
+    EXPECT_FALSE(KLTimerBeat::Running());
+    EXPECT_EQ(calls, (std::vector<bool>{true, false}));
+}
+
+// The clock a sound thread holds outlives the timer and stays frozen where it stopped.
+TEST_F(TimerTest, TheSharedClockOutlivesItsTimer) {
+    std::shared_ptr<const TimerClock> clock;
+    {
+        KLTimer timer(CueTime::FromSeconds(5), CueTime::FromSeconds(4));
+        clock = timer.Clock();
+        timer.start();
+        Advance(0.25);
+        timer.stop();
+    }
+    Advance(1);
+    EXPECT_FALSE(clock->Running());
+    EXPECT_NEAR(clock->At(TimerClock::Now()), 4.75, 1e-9);
+}
+
+TEST_F(TimerTest, StopWatchReportsTheRateOfItsMarks) {
+    KLStopWatch watch;
+    EXPECT_EQ(watch.FrameRate(), 0.0);
+    for (int i = 0; i < 61; i++, Advance(1.0 / 120))
+        watch.Mark();
+    EXPECT_EQ(watch.Marks(), 61);
+    EXPECT_NEAR(watch.FrameRate(), 120.0, 1e-6);
+    watch.Reset();
+    watch.Mark();
+    EXPECT_EQ(watch.FrameRate(), 0.0) << "one mark is no rate";
+}
+
+}  // namespace

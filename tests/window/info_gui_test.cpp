@@ -1,0 +1,185 @@
+// The information bar, the window's messages and questions, and the error flag.
+#include <gtest/gtest.h>
+
+#include <Xm/MessageB.h>
+#include <Xm/TextF.h>
+#include <Xm/Xm.h>
+
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <vector>
+
+#include "guitest/GuiTest.h"
+#include "toolkit/KLErrHandler.h"
+#include "toolkit/KLString.h"
+#include "toolkit/xm/KLAlert.h"
+#include "toolkit/xm/KLImageView.h"
+#include "window/Gnome.h"
+#include "window/WindowTestUtil.h"
+#include "workspace/Imp.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+std::string LabelOf(const char* name) {
+    Widget w = KLXmGnome::FindWidget(name);
+    if (!w)
+        return "<none>";
+    XmString s = nullptr;
+    XtVaGetValues(w, XmNlabelString, &s, nullptr);
+    char* text = nullptr;
+    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+    std::string result = text ? text : "";
+    XtFree(text);
+    XmStringFree(s);
+    return result;
+}
+
+std::string MessageOf(KLAlert* alert) {
+    XmString s = nullptr;
+    XtVaGetValues(alert->GetDialog(), XmNmessageString, &s, nullptr);
+    char* text = nullptr;
+    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+    std::string result = text ? text : "";
+    XtFree(text);
+    XmStringFree(s);
+    return result;
+}
+
+class InfoTest : public ::testing::Test {
+  protected:
+    void SetUp() override { gnome = &windowtest::TheWindow(); }
+    // Runs `action`, answering every "Attention" alert it shows with `button`; the texts told,
+    // the last one returned.
+    std::string Answer(const std::function<void()>& action, int button = 0) {
+        KLAlert* alert = gnome->attentionAlert.get();
+        told.clear();
+        auto step = [&] {
+            if (!alert->Waiting() || !windowtest::Viewable(alert->Button(button)))
+                return false;
+            told.push_back(MessageOf(alert));
+            return windowtest::ClickWhenViewable(alert->Button(button));
+        };
+        windowtest::AnswerScript script({step, step, step, step});
+        action();
+        EXPECT_FALSE(told.empty()) << "nothing was told";
+        return told.empty() ? "" : told.back();
+    }
+    std::vector<std::string> told;
+    Gnome* gnome = nullptr;
+};
+
+TEST_F(InfoTest, TimecodeShowsTimeAndFractionalFrame) {
+    CueTime::default_fps = 30;
+    gnome->DisplayTimecode(CueTime::FromTicks(300));  // one and a half frames
+    EXPECT_EQ(LabelOf("infoFrameValue"), "1.5");
+    EXPECT_EQ(LabelOf("infoTimeValue"), "1.5");
+    gnome->DisplayTimecode(CueTime::FromTicks(6000 * 2));
+    EXPECT_EQ(LabelOf("infoFrameValue"), "60");
+    gnome->DisplayDuration(CueTime::FromTicks(6000 * 5));
+    EXPECT_EQ(LabelOf("infoDurationValue"), "150");
+    gnome->DisplayReferenceOffset(CueTime::FromTicks(2400));
+    EXPECT_EQ(LabelOf("refAdjust"), "Set Reference Time [12]");
+}
+
+TEST_F(InfoTest, VersionIsInformedWithOk) {
+    std::string told = Answer([] { Gnome::version_cb(nullptr, XtPointer(2), nullptr); });
+    EXPECT_EQ(told, "Tessel|Marlin Parlando and Facial Animation Version 2.0 (9704300208)");
+}
+
+TEST_F(InfoTest, ConfirmAsksInTheWindowAndAssumesOkInBatchMode) {
+    int answer = -1;
+    EXPECT_EQ(Answer([&] { answer = gnome->Confirm("Go on?", "Yes", "No"); }, 1), "Go on?");
+    EXPECT_EQ(answer, 0);
+    theImp.batchMode = 1;
+    testing::internal::CaptureStderr();
+    answer = gnome->Confirm("Go on?", "Yes", "No");
+    std::string err = testing::internal::GetCapturedStderr();
+    theImp.batchMode = 0;
+    EXPECT_EQ(answer, 1);
+    EXPECT_EQ(err, "Go on?\nAssuming OK\n");
+}
+
+TEST_F(InfoTest, DamagedOrMissingFilesAreToldAndTheWindowGoesOn) {
+    std::string dir = fs::temp_directory_path() / ("chirrup-info-" + std::to_string(getpid()));
+    fs::create_directories(dir);
+    std::string garbage = dir + "/garbage.kset";
+    std::ofstream(garbage) << "\x01\x02 not a keyset\nbegin keyset\n";
+    int result = -1;
+    std::string told = Answer([&] { result = theImp.LoadKeyset(garbage.c_str()); });
+    EXPECT_EQ(result, 0);
+    EXPECT_EQ(told, "Could not read wire file, cannot load keyset");
+    told = Answer([&] { result = theImp.LoadTrack((dir + "/missing.track").c_str()); });
+    EXPECT_EQ(result, 0);
+    EXPECT_EQ(told, "Failed to open track file [" + dir + "/missing.track].");
+    told = Answer([&] { result = theImp.LoadKeyset(dir.c_str()); });  // a folder
+    EXPECT_EQ(told, "Failed to open keyset file [" + dir + "].");
+    fs::remove_all(dir);
+}
+
+TEST_F(InfoTest, ErrorFlagTurnsSolidOnALoggedErrorAndClearsWhenTheLogIsViewed) {
+    std::string dir = fs::temp_directory_path() / ("chirrup-flag-" + std::to_string(getpid()));
+    fs::create_directories(dir);
+    theImp.SetErrorFilename((dir + "/errlog.vx").c_str());
+    Widget flag = KLXmGnome::FindWidget("errorFlag");
+    ASSERT_NE(flag, nullptr);
+    Pixel foreground = 0, background = 0, parentBackground = 0;
+    XtVaGetValues(flag, XmNforeground, &foreground, nullptr);
+    XtVaGetValues(XtParent(flag), XmNbackground, &parentBackground, nullptr);
+    KLError("Something went wrong in a test.\n");
+    XtVaGetValues(flag, XmNbackground, &background, nullptr);
+    EXPECT_EQ(background, foreground) << "a logged error makes the flag solid";
+    guitest::Settle();
+    guitest::Screenshot("window-error-flag");
+    // Viewing the log (here with a viewer that does nothing) clears the flag.
+    setenv("TESSEL_USER_ERROR_READER", "true", 1);
+    Gnome::view_errors_cb(nullptr, nullptr, nullptr);
+    unsetenv("TESSEL_USER_ERROR_READER");
+    XtVaGetValues(flag, XmNbackground, &background, nullptr);
+    EXPECT_EQ(background, parentBackground);
+    std::ifstream in(dir + "/errlog.vx");
+    std::string log((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+    EXPECT_NE(log.find("Something went wrong in a test."), std::string::npos);
+    EXPECT_NE(log.find("\n---------------------------------------\n"), std::string::npos);
+    fs::remove_all(dir);
+}
+
+TEST_F(InfoTest, AdjustRelLoadFillsTheDialogAndCopiesBackTheAnswer) {
+    char* prefix = KLNewString("shots/take.");
+    char* ext = KLNewString("png");
+    int start = 1, end = 24, by = 1, zoom = 2;
+    Widget ok = KLXmGnome::FindWidget("refLoadOk");
+    windowtest::AnswerScript script({[&] {
+        if (!windowtest::Viewable(ok))
+            return false;
+        guitest::Settle();
+        XmTextFieldSetString(KLXmGnome::FindWidget("refPrefix"), const_cast<char*>("pix/ref."));
+        XmTextFieldSetString(KLXmGnome::FindWidget("refEnd"), const_cast<char*>("48"));
+        XmTextFieldSetString(KLXmGnome::FindWidget("refBy"), const_cast<char*>("3"));
+        guitest::Settle();
+        guitest::Screenshot("window-reference-dialog");
+        return windowtest::ClickWhenViewable(ok);
+    }});
+    EXPECT_EQ(gnome->AdjustRelLoad(&prefix, &ext, &start, &end, &by, &zoom), 1);
+    EXPECT_TRUE(script.Finished());
+    EXPECT_STREQ(prefix, "pix/ref.");
+    EXPECT_STREQ(ext, "png");
+    EXPECT_EQ(start, 1);
+    EXPECT_EQ(end, 48);
+    EXPECT_EQ(by, 1);
+    EXPECT_EQ(zoom, 3);
+    EXPECT_EQ(gnome->refImageView->Zoom(), 3);
+    delete[] prefix;
+    delete[] ext;
+}
+
+TEST_F(InfoTest, StatusReportsShowInTheStatusLine) {
+    int saved = KLErrHandler::outputLevel;
+    KLStatus("Parsing keyset description.");
+    EXPECT_EQ(LabelOf("statusLine"), "Parsing keyset description.");
+    KLErrHandler::outputLevel = saved;
+}
+
+}  // namespace

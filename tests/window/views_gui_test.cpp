@@ -1,0 +1,358 @@
+// The key and mix views in the main window on the demo: camera drags with real pointer input,
+// feedback and geometry toggles, the key view's stored camera, the key-shape pictures and the
+// other keysets held static in the key view.
+#include <gtest/gtest.h>
+
+#include <X11/extensions/XTest.h>
+#include <Xm/ToggleB.h>
+#include <Xm/Xm.h>
+
+#include <chrono>
+#include <cstring>
+#include <filesystem>
+
+#include "guitest/GuiTest.h"
+#include "model/KLKey.h"
+#include "model/KLKeySet.h"
+#include "model/KLKeyTrack.h"
+#include "scene/KLScene.h"
+#include "scene/gl/KLSceneView.h"
+#include "toolkit/KLImageSGI.h"
+#include "toolkit/xm/KLAlert.h"
+#include "window/Gnome.h"
+#include "window/WindowTestUtil.h"
+#include "workspace/Imp.h"
+
+namespace {
+
+Widget W(const char* name) {
+    return KLXmGnome::FindWidget(name);
+}
+
+bool SamePixels(const KLImageSGI& a, const KLImageSGI& b) {
+    return a.Width() == b.Width() && a.Height() == b.Height() &&
+           std::memcmp(a.Pixels(), b.Pixels(), size_t(a.Width()) * size_t(a.Height()) * 4) == 0;
+}
+
+bool SameCamera(const KLCamera& a, const KLCamera& b) {
+    return a.yaw == b.yaw && a.pitch == b.pitch && a.distance == b.distance &&
+           a.centre.x == b.centre.x && a.centre.y == b.centre.y && a.centre.z == b.centre.z;
+}
+
+// The demo keyset loaded once with its geometry; each test starts with framed views.
+class ViewsTest : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        gnome = &windowtest::TheWindow();
+        if (theImp.keysetCount == 0) {
+            const std::string project = windowtest::DemoProject();
+            ASSERT_EQ(theImp.LoadKeyset((project + "/misc_data/demo.kset").c_str()), 1);
+        }
+        ASSERT_TRUE(gnome->keyScene && gnome->mixScene);
+        ASSERT_TRUE(gnome->keyScene->HasGL()) << "the test display offers no GL";
+        ASSERT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
+        for (KLSceneView* view : {gnome->keyScene, gnome->mixScene}) {
+            view->ForgetCamera();
+            view->Camera() = KLCamera();
+            view->time = CueTime();
+        }
+        gnome->CenterKeyView();
+        gnome->CenterMixView();
+    }
+    // Runs the event loop as the program does (work procedures run while it waits) until
+    // the view has drawn `count` more times, for at most five seconds.
+    bool Steps(KLSceneView* view, int count) {
+        const int until = view->Draws() + count;
+        const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(5);
+        XtAppContext app = KLXmGnome::AppContext();
+        while (view->Draws() < until && std::chrono::steady_clock::now() < limit) {
+            bool fired = false;
+            XtAppAddTimeOut(
+                app, 10, [](XtPointer done, XtIntervalId*) { *static_cast<bool*>(done) = true; },
+                &fired);
+            while (!fired)
+                XtAppProcessEvent(app, XtIMAll);
+        }
+        return view->Draws() >= until;
+    }
+    void PointerAt(int x, int y) {
+        XTestFakeMotionEvent(guitest::GetDisplay(), -1, x, y, CurrentTime);
+        guitest::Settle();
+    }
+    Gnome* gnome = nullptr;
+};
+
+// Held at the anchor the camera stays; moved off it, it turns continuously until release.
+TEST_F(ViewsTest, TumbleDragAtARateFromTheAnchor) {
+    KLSceneView* view = gnome->keyScene;
+    const KLCamera start = view->Camera();
+    const int ended = view->DragsEnded();
+    guitest::MoveTo(W("keyVuTumble"));
+    guitest::Press(1);
+    ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 1; }));
+    EXPECT_EQ(gnome->dragButton, 1);
+    EXPECT_EQ(gnome->dragMode, 0);
+    ASSERT_TRUE(Steps(view, 10));
+    EXPECT_TRUE(SameCamera(view->Camera(), start)) << "the pointer rests at the anchor";
+    EXPECT_EQ(gnome->dragDX, 0);
+    PointerAt(gnome->anchorX + 60, gnome->anchorY);
+    ASSERT_TRUE(Steps(view, 3));
+    const float yaw = view->Camera().yaw;
+    EXPECT_NE(yaw, start.yaw);
+    ASSERT_TRUE(Steps(view, 3));
+    EXPECT_NE(view->Camera().yaw, yaw) << "turns on while held";
+    EXPECT_EQ(view->Camera().pitch, start.pitch);
+    guitest::Release(1);
+    ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 0; }));
+    EXPECT_EQ(view->DragsEnded(), ended + 1);
+    const KLCamera after = view->Camera();
+    guitest::Settle();
+    EXPECT_TRUE(SameCamera(view->Camera(), after)) << "stops at release";
+}
+
+// The middle button turns only about the vertical axis, the right one only tilts; a second
+// button neither starts nor ends a drag.
+TEST_F(ViewsTest, ButtonsLockAxesAndASecondButtonIsIgnored) {
+    KLSceneView* view = gnome->mixScene;
+    for (int button : {2, 3}) {
+        const KLCamera start = view->Camera();
+        guitest::MoveTo(W("mixVuTumble"));
+        guitest::Press(button);
+        ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 1; }));
+        PointerAt(gnome->anchorX + 50, gnome->anchorY + 50);
+        ASSERT_TRUE(Steps(view, 5));
+        if (button == 2) {
+            EXPECT_NE(view->Camera().yaw, start.yaw);
+            EXPECT_EQ(view->Camera().pitch, start.pitch);
+        } else {
+            EXPECT_EQ(view->Camera().yaw, start.yaw);
+            EXPECT_NE(view->Camera().pitch, start.pitch);
+        }
+        guitest::Press(1);
+        guitest::Release(1);
+        guitest::Settle();
+        EXPECT_EQ(gnome->dragging, 1) << "button 1 did not end the drag of button " << button;
+        EXPECT_EQ(gnome->dragButton, button);
+        guitest::Release(button);
+        ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 0; }));
+    }
+}
+
+// While sound plays the arm adds no work procedure: the camera does not move.
+TEST_F(ViewsTest, NoDragWhileSoundPlays) {
+    KLSceneView* view = gnome->keyScene;
+    const KLCamera start = view->Camera();
+    gnome->soundPlaying = 1;
+    guitest::MoveTo(W("keyVuZoom"));
+    guitest::Press(1);
+    ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 1; }));
+    PointerAt(gnome->anchorX + 80, gnome->anchorY);
+    guitest::Settle();
+    guitest::Release(1);
+    ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 0; }));
+    gnome->soundPlaying = 0;
+    EXPECT_TRUE(SameCamera(view->Camera(), start));
+}
+
+// The four feedback toggles are one radio group setting the workspace's style; each style
+// draws differently.
+TEST_F(ViewsTest, FeedbackTogglesAreOneRadioGroup) {
+    const char* names[] = {"points", "lines", "polygons", "polygonsboth"};
+    std::unique_ptr<KLImageSGI> pictures[4];
+    for (int style : {1, 0, 3, 2}) {
+        XmToggleButtonSetState(W(names[style]), True, True);
+        for (int i = 0; i < 4; i++)
+            EXPECT_EQ(XmToggleButtonGetState(W(names[i])), i == style) << names[i];
+        EXPECT_EQ(theImp.feedback, style);
+        EXPECT_EQ(theImp.scene->Feedback(), style);
+        EXPECT_FALSE(windowtest::Viewable(gnome->informationAlert->GetDialog()));
+        pictures[style] = gnome->mixScene->DrawPix(320, 240);
+        ASSERT_TRUE(pictures[style]);
+        if (style == 2 || style == 1) {
+            guitest::Settle();
+            guitest::Screenshot(std::string("window-views-") + names[style]);
+        }
+    }
+    EXPECT_FALSE(SamePixels(*pictures[0], *pictures[1]));
+    EXPECT_FALSE(SamePixels(*pictures[1], *pictures[2]));
+}
+
+// Turning loadGeometry informs once per run and only stores the flag.
+TEST_F(ViewsTest, LoadGeometryInformsOnce) {
+    KLAlert* alert = gnome->attentionAlert.get();
+    windowtest::AnswerScript script({
+        [&] { return alert->Waiting() && windowtest::ClickWhenViewable(alert->Button(0)); },
+    });
+    XmToggleButtonSetState(W("loadGeometry"), False, True);
+    EXPECT_TRUE(script.Finished());
+    EXPECT_EQ(theImp.loadGeometry, 0);
+    EXPECT_EQ(theImp.geometryActive, 1) << "not before the next load";
+    XmToggleButtonSetState(W("loadGeometry"), True, True);  // no question this time
+    EXPECT_EQ(theImp.loadGeometry, 1);
+    EXPECT_EQ(gnome->geometryInformed, 1);
+}
+
+// keyVuSet keeps the key view's camera for look-at; keyVuClear lets look-at frame again.
+TEST_F(ViewsTest, KeyViewCameraSetAndClear) {
+    KLSceneView* view = gnome->keyScene;
+    for (int i = 0; i < 30; i++)
+        view->CameraTumble(200, 50, 0);
+    const KLCamera stored = view->Camera();
+    Gnome::key_view_set_cb(nullptr, nullptr, nullptr);
+    for (int i = 0; i < 30; i++)
+        view->CameraZoom(300, 0);
+    gnome->CenterKeyView();
+    EXPECT_TRUE(SameCamera(view->Camera(), stored));
+    Gnome::key_view_clear_cb(nullptr, nullptr, nullptr);
+    for (int i = 0; i < 30; i++)
+        view->CameraZoom(300, 0);
+    const float zoomed = view->Camera().distance;
+    gnome->CenterKeyView();
+    EXPECT_EQ(view->Camera().yaw, stored.yaw) << "framed again from the same direction";
+    EXPECT_EQ(view->Camera().pitch, stored.pitch);
+    EXPECT_GT(view->Camera().distance, zoomed * 1.5f);
+}
+
+// Every key shape of the active keyset has a 160 x 121 picture and an 80 x 60 icon, grabbed
+// from the key view; different shapes give different pictures.
+TEST_F(ViewsTest, KeysetImagesAreGrabbedPerKeyShape) {
+    gnome->MakeKeysetImages();
+    KLKeySet* set = gnome->shownKeyset;
+    ASSERT_TRUE(set);
+    ASSERT_GE(set->keyShapeCount, 3);
+    for (int i = 0; i < set->keyShapeCount; i++) {
+        KLKey* key = set->GetKeyShape(i);
+        ASSERT_TRUE(key->image) << key->Name();
+        EXPECT_EQ(key->image->Width(), 160);
+        EXPECT_EQ(key->image->Height(), 121);
+        ASSERT_TRUE(key->GetIcon());
+        EXPECT_EQ(key->GetIcon()->Width(), 80);
+        EXPECT_EQ(key->GetIcon()->Height(), 60);
+    }
+    EXPECT_FALSE(SamePixels(*set->GetKeyShape(0)->image, *set->GetKeyShape(1)->image));
+    EXPECT_FALSE(SamePixels(*set->GetKeyShape(1)->image, *set->GetKeyShape(3)->image));
+    EXPECT_EQ(set->imagesChanged, 1);
+    EXPECT_FALSE(theImp.GetKeyTrack(gnome->GetActiveKeyset())->vuKeyFrames)
+        << "the track is back on its events";
+}
+
+// The key view holds every keyset but the active one at its default shape; the mix view shows
+// them all as the tracks give them.
+TEST_F(ViewsTest, KeyViewHoldsOtherKeysetsStatic) {
+    ASSERT_GE(theImp.keysetCount, 2);
+    KLKeyTrack* brows = theImp.GetKeyTrack(1);
+    brows->InsertKey(0, CueTime::FromFrames(0), nullptr, KLKeyEvent::kLinear, 30.0f);
+    brows->InsertKey(0, CueTime::FromFrames(20), nullptr, KLKeyEvent::kLinear, 30.0f);
+    theImp.PrepareKeyFrames(-1);
+    gnome->mixScene->Camera() = gnome->keyScene->Camera();
+    for (KLSceneView* view : {gnome->keyScene, gnome->mixScene})
+        view->time = CueTime::FromFrames(10);
+    const auto key = gnome->keyScene->DrawPix(320, 240);
+    const auto mix = gnome->mixScene->DrawPix(320, 240);
+    EXPECT_FALSE(SamePixels(*key, *mix)) << "the brow turned in the mix view only";
+    for (int i = 0; i < theImp.keysetCount; i++)
+        if (i != gnome->GetActiveKeyset())
+            theImp.GetKeyTrack(i)->SetStatic();
+    const auto held = gnome->mixScene->DrawPix(320, 240);
+    Gnome::clear_static_keytracks(gnome);
+    EXPECT_TRUE(SamePixels(*key, *held));
+    brows->RemoveKey(CueTime::FromFrames(0));
+    brows->RemoveKey(CueTime::FromFrames(20));
+    theImp.PrepareKeyFrames(-1);
+}
+
+// ClearViews leaves both views without a scene; showing the keyset gives it back.
+TEST_F(ViewsTest, ClearViewsAndShowAgain) {
+    gnome->ClearViews();
+    EXPECT_EQ(gnome->keyScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->mixScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->shownKeyset, nullptr);
+    gnome->SetActiveKeyset(0);
+    EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
+    EXPECT_EQ(gnome->mixScene->GetScene(), theImp.scene.get());
+}
+
+}  // namespace
+
+namespace {
+
+// Played forward to a playblast, each frame of the mix view becomes a playblast frame of the
+// view's size, shown in the reference view from the region's start.
+TEST_F(ViewsTest, PlayblastFramesAreTheMixViewsFrames) {
+    KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
+    KLKeySet* set = gnome->shownKeyset;
+    mouth->InsertKey(1, CueTime::FromFrames(10), set->GetKeyShape(1), KLKeyEvent::kLinear, 1.0f);
+    mouth->InsertKey(3, CueTime::FromFrames(12), set->GetKeyShape(3), KLKeyEvent::kLinear, 1.0f);
+    theImp.PrepareKeyFrames(-1);
+    theImp.playblastImages = std::make_unique<std::unique_ptr<KLImageSGI>[]>(3);
+    theImp.playblastCount = 3;
+    const CueTime start = CueTime::FromFrames(10);
+    for (int i = 0; i < 3; i++) {
+        gnome->mixScene->time = start + CueTime::FromFrames(i);
+        gnome->mixScene->Draw();
+        gnome->grab_playblast_frame(i);
+    }
+    gnome->show_playblast(start);
+    Dimension width = 0, height = 0;
+    XtVaGetValues(gnome->mixScene->GetWidget(), XmNwidth, &width, XmNheight, &height, nullptr);
+    for (int i = 0; i < 3; i++) {
+        ASSERT_TRUE(theImp.playblastImages[size_t(i)]);
+        EXPECT_EQ(theImp.playblastImages[size_t(i)]->Width(), int(width));
+        EXPECT_EQ(theImp.playblastImages[size_t(i)]->Height(), int(height));
+    }
+    EXPECT_FALSE(SamePixels(*theImp.playblastImages[0], *theImp.playblastImages[2]))
+        << "the mouth moved from one key shape to the other";
+    EXPECT_EQ(gnome->playblastViewOn, 1);
+    EXPECT_EQ(gnome->refViewOn, 0);
+    EXPECT_EQ(theImp.GetPlayblast(start + CueTime::FromFrames(1)), theImp.playblastImages[1].get());
+    mouth->RemoveKey(CueTime::FromFrames(10));
+    mouth->RemoveKey(CueTime::FromFrames(12));
+    theImp.PrepareKeyFrames(-1);
+    Gnome::toggle_ref_view_cb(nullptr, XtPointer(0), nullptr);
+    gnome->DisplayReference(start);  // lets go of the playblast picture
+    theImp.DeletePlayblast();
+}
+
+}  // namespace
+
+namespace {
+
+// A key edited on the active track shows in both views at once, without a call to draw.
+TEST_F(ViewsTest, EditedKeysRedrawBothViews) {
+    for (KLSceneView* view : {gnome->keyScene, gnome->mixScene})
+        view->time = CueTime::FromFrames(5);
+    guitest::Settle();
+    const int key = gnome->keyScene->Draws(), mix = gnome->mixScene->Draws();
+    KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
+    mouth->InsertKey(2, CueTime::FromFrames(5), gnome->shownKeyset->GetKeyShape(2),
+                     KLKeyEvent::kLinear, 1.0f);
+    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
+    EXPECT_TRUE(guitest::WaitFor(
+        [&] { return gnome->keyScene->Draws() > key && gnome->mixScene->Draws() > mix; }));
+    mouth->RemoveKey(CueTime::FromFrames(5));
+    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
+}
+
+}  // namespace
+
+namespace {
+
+// Loaded without geometry, the views get no scene and no key-shape pictures are grabbed;
+// loaded with it again, both come back.
+TEST_F(ViewsTest, WithoutGeometryTheViewsStayEmpty) {
+    const std::string kset = windowtest::DemoProject() + "/misc_data/demo.kset";
+    theImp.loadGeometry = 0;
+    ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);
+    EXPECT_EQ(theImp.geometryActive, 0);
+    EXPECT_EQ(gnome->keyScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->mixScene->GetScene(), nullptr);
+    ASSERT_TRUE(gnome->shownKeyset);
+    gnome->MakeKeysetImages();
+    EXPECT_FALSE(gnome->shownKeyset->GetKeyShape(1)->image) << "nothing grabbed";
+    theImp.loadGeometry = 1;
+    ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);
+    EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
+    EXPECT_TRUE(gnome->shownKeyset->GetKeyShape(1)->image);
+}
+
+}  // namespace
