@@ -1,8 +1,10 @@
 #include "loudness/LoudnessRecognizer.h"
 
+#include <algorithm>
 #include <cmath>
 #include <ostream>
 
+#include "toolkit/CueChirrup.h"
 #include "toolkit/CuePlugin.h"
 #include "toolkit/CueSound.h"
 #include "toolkit/CueTokenList.h"
@@ -77,4 +79,35 @@ void LoudnessRecognizer::ReadParameter(const CueTokenList& s) {
 
 void LoudnessRecognizer::WriteParameters(std::ostream& out) const {
     out << "    levels " << halfLevel << " " << openLevel << "\n";
+}
+
+namespace {
+void step_changed(void* r, int frames) {
+    static_cast<LoudnessRecognizer*>(r)->step = CueTime::FromFrames(frames);
+}
+// A level dragged past the other one takes the other one along, so that half stays below
+// open.
+void half_changed(void* r, float level) {
+    auto* loudness = static_cast<LoudnessRecognizer*>(r);
+    loudness->halfLevel = level;
+    if (loudness->openLevel <= level) {
+        loudness->openLevel = level + 1.0f;
+        CueChirrup::SetFloatSlider(loudness, "open", loudness->openLevel);
+    }
+}
+void open_changed(void* r, float level) {
+    auto* loudness = static_cast<LoudnessRecognizer*>(r);
+    loudness->openLevel = level;
+    if (loudness->halfLevel >= level) {
+        loudness->halfLevel = level - 1.0f;
+        CueChirrup::SetFloatSlider(loudness, "half", loudness->halfLevel);
+    }
+}
+}  // namespace
+
+void LoudnessRecognizer::UpdatePanel() {
+    CueChirrup::CreateIntSlider(this, "step", 1, 15, std::max(1, int(std::lround(step.Frames()))),
+                                step_changed);
+    CueChirrup::CreateFloatSlider(this, "half", -60.0f, -1.0f, halfLevel, half_changed);
+    CueChirrup::CreateFloatSlider(this, "open", -59.0f, 0.0f, openLevel, open_changed);
 }

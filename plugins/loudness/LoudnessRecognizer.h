@@ -22,6 +22,8 @@ class LoudnessRecognizer : public CueRecognizer {
 
     void ResetSettings() override;
     bool Recognize(const CueSound& sound) override;
+    // The panel's sliders: the analysis step in frames and the two levels in dBFS.
+    void UpdatePanel() override;
     CueRecognizer* Clone() const override;
 
     // The RMS level in dBFS of samples [begin, end) of the mix of `sound`'s channels.

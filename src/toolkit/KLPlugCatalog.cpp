@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <cstdlib>
 
+#include "toolkit/CueChirrup.h"
 #include "toolkit/CuePlugin.h"
 #include "toolkit/CueRecognizer.h"
 #include "toolkit/KLErrHandler.h"
@@ -84,6 +85,9 @@ int KLPlugCatalog::ScanDirectory(const char* path) {
 bool KLPlugCatalog::LoadPlugin(const char* file) {
     if (!file)
         return false;
+    // Plug-ins call CueChirrup for their panels; the reference keeps it in every program
+    // that loads them, so that their undefined references resolve.
+    (void)CueChirrup::Host();
     void* handle = dlopen(file, RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
     if (!handle) {
         const char* why = dlerror();

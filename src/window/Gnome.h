@@ -203,6 +203,20 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void configure_cb(Widget, XtPointer, XtPointer);
     static void recognize_cb(Widget, XtPointer, XtPointer);
     static void dismiss_cb(Widget, XtPointer, XtPointer);
+    // CueChirrup's operations (the plug-ins' controls on their panels), and the progress of
+    // a recognition shown in the "Recognizing ..." alert.
+    int CreateFloatSlider(CueRecognizer* r, const char* name, float minimum, float maximum,
+                          float value, void (*callback)(void*, float));
+    int SetFloatSlider(CueRecognizer* r, const char* name, float value);
+    int CreateIntSlider(CueRecognizer* r, const char* name, int minimum, int maximum, int value,
+                        void (*callback)(void*, int));
+    int SetIntSlider(CueRecognizer* r, const char* name, int value);
+    int CreateOption(CueRecognizer* r, const char* name, int count, const char* const* labels,
+                     int value, void (*callback)(void*, int));
+    int SetOption(CueRecognizer* r, const char* name, int index);
+    void RecognizeProgress(CueRecognizer* r, float done);
+    // A labelled horizontal row "rc" for one control in a recognizer's container.
+    Widget add_control_row(Widget container, const char* name);
 
     // --- Link dialog (GnomeLink.cpp)
     void create_link_dialog();

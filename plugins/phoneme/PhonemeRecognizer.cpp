@@ -1,0 +1,261 @@
+#include "phoneme/PhonemeRecognizer.h"
+
+#include <dlfcn.h>
+
+#include <algorithm>
+#include <atomic>
+#include <chrono>
+#include <cmath>
+#include <condition_variable>
+#include <cstring>
+#include <exception>
+#include <mutex>
+#include <ostream>
+#include <thread>
+
+#include "phoneme/PauseSplitter.h"
+#include "phoneme/PhoneSet.h"
+#include "phoneme/PhoneTimeline.h"
+#include "phoneme/Resample16k.h"
+#include "toolkit/CueChirrup.h"
+#include "toolkit/CuePlugin.h"
+#include "toolkit/CueSound.h"
+#include "toolkit/CueTokenList.h"
+#include "toolkit/KLErrHandler.h"
+
+CHIRRUP_PLUGIN(PhonemeRecognizer)
+
+const char* const PhonemeRecognizer::kSpeedNames[3] = {"fast", "balanced", "accurate"};
+
+PhonemeRecognizer::PhonemeRecognizer() : CueRecognizer("Phoneme") {
+    for (int i = 0; i < PhoneSet::kCount; ++i)
+        AddTarget(PhoneSet::Name(i));
+    set_sample_sounds();
+}
+
+PhonemeRecognizer::~PhonemeRecognizer() = default;
+
+std::string PhonemeRecognizer::SampleFolder() {
+    Dl_info info{};
+    if (dladdr(reinterpret_cast<void*>(&chirrup_plugin_create), &info) == 0 || !info.dli_fname)
+        return "Phoneme-samples";
+    std::string file = info.dli_fname;
+    const size_t slash = file.rfind('/');
+    return (slash == std::string::npos ? std::string(".") : file.substr(0, slash)) +
+           "/Phoneme-samples";
+}
+
+void PhonemeRecognizer::set_sample_sounds() {
+    const std::string folder = SampleFolder();
+    for (Target& t : targets)
+        t.soundFile = folder + "/" + t.name + ".wav";
+}
+
+void PhonemeRecognizer::ResetSettings() {
+    CueRecognizer::ResetSettings();
+    set_sample_sounds();
+    minimum = kDefaultMinimum;
+    speed = PhoneDecoder::kFast;
+    threads = 0;
+    models = kDefaultModels;
+}
+
+CueRecognizer* PhonemeRecognizer::Clone() const {
+    return new PhonemeRecognizer();
+}
+
+void PhonemeRecognizer::ReadParameter(const CueTokenList& s) {
+    if (s.Count() != 2)
+        return;
+    if (s.Matches("minimum")) {
+        const int n = s.ArgInt(1);
+        if (n >= 1 && n <= kMaximumMinimum)
+            minimum = n;
+    } else if (s.Matches("speed")) {
+        for (int i = 0; i < 3; ++i)
+            if (s.Matches(kSpeedNames[i], 1))
+                speed = PhoneDecoder::Effort(i);
+    } else if (s.Matches("threads")) {
+        const int n = s.ArgInt(1);
+        if (n >= 0 && n <= kMaximumThreads)
+            threads = n;
+    } else if (s.Matches("models") && s.ArgText(1)[0] != '\0') {
+        models = s.ArgText(1);
+    }
+}
+
+void PhonemeRecognizer::WriteParameters(std::ostream& out) const {
+    out << "    minimum " << minimum << "\n";
+    out << "    speed " << kSpeedNames[speed] << "\n";
+    out << "    threads " << threads << "\n";
+    // The folder is quoted, so that one with blanks reads back whole.
+    out << "    models \"" << models << "\"\n";
+}
+
+namespace {
+void step_changed(void* r, int frames) {
+    static_cast<CueRecognizer*>(r)->step = CueTime::FromFrames(frames);
+}
+void minimum_changed(void* r, int steps) {
+    static_cast<PhonemeRecognizer*>(r)->minimum = std::clamp(steps, 1, 10);
+}
+void speed_changed(void* r, int index) {
+    static_cast<PhonemeRecognizer*>(r)->speed = PhoneDecoder::Effort(std::clamp(index, 0, 2));
+}
+}  // namespace
+
+void PhonemeRecognizer::UpdatePanel() {
+    CueChirrup::CreateIntSlider(this, "step", 1, 10, std::max(1, int(step.Frames() + 0.5)),
+                                step_changed);
+    CueChirrup::CreateIntSlider(this, "minimum", 1, kMaximumMinimum, minimum, minimum_changed);
+    CueChirrup::CreateOption(this, "speed", 3, kSpeedNames, int(speed), speed_changed);
+}
+
+int PhonemeRecognizer::thread_count() const {
+    if (threads > 0)
+        return threads;
+    const unsigned cores = std::thread::hardware_concurrency();
+    return int(std::clamp(cores, 1u, unsigned(kMaximumThreads)));
+}
+
+bool PhonemeRecognizer::ready_decoders(size_t count) {
+    if (decoderModels_ != models || decoderSpeed_ != speed) {
+        decoders_.clear();
+        decoderModels_ = models;
+        decoderSpeed_ = speed;
+    }
+    if (decoders_.empty() && !PhoneDecoder::ModelLoads(models))
+        return false;
+    while (decoders_.size() < count) {
+        auto decoder = std::make_unique<PhoneDecoder>(models, speed);
+        if (!decoder->Ready())
+            return false;
+        decoders_.push_back(std::move(decoder));
+    }
+    return true;
+}
+
+bool PhonemeRecognizer::Recognize(const CueSound& sound) {
+    results.clear();
+    // Nothing may leave the plug-in: a failure of any kind is reported here.
+    try {
+        return recognize(sound);
+    } catch (const std::exception& e) {
+        KLWarning("Recognizer [%s] failed: %s\n", Name(), e.what());
+    } catch (...) {
+        KLWarning("Recognizer [%s] failed.\n", Name());
+    }
+    results.clear();
+    return false;
+}
+
+namespace {
+// The RMS level in dBFS of each step of 16 kHz samples.
+std::vector<double> step_levels(const std::vector<int16_t>& samples, double stepSeconds,
+                                long count) {
+    std::vector<double> levels;
+    levels.reserve(size_t(count));
+    const double perStep = stepSeconds * 16000.0;
+    for (long i = 0; i < count; ++i) {
+        const size_t begin = std::min(samples.size(), size_t(std::lround(i * perStep)));
+        const size_t end = std::min(samples.size(), size_t(std::lround((i + 1) * perStep)));
+        double sum = 0.0;
+        for (size_t j = begin; j < end; ++j)
+            sum += double(samples[j]) * samples[j];
+        const double rms = end > begin ? std::sqrt(sum / double(end - begin)) / 32768.0 : 0.0;
+        levels.push_back(rms > 1e-9 ? 20.0 * std::log10(rms) : -180.0);
+    }
+    return levels;
+}
+}  // namespace
+
+bool PhonemeRecognizer::recognize(const CueSound& sound) {
+    if (!sound.Valid() || step <= CueTime())
+        return false;
+    const std::string missing = PhoneDecoder::MissingFile(models);
+    if (!missing.empty()) {
+        KLWarning(
+            "Recognizer [%s] cannot run: its speech model file [%s] is missing (install "
+            "pocketsphinx-en-us, or name the model folder with \"models DIR\" in its "
+            "settings).\n",
+            Name(), missing.c_str());
+        return false;
+    }
+    std::vector<int16_t> samples;
+    if (!Resample16k(sound, samples)) {
+        KLWarning("Recognizer [%s] cannot convert the sound's rate of %g Hz.\n", Name(),
+                  sound.Rate());
+        return false;
+    }
+    const std::vector<PauseSplitter::Piece> pieces = PauseSplitter().Split(samples);
+    const size_t workers = std::min(pieces.size(), size_t(thread_count()));
+    if (!ready_decoders(std::max<size_t>(workers, 1))) {
+        KLWarning("Recognizer [%s] could not start its speech decoder with the model in [%s].\n",
+                  Name(), models.c_str());
+        return false;
+    }
+
+    // Workers take pieces in order; this thread reports progress until all are done.
+    std::vector<std::vector<PhoneTimeline::Segment>> found(pieces.size());
+    std::atomic<size_t> next{0};
+    std::atomic<long> samplesDone{0};
+    std::atomic<bool> failed{false};
+    std::mutex mutex;
+    std::condition_variable finished;
+    size_t running = workers;
+    auto work = [&](PhoneDecoder* decoder) {
+        for (size_t i; (i = next++) < pieces.size() && !failed;) {
+            if (!decoder->Decode(samples, pieces[i].begin, pieces[i].end, found[i]))
+                failed = true;
+            samplesDone += pieces[i].end - pieces[i].begin;
+        }
+        std::lock_guard<std::mutex> lock(mutex);
+        --running;
+        finished.notify_all();
+    };
+    std::vector<std::thread> pool;
+    try {
+        for (size_t w = 0; w < workers; ++w)
+            pool.emplace_back(work, decoders_[w].get());
+    } catch (...) {
+        // No thread may be left running when the pool goes.
+        failed = true;
+        for (std::thread& t : pool)
+            t.join();
+        throw;
+    }
+    {
+        std::lock_guard<std::mutex> lock(mutex);
+        running = pool.size();
+    }
+    {
+        std::unique_lock<std::mutex> lock(mutex);
+        while (!finished.wait_for(lock, std::chrono::milliseconds(100),
+                                  [&] { return running == 0; })) {
+            lock.unlock();
+            CueChirrup::Progress(this, float(samplesDone) / float(samples.size()));
+            lock.lock();
+        }
+    }
+    for (std::thread& t : pool)
+        t.join();
+    if (failed) {
+        KLWarning("Recognizer [%s]: the speech decoder failed.\n", Name());
+        return false;
+    }
+
+    std::vector<PhoneTimeline::Segment> segments;
+    for (const auto& piece : found)
+        segments.insert(segments.end(), piece.begin(), piece.end());
+    const double stepSeconds = step.Seconds();
+    const long count = PhoneTimeline::StepCount(sound.FrameCount() / sound.Rate(), stepSeconds);
+    std::vector<int> perStep =
+        PhoneTimeline::StepTargets(segments, stepSeconds, count, PhoneSet::kSilence);
+    PhoneTimeline::SilenceQuietSteps(perStep, step_levels(samples, stepSeconds, count), kQuietLevel,
+                                     PhoneSet::kSilence);
+    PhoneTimeline::AbsorbShortRuns(perStep, minimum);
+    results.reserve(perStep.size());
+    for (int t : perStep)
+        results.push_back({targets[size_t(t)].keyShapeIndex, t});
+    return true;
+}

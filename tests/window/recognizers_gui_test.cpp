@@ -1,0 +1,401 @@
+// Recognizers in the window: the menu and panels built from the shipped plug-ins, the
+// plug-ins' sliders and option menu and the messages for unknown ones, "Recognize" on the
+// demo filling the mouth track, and the link dialog driven through real input.
+#include <gtest/gtest.h>
+
+#include <Xm/List.h>
+#include <Xm/RowColumn.h>
+#include <Xm/Scale.h>
+#include <Xm/Xm.h>
+
+#include <chrono>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <map>
+#include <sstream>
+#include <string>
+
+#include "chart/KLSyncChart.h"
+#include "guitest/GuiTest.h"
+#include "model/KLKeyEvent.h"
+#include "model/KLKeySet.h"
+#include "model/KLKeyTrack.h"
+#include "toolkit/CueChirrup.h"
+#include "toolkit/CueRecognizer.h"
+#include "toolkit/CueSound.h"
+#include "toolkit/xm/KLAlert.h"
+#include "window/Gnome.h"
+#include "window/WindowTestUtil.h"
+#include "workspace/Imp.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+// The shipped plug-ins, and no sound device, before the window scans for them.
+const bool kEnvironment = [] {
+    setenv("TESSEL_PLUGIN_PATH", CHIRRUP_BINARY_DIR "/lib/chirrup/plugins", 1);
+    setenv("SDL_AUDIODRIVER", "dummy", 1);
+    return true;
+}();
+
+Widget W(const char* name) {
+    return KLXmGnome::FindWidget(name);
+}
+// A widget of the link dialog (other dialogs use some of the same names).
+Widget L(const char* name) {
+    return XtNameToWidget(KLXmGnome::FindWidget("linkDialog"), (std::string("*") + name).c_str());
+}
+
+std::string label_of(Widget w) {
+    XmString s = nullptr;
+    XtVaGetValues(w, XmNlabelString, &s, nullptr);
+    char* text = nullptr;
+    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+    std::string out = text ? text : "";
+    XtFree(text);
+    XmStringFree(s);
+    return out;
+}
+
+// The character set item `position` (1-based) of a list is written in.
+std::string charset_of(Widget list, int position) {
+    XmStringTable items = nullptr;
+    XtVaGetValues(list, XmNitems, &items, nullptr);
+    for (const char* tag : {"charset1", "charset2"}) {
+        char* text = nullptr;
+        if (XmStringGetLtoR(items[position - 1], const_cast<char*>(tag), &text) && text) {
+            XtFree(text);
+            return tag;
+        }
+    }
+    return "";
+}
+
+// Brings a dialog's window to the top: with no window manager every dialog opens centred over
+// the main window, so panels and the link dialog cover each other.
+void raise(Widget dialog) {
+    Widget shell = XtParent(dialog);
+    if (shell && XtIsRealized(shell))
+        XRaiseWindow(XtDisplay(shell), XtWindow(shell));
+    guitest::Settle();
+}
+
+// Clicks item `position` of a list (scrolled into view first). A list takes two clicks
+// within the display's multi-click time as a double click, so a single click waits until
+// that time has passed since the list's last click.
+void click_item(Widget list, int position, bool twice = false) {
+    static std::map<Widget, std::chrono::steady_clock::time_point> lastClick;
+    const auto multiClick = std::chrono::milliseconds(XtGetMultiClickTime(XtDisplay(list)) + 50);
+    if (lastClick.count(list))
+        guitest::WaitFor(
+            [&] { return std::chrono::steady_clock::now() - lastClick[list] > multiClick; });
+    lastClick[list] = std::chrono::steady_clock::now();
+    XmListSetPos(list, position);
+    guitest::Settle();
+    Position x = 0, y = 0;
+    Dimension w = 0, h = 0;
+    ASSERT_TRUE(XmListPosToBounds(list, position, &x, &y, &w, &h));
+    if (twice)
+        guitest::DoubleClick(list, 1, x + 10, y + h / 2);
+    else
+        guitest::Click(list, 1, x + 10, y + h / 2);
+}
+
+class Recognizers : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        gnome = &windowtest::TheWindow();
+        project = windowtest::DemoProject();
+        if (!theImp.GetKeySet("mouth")) {
+            ASSERT_EQ(theImp.LoadKeyset((project + "/misc_data/demo.kset").c_str()), 1);
+        }
+        guitest::Settle();
+        mouth = theImp.GetKeySet("mouth");
+        ASSERT_TRUE(mouth);
+        gnome->SetActiveKeyset(0);
+    }
+    // Chooses Recognizer > `name` with the pointer.
+    void choose_from_menu(const char* name) {
+        guitest::Click(W("recognizer"));
+        Widget entry = nullptr;
+        ASSERT_TRUE(guitest::WaitFor([&] {
+            WidgetList children = nullptr;
+            Cardinal count = 0;
+            XtVaGetValues(W("recognizerMenu"), XmNchildren, &children, XmNnumChildren, &count,
+                          nullptr);
+            for (Cardinal i = 0; i < count; ++i)
+                if (label_of(children[i]) == name)
+                    entry = children[i];
+            return entry && windowtest::Viewable(entry);
+        }));
+        guitest::Click(entry);
+        guitest::Settle();
+    }
+    // Clicks a button of a recognizer's panel, the panel raised first.
+    void click_panel(const char* recognizer, const char* item) {
+        raise(XtParent(panel_item(recognizer, nullptr)));
+        guitest::Click(panel_item(recognizer, item));
+    }
+    Widget panel_item(const char* recognizer, const char* item) {
+        return gnome->find_recognizer_widget(recognizer, item, nullptr);
+    }
+    Gnome* gnome = nullptr;
+    std::string project;
+    KLKeySet* mouth = nullptr;
+};
+
+TEST_F(Recognizers, MenuAndPanelsComeFromThePlugins) {
+    EXPECT_STREQ(theImp.recognizers.HeadKey(), "Loudness");
+    EXPECT_STREQ(theImp.recognizers.NextKey("Loudness"), "Phoneme");
+    for (const char* name : {"Loudness", "Phoneme"}) {
+        Widget container = panel_item(name, nullptr);
+        ASSERT_TRUE(container) << name;
+        EXPECT_STREQ(XtName(container), "mid_rc");
+        EXPECT_EQ(XtName(XtParent(container)), std::string(name) + " Recognizer");
+        const int positions[3][2] = {{1, 5}, {6, 10}, {11, 15}};
+        const char* labels[] = {"Configure", "Recognize", "Dismiss"};
+        for (int i = 0; i < 3; ++i) {
+            Widget b = panel_item(name, labels[i]);
+            ASSERT_TRUE(b);
+            EXPECT_EQ(label_of(b), labels[i]);
+            int left = 0, right = 0;
+            XtVaGetValues(b, XmNleftPosition, &left, XmNrightPosition, &right, nullptr);
+            EXPECT_EQ(left, positions[i][0]);
+            EXPECT_EQ(right, positions[i][1]);
+        }
+    }
+    EXPECT_EQ(panel_item("Nobody", nullptr), nullptr);
+}
+
+TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
+    ASSERT_EQ(theImp.LoadSound((project + "/misc_data/dialogue.aiff").c_str()), 1);
+    // The chart shows the mouth's track over the whole dialogue.
+    KLSyncChart* chart = gnome->syncChart;
+    ASSERT_TRUE(chart);
+    chart->SetSound(theImp.sound.get());
+    chart->SetKeyTrack(theImp.GetKeyTrack(0));
+    chart->SetUserDuration(CueTime::FromSeconds(theImp.sound->Length()));
+    chart->ZoomReset();
+    choose_from_menu("Phoneme");
+    CueRecognizer* r = mouth->GetRecognizer("Phoneme");
+    ASSERT_TRUE(r);
+    EXPECT_EQ(r->shown, 1);
+    Widget container = panel_item("Phoneme", nullptr);
+    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
+    EXPECT_EQ(label_of(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
+    EXPECT_EQ(label_of(panel_item("Phoneme", "value-step")), "     1 ");
+    EXPECT_EQ(label_of(panel_item("Phoneme", "value-minimum")), "     2 ");
+    ASSERT_TRUE(panel_item("Phoneme", "speed"));
+    EXPECT_TRUE(XtIsSensitive(panel_item("Phoneme", "Recognize"))) << "every phone is linked";
+
+    // A click in the trough right of the slider moves it one step up.
+    raise(XtParent(container));
+    Widget minimum = panel_item("Phoneme", "minimum");
+    Dimension width = 0;
+    XtVaGetValues(minimum, XmNwidth, &width, nullptr);
+    guitest::Click(minimum, 1, width - 4, -1);
+    ASSERT_TRUE(guitest::WaitFor(
+        [&] { return label_of(panel_item("Phoneme", "value-minimum")) == "     3 "; }));
+    std::ostringstream settings;
+    r->WriteSettings(settings);
+    EXPECT_NE(settings.str().find("    minimum 3\n"), std::string::npos) << settings.str();
+    // Setting a slider from the program moves it and its label, and tells the plug-in
+    // nothing: it set the value itself.
+    EXPECT_EQ(CueChirrup::SetIntSlider(r, "minimum", 2), 1);
+    EXPECT_EQ(label_of(panel_item("Phoneme", "value-minimum")), "     2 ");
+    std::istringstream back("minimum 2\nend\n");
+    r->ReadSettings(back);
+
+    // Recognize over the whole sound (no region: the visible span).
+    KLKeyTrack* track = theImp.GetKeyTrack(0);
+    ASSERT_TRUE(track);
+    click_panel("Phoneme", "Recognize");
+    ASSERT_TRUE(guitest::WaitFor([&] { return track->events.Count() > 10; }, 30.0));
+    guitest::Settle();
+    EXPECT_FALSE(windowtest::Viewable(gnome->informationAlert->GetDialog()));
+    // The pause between the sentences (0.833 s to 1.222 s) holds the rest shape.
+    const int rest = mouth->GetKeyShapeId("rest");
+    int restInPause = 0;
+    for (KLKeyEvent* e = track->events.Head(); e; e = track->events.Next(e))
+        restInPause += e->time.Seconds() > 0.8 && e->time.Seconds() < 1.3 && e->shapeIndex == rest;
+    EXPECT_GE(restInPause, 1);
+    guitest::Screenshot("window-phoneme-recognized");
+
+    click_panel("Phoneme", "Dismiss");
+    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(container); }));
+    EXPECT_EQ(r->shown, 0);
+}
+
+// Loudness's sliders with their value labels, and the messages for controls that are not
+// there.
+TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
+    choose_from_menu("Loudness");
+    CueRecognizer* r = mouth->GetRecognizer("Loudness");
+    ASSERT_TRUE(r);
+    ASSERT_TRUE(
+        guitest::WaitFor([&] { return windowtest::Viewable(panel_item("Loudness", nullptr)); }));
+    EXPECT_EQ(label_of(panel_item("Loudness", "value-step")), "     1 ");
+    EXPECT_EQ(label_of(panel_item("Loudness", "value-half")), " -36.000");
+    EXPECT_EQ(label_of(panel_item("Loudness", "value-open")), " -24.000");
+    EXPECT_FALSE(XtIsSensitive(panel_item("Loudness", "Recognize"))) << "nothing is linked";
+    // A second Create only sets the value and says so by returning 0.
+    EXPECT_EQ(CueChirrup::CreateFloatSlider(r, "half", -60, -1, -40.5f, nullptr), 0);
+    EXPECT_EQ(label_of(panel_item("Loudness", "value-half")), " -40.500");
+
+    ::testing::internal::CaptureStderr();
+    EXPECT_EQ(CueChirrup::SetIntSlider(r, "loudness", 3), 0);
+    EXPECT_EQ(CueChirrup::SetFloatSlider(r, "gain", 3.0f), 0);
+    EXPECT_EQ(CueChirrup::SetOption(r, "colour", 1), 0);
+    struct Stranger : CueRecognizer {
+        Stranger() : CueRecognizer("Stranger") {}
+        bool Recognize(const CueSound&) override { return false; }
+        CueRecognizer* Clone() const override { return new Stranger; }
+    } stranger;
+    EXPECT_EQ(CueChirrup::CreateIntSlider(&stranger, "step", 1, 5, 2, nullptr), 0);
+    const std::string err = ::testing::internal::GetCapturedStderr();
+    EXPECT_NE(err.find("Couldn't find slider loudness"), std::string::npos) << err;
+    EXPECT_NE(err.find("Couldn't find slider gain"), std::string::npos) << err;
+    EXPECT_NE(err.find("Couldn't find option colour"), std::string::npos) << err;
+    EXPECT_NE(err.find("Couldn't find widget Stranger"), std::string::npos) << err;
+    click_panel("Loudness", "Dismiss");
+}
+
+// The link dialog through the pointer: select, link by button and by double click, nothing
+// without a key shape, "Audition" only with a sound, the linked style, and the links saved.
+TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
+    choose_from_menu("Loudness");
+    CueRecognizer* r = mouth->GetRecognizer("Loudness");
+    ASSERT_TRUE(r);
+    for (auto& t : r->targets)
+        t.keyShapeIndex = -1;
+    gnome->ShowRecognizerGui(r);
+    click_panel("Loudness", "Configure");
+    Widget dialog = W("linkDialog");
+    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(dialog); }));
+    raise(dialog);
+    Widget targets = L("targetLister");
+    Widget shapes = L("keyshapeLister");
+    int count = 0;
+    XtVaGetValues(targets, XmNitemCount, &count, nullptr);
+    ASSERT_EQ(count, 3);
+    XtVaGetValues(shapes, XmNitemCount, &count, nullptr);
+    ASSERT_EQ(count, mouth->keyShapeCount);
+    EXPECT_EQ(charset_of(targets, 1), "charset2");
+
+    // Select "closed" and "rest", press "Link".
+    click_item(targets, 1);
+    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "closed"; }));
+    EXPECT_FALSE(XtIsSensitive(L("audition_button"))) << "Loudness's targets have no sound";
+    click_item(shapes, mouth->GetKeyShapeId("rest") + 1);
+    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("keyshapeLabel")) == "rest"; }));
+    guitest::Click(L("link_button"));
+    ASSERT_TRUE(guitest::WaitFor([&] { return r->FindTarget("closed")->keyShapeIndex >= 0; }));
+    EXPECT_EQ(r->FindTarget("closed")->keyShapeIndex, mouth->GetKeyShapeId("rest"));
+    EXPECT_EQ(charset_of(targets, 1), "charset1");
+    EXPECT_EQ(charset_of(targets, 2), "charset2");
+    raise(dialog);
+
+    // "half", then a double click on "E" links them.
+    click_item(targets, 2);
+    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "half"; }));
+    click_item(shapes, mouth->GetKeyShapeId("E") + 1, true);
+    ASSERT_TRUE(guitest::WaitFor([&] { return r->FindTarget("half")->keyShapeIndex >= 0; }));
+    EXPECT_EQ(r->FindTarget("half")->keyShapeIndex, mouth->GetKeyShapeId("E"));
+    raise(dialog);
+
+    // Selecting a linked target selects its key shape; with none selected, "Link" does nothing.
+    click_item(targets, 1);
+    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "closed"; }))
+        << label_of(L("targetLabel"));
+    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("keyshapeLabel")) == "rest"; }))
+        << label_of(L("keyshapeLabel"));
+    click_item(targets, 3);
+    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "open"; }));
+    XmListDeselectAllItems(shapes);
+    raise(dialog);
+    guitest::Click(L("link_button"));
+    guitest::Settle();
+    EXPECT_EQ(r->FindTarget("open")->keyShapeIndex, -1);
+    EXPECT_FALSE(XtIsSensitive(panel_item("Loudness", "Recognize")));
+    guitest::Screenshot("window-link-dialog");
+
+    // Saved with the keyset and read back.
+    const std::string saved = project + "/misc_data/linked.kset";
+    ASSERT_EQ(theImp.SaveKeyset(saved.c_str()), 1);
+    std::ifstream in(saved);
+    std::stringstream text;
+    text << in.rdbuf();
+    EXPECT_NE(text.str().find("begin recognizer-links Loudness mouth\n    link closed to rest\n"
+                              "    link half to E\nend\n"),
+              std::string::npos)
+        << text.str();
+    raise(dialog);
+    guitest::Click(L("done_button"));
+    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(dialog); }));
+    click_panel("Loudness", "Dismiss");
+}
+
+// The Phoneme recognizer's targets have their samples: "Audition" comes alive.
+TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
+    choose_from_menu("Phoneme");
+    CueRecognizer* r = mouth->GetRecognizer("Phoneme");
+    ASSERT_TRUE(r);
+    click_panel("Phoneme", "Configure");
+    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(W("linkDialog")); }));
+    raise(W("linkDialog"));
+    Widget targets = L("targetLister");
+    click_item(targets, r->TargetIndex("OW") + 1);
+    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "OW"; }));
+    EXPECT_TRUE(XtIsSensitive(L("audition_button")));
+    EXPECT_EQ(label_of(L("keyshapeLabel")), "O") << "the demo links OW to O";
+    guitest::Click(L("audition_button"));
+    guitest::Settle();
+    guitest::Click(L("done_button"));
+    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(W("linkDialog")); }));
+    click_panel("Phoneme", "Dismiss");
+}
+
+// A keyset without the recognizer hides its panel; coming back shows it again for the keyset.
+TEST_F(Recognizers, KeysetSwitchesHideAndShowPanels) {
+    choose_from_menu("Phoneme");
+    Widget container = panel_item("Phoneme", nullptr);
+    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
+    ASSERT_GE(theImp.keysetCount, 2);
+    ASSERT_EQ(theImp.GetKeySet(1)->GetRecognizer("Phoneme"), nullptr);
+    gnome->SetActiveKeyset(1);
+    gnome->update_recognizer_dialogs();
+    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(container); }));
+    EXPECT_EQ(mouth->GetRecognizer("Phoneme")->shown, 1) << "still wanted on the mouth";
+    gnome->SetActiveKeyset(0);
+    gnome->update_recognizer_dialogs();
+    EXPECT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
+    EXPECT_EQ(label_of(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
+    click_panel("Phoneme", "Dismiss");
+}
+
+// A menu entry whose plug-in cannot make a recognizer says so and adds nothing.
+TEST_F(Recognizers, UnknownRecognizerIsReported) {
+    KLAlert* alert = gnome->attentionAlert.get();
+    std::string told;
+    windowtest::AnswerScript script({[&] {
+        if (!alert->Waiting() || !windowtest::Viewable(alert->Button(0)))
+            return false;
+        XmString s = nullptr;
+        XtVaGetValues(alert->GetDialog(), XmNmessageString, &s, nullptr);
+        char* text = nullptr;
+        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+        told = text ? text : "";
+        XtFree(text);
+        XmStringFree(s);
+        return windowtest::ClickWhenViewable(alert->Button(0));
+    }});
+    const size_t before = mouth->recognizers.size();
+    Gnome::create_recognize_cb(nullptr, const_cast<char*>("Vowel"), nullptr);
+    EXPECT_TRUE(script.Finished());
+    EXPECT_EQ(told, "Failed to locate plug-in recognizer [Vowel].");
+    EXPECT_EQ(mouth->recognizers.size(), before);
+}
+
+}  // namespace

@@ -1,0 +1,509 @@
+// The shipped Phoneme recognizer plug-in: recognition of the demo dialogue, its settings, its
+// report when the speech model is missing, awkward sounds; and the pure parts it is built
+// from (the step timeline and the pause splitter), compiled into this test.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <filesystem>
+#include <memory>
+#include <random>
+#include <sstream>
+
+#include "WorkspaceTestUtil.h"
+#include "phoneme/PauseSplitter.h"
+#include "phoneme/PhoneTimeline.h"
+#include "toolkit/CueChirrup.h"
+#include "toolkit/CueRecognizerCatalog.h"
+#include "toolkit/CueSound.h"
+
+using namespace wstest;
+using ::testing::ElementsAre;
+using ::testing::ElementsAreArray;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+
+namespace {
+
+const std::string kPlugin = CHIRRUP_BINARY_DIR "/lib/chirrup/plugins/Phoneme.so";
+const std::string kDialogue = CHIRRUP_SOURCE_DIR "/resources/demo/dialogue.aiff";
+
+std::string written(const CueRecognizer& r) {
+    std::ostringstream out;
+    r.WriteSettings(out);
+    return out.str();
+}
+bool read(CueRecognizer& r, const std::string& text) {
+    std::istringstream in(text);
+    return r.GuardedReadSettings(in);
+}
+// The recognised targets' names with repeats collapsed: "SIL L OW SIL ...".
+std::vector<std::string> phones(const CueRecognizer& r) {
+    std::vector<std::string> out;
+    for (const auto& result : r.results) {
+        const std::string& name = r.targets[size_t(result.targetIndex)].name;
+        if (out.empty() || out.back() != name)
+            out.push_back(name);
+    }
+    return out;
+}
+std::string name_at(const CueRecognizer& r, size_t i) {
+    return r.targets[size_t(r.results.at(i).targetIndex)].name;
+}
+// True when `wanted` occurs in `seen` in order, other phones between them allowed.
+bool in_order(const std::vector<std::string>& seen, const std::vector<std::string>& wanted) {
+    auto at = seen.begin();
+    for (const std::string& w : wanted) {
+        at = std::find(at, seen.end(), w);
+        if (at == seen.end())
+            return false;
+        ++at;
+    }
+    return true;
+}
+std::string joined(const std::vector<std::string>& v) {
+    std::string out;
+    for (const auto& s : v)
+        out += s + " ";
+    return out;
+}
+// Steps of one frame at 30 frames per second that cover `sound`.
+long frames_of(const CueSound& sound) {
+    return PhoneTimeline::StepCount(sound.FrameCount() / sound.Rate(), 1.0 / 30);
+}
+
+class PhonemePlugin : public ::testing::Test {
+  protected:
+    static void SetUpTestSuite() {
+        catalog_ = new CueRecognizerCatalog;
+        ASSERT_TRUE(catalog_->LoadPlugin(kPlugin.c_str()));
+        ASSERT_TRUE(catalog_->LoadPlugin(CHIRRUP_BINARY_DIR "/lib/chirrup/plugins/Loudness.so"));
+        dialogue_ = new CueSound(kDialogue.c_str());
+        ASSERT_TRUE(dialogue_->Valid()) << dialogue_->ErrorText();
+    }
+    static void TearDownTestSuite() {
+        delete dialogue_;
+        delete catalog_;
+    }
+    void SetUp() override {
+        r.reset(catalog_->FetchRecognizer("Phoneme"));
+        ASSERT_TRUE(r);
+    }
+    static CueRecognizerCatalog* catalog_;
+    static CueSound* dialogue_;
+    Reports reports;
+    std::unique_ptr<CueRecognizer> r;
+};
+CueRecognizerCatalog* PhonemePlugin::catalog_ = nullptr;
+CueSound* PhonemePlugin::dialogue_ = nullptr;
+
+// Phones of "Hello there. Would you like some fresh mushroom soup?" that the recognizer
+// finds, in order, where the synthetic voice makes them plain; "SIL" is the pause between
+// the sentences (0.833 s to 1.222 s) and the silence after the last word.
+const std::vector<std::string> kDialoguePhones = {"L", "OW", "SIL", "W",  "S",  "M",
+                                                  "S", "UW", "S",   "UW", "SIL"};
+
+TEST_F(PhonemePlugin, FindsTheDemoDialoguesPhonesInOrderOneResultPerFrame) {
+    ASSERT_TRUE(r->GuardedRecognize(*dialogue_)) << reports.text;
+    ASSERT_EQ(long(r->results.size()), frames_of(*dialogue_));
+    EXPECT_EQ(r->results.size(), 115u);  // 3.815 s at 30 frames per second
+    EXPECT_EQ(name_at(*r, 30), "SIL") << "1.0 s lies in the pause";
+    EXPECT_EQ(name_at(*r, r->results.size() - 1), "SIL");
+    EXPECT_TRUE(in_order(phones(*r), kDialoguePhones)) << joined(phones(*r));
+    EXPECT_THAT(reports.text, IsEmpty());
+
+    // The dialogue's first word starts after 12 ms; with half a second of silence before it
+    // the first results are silence too, and everything else moves by 15 frames.
+    const std::vector<std::string> unpadded = phones(*r);
+    std::vector<float> padded(11025, 0.0f);
+    padded.insert(padded.end(), dialogue_->Channel(0).begin(), dialogue_->Channel(0).end());
+    ASSERT_TRUE(r->GuardedRecognize(*CueSound::FromSamples({padded}, dialogue_->Rate())));
+    EXPECT_EQ(r->results.size(), 130u);
+    for (size_t i = 0; i < 12; ++i)
+        EXPECT_EQ(name_at(*r, i), "SIL") << i;
+    EXPECT_EQ(name_at(*r, 45), "SIL") << "1.0 s into the dialogue";
+    EXPECT_TRUE(in_order(phones(*r), kDialoguePhones)) << joined(phones(*r));
+}
+
+TEST_F(PhonemePlugin, StepMinimumAndThreadsShapeTheResults) {
+    ASSERT_TRUE(read(*r, "step 2\nminimum 1\nend\n"));
+    ASSERT_TRUE(r->GuardedRecognize(*dialogue_));
+    EXPECT_EQ(r->results.size(), 58u) << "ceil(114.46 / 2)";
+
+    ASSERT_TRUE(read(*r, "step 1\nminimum 1\nend\n"));
+    ASSERT_TRUE(r->GuardedRecognize(*dialogue_));
+    const auto unsmoothed = r->results;
+    ASSERT_TRUE(read(*r, "minimum 3\nend\n"));
+    ASSERT_TRUE(r->GuardedRecognize(*dialogue_));
+    ASSERT_EQ(r->results.size(), unsmoothed.size());
+    size_t run = 1, shortest = r->results.size();
+    for (size_t i = 1; i <= r->results.size(); ++i) {
+        if (i < r->results.size() && r->results[i].targetIndex == r->results[i - 1].targetIndex) {
+            ++run;
+        } else {
+            shortest = std::min(shortest, run);
+            run = 1;
+        }
+    }
+    EXPECT_GE(shortest, 3u);
+
+    // Four copies of the dialogue (15 s), cut at a pause: one decoder or two, the same results.
+    std::vector<float> four = dialogue_->Channel(0);
+    for (int copy = 0; copy < 3; ++copy)
+        four.insert(four.end(), dialogue_->Channel(0).begin(), dialogue_->Channel(0).end());
+    auto both = CueSound::FromSamples({four}, dialogue_->Rate());
+    ASSERT_TRUE(read(*r, "threads 1\nend\n"));
+    ASSERT_TRUE(r->GuardedRecognize(*both));
+    const std::vector<std::string> alone = phones(*r);
+    ASSERT_TRUE(read(*r, "threads 2\nend\n"));
+    ASSERT_TRUE(r->GuardedRecognize(*both));
+    EXPECT_EQ(phones(*r), alone);
+}
+
+TEST_F(PhonemePlugin, ResultsCarryTheTargetsLinks) {
+    r->FindTarget("SIL")->keyShapeIndex = 0;
+    r->FindTarget("OW")->keyShapeIndex = 3;
+    ASSERT_TRUE(r->GuardedRecognize(*dialogue_));
+    for (const auto& result : r->results)
+        EXPECT_EQ(result.shapeIndex, r->targets[size_t(result.targetIndex)].keyShapeIndex);
+    EXPECT_FALSE(r->Configured()) << "38 phones are not linked";
+}
+
+TEST_F(PhonemePlugin, HasAPhoneTargetPerModelPhoneAndASampleToAuditionEach) {
+    ASSERT_EQ(r->targets.size(), 40u);
+    EXPECT_EQ(r->targets.front().name, "AA");
+    EXPECT_EQ(r->targets.back().name, "SIL");
+    for (const auto& t : r->targets) {
+        EXPECT_TRUE(FileExists(t.soundFile)) << t.name << ": " << t.soundFile;
+        CueSound sample(t.soundFile.c_str());
+        EXPECT_TRUE(sample.Valid() && sample.Length() > 0.1f) << t.soundFile;
+    }
+}
+
+TEST_F(PhonemePlugin, SettingsRoundTripAndRefuseNonsense) {
+    const std::string defaults = written(*r);
+    EXPECT_THAT(defaults, HasSubstr("    step 1\n    target AA sound "));
+    EXPECT_THAT(defaults, HasSubstr("/Phoneme-samples/SIL.wav\n"
+                                    "    minimum 2\n    speed fast\n    threads 0\n"
+                                    "    models \"/usr/share/pocketsphinx/model/en-us\"\n"));
+    const std::string settings =
+        "    step 2\n    target AA picture aa.sgi sound aa.wav\n    minimum 4\n"
+        "    speed accurate\n    threads 1\n    models \"/opt/my models\"\n";
+    ASSERT_TRUE(read(*r, settings + "end\n"));
+    const std::string text = written(*r);
+    EXPECT_THAT(text, HasSubstr("    step 2\n    target AA picture aa.sgi sound aa.wav\n"));
+    EXPECT_THAT(text, HasSubstr("    minimum 4\n    speed accurate\n    threads 1\n"
+                                "    models \"/opt/my models\"\n"));
+    std::unique_ptr<CueRecognizer> copy(r->GuardedClone());
+    ASSERT_TRUE(read(*copy, text + "end\n"));
+    EXPECT_EQ(written(*copy), text);
+
+    ASSERT_TRUE(read(*r,
+                     "minimum 0\nminimum 11\nminimum\nspeed warp\nthreads -1\nthreads 99\n"
+                     "models \"\"\nspeed fast slow\nend\n"));
+    EXPECT_EQ(written(*r), text) << "out-of-range values leave the settings as they were";
+    ASSERT_TRUE(r->GuardedResetSettings());
+    EXPECT_EQ(written(*r), defaults);
+}
+
+TEST_F(PhonemePlugin, MissingModelFilesAreReportedAndNothingIsRecognised) {
+    TempDir dir;
+    ASSERT_TRUE(read(*r, "models " + dir.path() + "\nend\n"));
+    EXPECT_FALSE(r->GuardedRecognize(*dialogue_));
+    EXPECT_THAT(r->results, IsEmpty());
+    EXPECT_THAT(reports.text,
+                HasSubstr("Recognizer [Phoneme] cannot run: its speech model file [" + dir.path() +
+                          "/en-us/mdef] is missing (install pocketsphinx-en-us"));
+    // A model folder with every file present but unreadable ones: the decoder cannot start.
+    for (const char* f :
+         {"en-us/mdef", "en-us/feat.params", "en-us/means", "en-us/variances", "en-us/sendump",
+          "en-us/transition_matrices", "en-us/noisedict", "en-us-phone.lm.bin"}) {
+        std::filesystem::create_directories(std::filesystem::path(dir / f).parent_path());
+        WriteFile(dir / f, "not a model\n");
+    }
+    reports.text.clear();
+    EXPECT_FALSE(r->GuardedRecognize(*dialogue_));
+    EXPECT_THAT(reports.text, HasSubstr("Recognizer [Phoneme] could not start its speech decoder "
+                                        "with the model in [" +
+                                        dir.path() + "]."));
+}
+
+// Sounds that are not speech, or not as the model expects it.
+struct OddSound {
+    const char* name;
+    std::function<std::unique_ptr<CueSound>(const CueSound& dialogue)> make;
+    std::vector<std::string> phones;  // phones to be found in order; none: all silence
+};
+
+std::vector<float> noise(size_t count, float level) {
+    std::mt19937 random(7);
+    std::uniform_real_distribution<float> uniform(-level, level);
+    std::vector<float> out(count);
+    for (float& x : out)
+        x = uniform(random);
+    return out;
+}
+
+class PhonemeOddSounds : public PhonemePlugin, public ::testing::WithParamInterface<OddSound> {};
+
+TEST_P(PhonemeOddSounds, GiveOneResultPerStepAndFindWhatIsThere) {
+    const std::unique_ptr<CueSound> sound = GetParam().make(*dialogue_);
+    ASSERT_TRUE(sound && sound->Valid());
+    ASSERT_TRUE(r->GuardedRecognize(*sound)) << reports.text;
+    EXPECT_EQ(long(r->results.size()), frames_of(*sound));
+    if (!GetParam().phones.empty()) {
+        EXPECT_TRUE(in_order(phones(*r), GetParam().phones)) << joined(phones(*r));
+    }
+    EXPECT_THAT(reports.text, IsEmpty());
+}
+
+TEST_F(PhonemePlugin, HearsNothingInSilence) {
+    ASSERT_TRUE(
+        r->GuardedRecognize(*CueSound::FromSamples({std::vector<float>(32000, 0.0f)}, 16000)));
+    EXPECT_EQ(r->results.size(), 60u);
+    EXPECT_THAT(phones(*r), ElementsAre("SIL"));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Sounds, PhonemeOddSounds,
+    ::testing::Values(
+        OddSound{"WhiteNoise",
+                 [](const CueSound&) { return CueSound::FromSamples({noise(44100, 0.5f)}, 22050); },
+                 {}},
+        OddSound{"TenthOfASecond",
+                 [](const CueSound& d) {
+                     auto s = d.Copy();
+                     s->Trim(0.2, 0.3);
+                     return s;
+                 },
+                 {}},
+        OddSound{"OneSample",
+                 [](const CueSound&) { return CueSound::FromSamples({{0.5f}}, 16000); },
+                 {}},
+        OddSound{
+            "NoSamples", [](const CueSound&) { return CueSound::FromSamples({{}}, 16000); }, {}},
+        // Telephone bandwidth loses the hiss of the fricatives, not the words' vowels.
+        OddSound{"At8kHz",
+                 [](const CueSound& d) { return CueSound::FromSamples({d.Resampled(8000)}, 8000); },
+                 {"L", "OW", "SIL", "M", "UW", "SIL"}},
+        OddSound{
+            "At96kHz",
+            [](const CueSound& d) { return CueSound::FromSamples({d.Resampled(96000)}, 96000); },
+            kDialoguePhones},
+        OddSound{"StereoWithOneSilentSide",
+                 [](const CueSound& d) {
+                     return CueSound::FromSamples(
+                         {d.Channel(0), std::vector<float>(d.Channel(0).size(), 0.0f)}, d.Rate());
+                 },
+                 kDialoguePhones}),
+    [](const auto& info) { return std::string(info.param.name); });
+
+TEST_F(PhonemePlugin, RefusesSoundsItCannotAnalyse) {
+    EXPECT_FALSE(r->GuardedRecognize(CueSound()));
+    r->step = CueTime();
+    EXPECT_FALSE(r->GuardedRecognize(*dialogue_));
+    EXPECT_THAT(r->results, IsEmpty());
+}
+
+// What a plug-in asks of the window's panel, and the progress it reports, through a host
+// that records the calls.
+class RecordingHost : public CueChirrupHost {
+  public:
+    struct Control {
+        std::string name;
+        float minimum, maximum, value;
+        IntCallback intCallback = nullptr;
+        FloatCallback floatCallback = nullptr;
+        OptionCallback optionCallback = nullptr;
+        std::vector<std::string> labels;
+    };
+    std::vector<Control> controls;
+    std::vector<float> progress;
+
+    int CreateFloatSlider(CueRecognizer*, const char* name, float minimum, float maximum,
+                          float value, FloatCallback callback) override {
+        controls.push_back({name, minimum, maximum, value});
+        controls.back().floatCallback = callback;
+        return 1;
+    }
+    int SetFloatSlider(CueRecognizer*, const char*, float) override { return 1; }
+    int CreateIntSlider(CueRecognizer*, const char* name, int minimum, int maximum, int value,
+                        IntCallback callback) override {
+        controls.push_back({name, float(minimum), float(maximum), float(value)});
+        controls.back().intCallback = callback;
+        return 1;
+    }
+    int SetIntSlider(CueRecognizer*, const char*, int) override { return 1; }
+    int CreateOption(CueRecognizer*, const char* name, int count, const char* const* labels,
+                     int value, OptionCallback callback) override {
+        controls.push_back({name, 0.0f, float(count - 1), float(value)});
+        controls.back().optionCallback = callback;
+        controls.back().labels.assign(labels, labels + count);
+        return 1;
+    }
+    int SetOption(CueRecognizer*, const char*, int) override { return 1; }
+    void Progress(CueRecognizer*, float done) override { progress.push_back(done); }
+};
+
+class PluginPanels : public PhonemePlugin {
+  protected:
+    void SetUp() override {
+        PhonemePlugin::SetUp();
+        previous = CueChirrup::SetHost(&host);
+    }
+    void TearDown() override { CueChirrup::SetHost(previous); }
+    RecordingHost host;
+    CueChirrupHost* previous = nullptr;
+};
+
+TEST_F(PluginPanels, PhonemeHasStepMinimumAndSpeedAndReportsProgress) {
+    r->UpdatePanel();
+    ASSERT_EQ(host.controls.size(), 3u);
+    EXPECT_EQ(host.controls[0].name, "step");
+    EXPECT_EQ(host.controls[0].value, 1.0f);
+    EXPECT_EQ(host.controls[1].name, "minimum");
+    EXPECT_EQ(host.controls[1].value, 2.0f);
+    EXPECT_EQ(host.controls[2].name, "speed");
+    EXPECT_THAT(host.controls[2].labels, ElementsAre("fast", "balanced", "accurate"));
+    host.controls[0].intCallback(r.get(), 3);
+    host.controls[1].intCallback(r.get(), 4);
+    host.controls[2].optionCallback(r.get(), 2);
+    const std::string text = written(*r);
+    EXPECT_THAT(text, HasSubstr("    step 3\n"));
+    EXPECT_THAT(text, HasSubstr("    minimum 4\n    speed accurate\n"));
+
+    // Half a minute of speech takes long enough to report progress on the way.
+    std::vector<float> long_speech;
+    while (long_speech.size() < size_t(30 * dialogue_->Rate()))
+        long_speech.insert(long_speech.end(), dialogue_->Channel(0).begin(),
+                           dialogue_->Channel(0).end());
+    ASSERT_TRUE(read(*r, "speed fast\nend\n"));
+    ASSERT_TRUE(r->GuardedRecognize(*CueSound::FromSamples({long_speech}, dialogue_->Rate())));
+    ASSERT_FALSE(host.progress.empty());
+    EXPECT_TRUE(std::is_sorted(host.progress.begin(), host.progress.end()));
+    EXPECT_GE(host.progress.front(), 0.0f);
+    EXPECT_LE(host.progress.back(), 1.0f);
+}
+
+TEST_F(PluginPanels, LoudnessSlidersKeepHalfBelowOpen) {
+    std::unique_ptr<CueRecognizer> loudness(catalog_->FetchRecognizer("Loudness"));
+    ASSERT_TRUE(loudness);
+    loudness->UpdatePanel();
+    ASSERT_EQ(host.controls.size(), 3u);
+    EXPECT_EQ(host.controls[0].name, "step");
+    EXPECT_EQ(host.controls[1].name, "half");
+    EXPECT_EQ(host.controls[1].value, -36.0f);
+    EXPECT_EQ(host.controls[2].name, "open");
+    EXPECT_EQ(host.controls[2].value, -24.0f);
+    host.controls[1].floatCallback(loudness.get(), -20.0f);  // past "open": it moves up
+    EXPECT_THAT(written(*loudness), HasSubstr("    levels -20 -19\n"));
+    host.controls[2].floatCallback(loudness.get(), -30.0f);  // below "half": it moves down
+    EXPECT_THAT(written(*loudness), HasSubstr("    levels -31 -30\n"));
+    host.controls[0].intCallback(loudness.get(), 5);
+    EXPECT_THAT(written(*loudness), HasSubstr("    step 5\n"));
+}
+
+// The pure parts.
+
+using Segment = PhoneTimeline::Segment;
+
+TEST(PhoneTimeline, StepsTakeTheSegmentCoveringMostOfThem) {
+    EXPECT_EQ(PhoneTimeline::StepCount(1.0, 0.25), 4);
+    EXPECT_EQ(PhoneTimeline::StepCount(1.01, 0.25), 5);
+    EXPECT_EQ(PhoneTimeline::StepCount(0.0, 0.25), 0);
+    EXPECT_EQ(PhoneTimeline::StepCount(1.0, 0.0), 0);
+    const std::vector<Segment> segments = {{1, 0.0, 0.3}, {2, 0.3, 0.45}, {3, 0.6, 5.0}};
+    // Steps of 0.25 s: [0, .25) all 1; [.25, .5) 1 for .05, 2 for .15; [.5, .75) 3 for .15;
+    // [.75, 1) 3; beyond the segments' end the count still holds.
+    EXPECT_THAT(PhoneTimeline::StepTargets(segments, 0.25, 4, 9), ElementsAre(1, 2, 3, 3));
+    EXPECT_THAT(PhoneTimeline::StepTargets({{1, 0.0, 0.1}}, 0.25, 3, 9), ElementsAre(1, 9, 9));
+    EXPECT_THAT(PhoneTimeline::StepTargets({{1, 0.5, 0.4}}, 0.25, 2, 9), ElementsAre(9, 9));
+}
+
+TEST(PhoneTimeline, QuietStepsAreSilence) {
+    std::vector<int> targets = {1, 2, 3, 4};
+    PhoneTimeline::SilenceQuietSteps(targets, {-20.0, -70.0, -60.0, -180.0}, -60.0, 9);
+    EXPECT_THAT(targets, ElementsAre(1, 9, 3, 9));
+}
+
+struct AbsorbCase {
+    std::vector<int> in;
+    int minimum;
+    std::vector<int> out;
+};
+class AbsorbShortRuns : public ::testing::TestWithParam<AbsorbCase> {};
+
+TEST_P(AbsorbShortRuns, JoinsShortRunsToTheLongerNeighbour) {
+    std::vector<int> targets = GetParam().in;
+    PhoneTimeline::AbsorbShortRuns(targets, GetParam().minimum);
+    EXPECT_THAT(targets, ElementsAreArray(GetParam().out));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Table, AbsorbShortRuns,
+    ::testing::Values(AbsorbCase{{}, 2, {}}, AbsorbCase{{5}, 3, {5}},
+                      AbsorbCase{{1, 1, 2, 1, 1}, 1, {1, 1, 2, 1, 1}},
+                      // A one-step flicker inside a run vanishes.
+                      AbsorbCase{{1, 1, 2, 1, 1}, 2, {1, 1, 1, 1, 1}},
+                      // The longer neighbour wins, the earlier one on a tie.
+                      AbsorbCase{{1, 1, 2, 3, 3, 3}, 2, {1, 1, 3, 3, 3, 3}},
+                      AbsorbCase{{1, 1, 2, 3, 3}, 2, {1, 1, 1, 3, 3}},
+                      // Short runs at the ends join their only neighbour.
+                      AbsorbCase{{2, 1, 1, 1, 3}, 2, {1, 1, 1, 1, 1}},
+                      // Two short runs side by side: both go, long runs keep their places.
+                      AbsorbCase{{1, 1, 1, 2, 3, 4, 4, 4}, 2, {1, 1, 1, 1, 1, 4, 4, 4}},
+                      // One-step runs go first, then two-step ones.
+                      AbsorbCase{{1, 2, 3}, 3, {2, 2, 2}},
+                      AbsorbCase{{1, 1, 2, 2, 3, 3, 3}, 3, {2, 2, 2, 2, 3, 3, 3}},
+                      AbsorbCase{{1, 1, 1, 2, 2, 3, 3, 3}, 3, {1, 1, 1, 1, 1, 3, 3, 3}}));
+
+std::vector<int16_t> tone(long samples, int16_t level) {
+    std::vector<int16_t> out(static_cast<size_t>(samples));
+    for (long i = 0; i < samples; ++i)
+        out[size_t(i)] = i % 2 ? level : int16_t(-level);
+    return out;
+}
+std::vector<int16_t> operator+(std::vector<int16_t> a, const std::vector<int16_t>& b) {
+    a.insert(a.end(), b.begin(), b.end());
+    return a;
+}
+
+TEST(PauseSplitter, CutsInTheMiddleOfPausesButNotAtTheEnds) {
+    // 0.5 s quiet, 1 s loud, 0.4 s quiet, 1 s loud, 0.1 s quiet (too short), 1 s loud, 1 s
+    // quiet: one cut, in the middle of the 0.4 s pause.
+    const auto samples = tone(8000, 0) + tone(16000, 8000) + tone(6400, 10) + tone(16000, 8000) +
+                         tone(1600, 0) + tone(16000, 8000) + tone(16000, 0);
+    EXPECT_EQ(PauseSplitter().Split(samples).size(), 1u) << "shorter than a piece";
+    PauseSplitter splitter;
+    splitter.shortestPiece = 0;
+    const auto pieces = splitter.Split(samples);
+    ASSERT_EQ(pieces.size(), 2u);
+    EXPECT_EQ(pieces[0].begin, 0);
+    EXPECT_EQ(pieces[0].end, 24000 + 3200);
+    EXPECT_EQ(pieces[1].begin, pieces[0].end);
+    EXPECT_EQ(pieces[1].end, long(samples.size()));
+}
+
+TEST(PauseSplitter, CutsLongStretchesWithoutPausesAndCoversEverySample) {
+    std::mt19937 random(3);
+    std::uniform_int_distribution<int> uniform(-8000, 8000);
+    std::vector<int16_t> samples(16000 * 70 + 123);
+    for (auto& x : samples)
+        x = int16_t(uniform(random));
+    for (const auto& s : {samples, std::vector<int16_t>(samples.size(), 0)}) {
+        const auto pieces = PauseSplitter().Split(s);
+        ASSERT_GE(pieces.size(), 3u);
+        long at = 0;
+        for (const auto& p : pieces) {
+            EXPECT_EQ(p.begin, at);
+            EXPECT_GT(p.end, p.begin);
+            EXPECT_LE(p.end - p.begin, 30 * 16000);
+            at = p.end;
+        }
+        EXPECT_EQ(at, long(s.size()));
+    }
+    EXPECT_THAT(PauseSplitter().Split({}), IsEmpty());
+    EXPECT_EQ(PauseSplitter().Split(tone(5, 100)).size(), 1u);
+}
+
+}  // namespace
