@@ -471,12 +471,12 @@ void Gnome::create_recognize_cb(Widget, XtPointer client, XtPointer) {
         return;
     CueRecognizer* r = keyset->GetRecognizer(name);
     if (!r) {
-        r = theImp.recognizers.FetchRecognizer(name);
-        if (!r) {
+        std::unique_ptr<CueRecognizer> fetched = theImp.recognizers.FetchRecognizer(name);
+        if (!fetched) {
             g->Inform(KLFmt("Failed to locate plug-in recognizer [%s].", name).c_str(), "Dismiss");
             return;
         }
-        keyset->AddRecognizer(r);
+        r = keyset->AddRecognizer(std::move(fetched));
         theImp.ConfigureRecognizer(r, r->ConfigFileName().c_str());
     }
     r->shown = 1;

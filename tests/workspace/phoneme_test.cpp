@@ -86,7 +86,7 @@ class PhonemePlugin : public ::testing::Test {
         delete catalog_;
     }
     void SetUp() override {
-        r.reset(catalog_->FetchRecognizer("Phoneme"));
+        r = catalog_->FetchRecognizer("Phoneme");
         ASSERT_TRUE(r);
     }
     static CueRecognizerCatalog* catalog_;
@@ -322,21 +322,21 @@ class RecordingHost : public CueChirrupHost {
 
     int CreateFloatSlider(CueRecognizer*, const char* name, float minimum, float maximum,
                           float value, FloatCallback callback) override {
-        controls.push_back({name, minimum, maximum, value});
+        controls.push_back({name, minimum, maximum, value, nullptr, nullptr, nullptr, {}});
         controls.back().floatCallback = callback;
         return 1;
     }
     int SetFloatSlider(CueRecognizer*, const char*, float) override { return 1; }
     int CreateIntSlider(CueRecognizer*, const char* name, int minimum, int maximum, int value,
                         IntCallback callback) override {
-        controls.push_back({name, float(minimum), float(maximum), float(value)});
+        controls.push_back({name, float(minimum), float(maximum), float(value), nullptr, nullptr, nullptr, {}});
         controls.back().intCallback = callback;
         return 1;
     }
     int SetIntSlider(CueRecognizer*, const char*, int) override { return 1; }
     int CreateOption(CueRecognizer*, const char* name, int count, const char* const* labels,
                      int value, OptionCallback callback) override {
-        controls.push_back({name, 0.0f, float(count - 1), float(value)});
+        controls.push_back({name, 0.0f, float(count - 1), float(value), nullptr, nullptr, nullptr, {}});
         controls.back().optionCallback = callback;
         controls.back().labels.assign(labels, labels + count);
         return 1;
