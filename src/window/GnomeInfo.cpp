@@ -373,7 +373,12 @@ void Gnome::show_keyframe_image_cb(Widget, XtPointer, KLFiend*) {
 void Gnome::show_reference_image_cb(Widget, XtPointer, KLFiend*) {
 #ifdef GNOME_HAS_CHART
     Gnome* g = TheGnome();
-    if (g && g->syncChart)
-        g->DisplayReference(g->syncChart->GetIndicatorTime());
+    if (g && g->syncChart) {
+        // The chart calls this whenever the user moves its indicator (a click, a drag, a key
+        // or mark moved): the information bar follows, not only when a key becomes active.
+        const CueTime t = g->syncChart->GetIndicatorTime();
+        g->DisplayReference(t);
+        g->DisplayTimecode(t);
+    }
 #endif
 }
