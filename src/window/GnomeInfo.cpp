@@ -376,9 +376,11 @@ void Gnome::show_reference_image_cb(Widget, XtPointer, KLFiend*) {
     if (g && g->syncChart) {
         // The chart calls this whenever the user moves its indicator (a click, a drag, a key
         // or mark moved): the information bar follows, not only when a key becomes active.
+        // A hidden indicator (scrolled or zoomed out of view) has no time worth showing.
         const CueTime t = g->syncChart->GetIndicatorTime();
         g->DisplayReference(t);
-        g->DisplayTimecode(t);
+        if (g->syncChart->geometry.ValidColumn(g->syncChart->geometry.indicatorX))
+            g->DisplayTimecode(t);
     }
 #endif
 }

@@ -100,6 +100,20 @@ TEST_F(ChartOps, AddKeyframeWithTheIndicatorHiddenNeverGoesBeforeTimeZero) {
     EXPECT_EQ(Keys(), "2@0/1/1 1@60/1/1 2@150/2/0.5 3@300/0/1 ");
 }
 
+// A hidden indicator (as after opening a track) sits one pixel left of the chart, next to the
+// key at time 0; that key must not become active, or Delete Key removes a key nobody chose.
+TEST_F(ChartOps, AHiddenIndicatorMakesNoKeyActive) {
+    chart->geometry.indicatorX = -1;
+    KLSyncChartTestAccess::Feedback(chart);
+    EXPECT_EQ(chart->activeKey, nullptr);
+    chart->DeleteActiveKeyframe();
+    EXPECT_EQ(Keys(), kStart);
+    // Shown at the start again, the key there is picked as before.
+    chart->SetIndicatorTime(CueTime());
+    KLSyncChartTestAccess::Feedback(chart);
+    EXPECT_EQ(ActiveFrame(), 0);
+}
+
 TEST_F(ChartOps, AddTimeKeyframeIgnoresTheKindAndRefusesAnOccupiedTime) {
     keyset->kind = 2;
     EXPECT_EQ(chart->AddTimeKeyframe(3, Seconds(4), keyset->GetKeyShape(3), 1), 1);
