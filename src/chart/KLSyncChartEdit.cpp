@@ -1,5 +1,6 @@
 // The sync chart's content and key operations: the tracks and sound it shows, adding and
 // deleting keys, and the smoothing of keys.
+#include <algorithm>
 #include <cmath>
 #include <vector>
 
@@ -70,7 +71,9 @@ int KLSyncChart::AddKeyframe(int shapeIndex, KLKey* key, int update) {
         activeKey = nullptr;
         keyTrack->RemoveKey(t);
     } else {
-        t = GetIndicatorTime();
+        // A hidden indicator reports the point one pixel left of the visible part, which is
+        // before time 0 when the chart shows its start: a key never goes there.
+        t = std::max(GetIndicatorTime(), CueTime());
     }
     KLKeyEvent* inserted = nullptr;
     const int kind = keyTrack->keySet ? keyTrack->keySet->kind : 0;

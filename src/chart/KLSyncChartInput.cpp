@@ -419,14 +419,19 @@ void KLSyncChart::feedback_meter_movement() {
     const CueTime t = GetIndicatorTime();
     feedbackTime = t;
     const int ix = geometry.indicatorX;
+    const bool shown = geometry.ValidColumn(ix);
     if (keyTrack) {
         KLKeyEvent *before = nullptr, *after = nullptr;
         feedbackBlend = keyTrack->bracket_keys_from_time(t, &before, &after);
         KLKeyEvent* active = nullptr;
-        if (before && std::abs(geometry.ColumnFromTime(before->time) - ix) <= 4)
+        // A hidden indicator (column -1) picks no key: the key at the chart's start would
+        // otherwise become active, and Delete Key remove it, without the user seeing why.
+        if (!shown) {
+        } else if (before && std::abs(geometry.ColumnFromTime(before->time) - ix) <= 4) {
             active = before;
-        else if (after && KLChartGeometry::Hits(geometry.ColumnFromTime(after->time), ix))
+        } else if (after && KLChartGeometry::Hits(geometry.ColumnFromTime(after->time), ix)) {
             active = after;
+        }
         set_active_key(active);
         feedbackKeyBefore = before ? before->shapeIndex : -1;
         feedbackKeyAfter = after ? after->shapeIndex : -1;
@@ -436,10 +441,12 @@ void KLSyncChart::feedback_meter_movement() {
         KLMarkEvent *before = nullptr, *after = nullptr;
         markTrack->BracketMarks(t, &before, &after);
         KLMarkEvent* active = nullptr;
-        if (before && KLChartGeometry::Hits(geometry.ColumnFromTime(before->time), ix))
+        if (!shown) {
+        } else if (before && KLChartGeometry::Hits(geometry.ColumnFromTime(before->time), ix)) {
             active = before;
-        else if (after && KLChartGeometry::Hits(geometry.ColumnFromTime(after->time), ix))
+        } else if (after && KLChartGeometry::Hits(geometry.ColumnFromTime(after->time), ix)) {
             active = after;
+        }
         set_active_mark(active);
     }
     showReferenceImageCallback.Call(this);

@@ -373,7 +373,14 @@ void Gnome::show_keyframe_image_cb(Widget, XtPointer, KLFiend*) {
 void Gnome::show_reference_image_cb(Widget, XtPointer, KLFiend*) {
 #ifdef GNOME_HAS_CHART
     Gnome* g = TheGnome();
-    if (g && g->syncChart)
-        g->DisplayReference(g->syncChart->GetIndicatorTime());
+    if (g && g->syncChart) {
+        // The chart calls this whenever the user moves its indicator (a click, a drag, a key
+        // or mark moved): the information bar follows, not only when a key becomes active.
+        // A hidden indicator (scrolled or zoomed out of view) has no time worth showing.
+        const CueTime t = g->syncChart->GetIndicatorTime();
+        g->DisplayReference(t);
+        if (g->syncChart->geometry.ValidColumn(g->syncChart->geometry.indicatorX))
+            g->DisplayTimecode(t);
+    }
 #endif
 }

@@ -107,6 +107,15 @@ void Gnome::select_keyset_cb(Widget w, XtPointer clientData, XtPointer) {
         return;
     set_label("infoKeysetTitle", XtName(w));
     g->SetActiveKeyset(int(long(clientData)));
+    // Only the keyset active at load had its key pictures grabbed; one shown for the first
+    // time here gets them now, so that its tiles are not left black.
+    if (KLKeySet* set = g->shownKeyset) {
+        bool missing = false;
+        for (int i = 0; i < set->keyShapeCount && !missing; i++)
+            missing = !set->GetKeyShape(i)->GetImage();
+        if (missing)
+            g->MakeKeysetImages();
+    }
     theImp.PrepareKeyFrames(g->activeKeyset);
 }
 

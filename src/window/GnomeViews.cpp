@@ -257,7 +257,8 @@ void Gnome::MakeKeysetImages() {
     KLKeyTrack* track = theImp.GetKeyTrack(activeKeyset);
     if (!track)
         return;
-    ShowStatus("Grabbing key images; please wait...");
+    // Through the status hook, so that "Ready." follows once the window is idle again.
+    status_hook("Grabbing key images; please wait...", this);
     track->PrepareVuKeyFrames(nullptr);
     const CueTime shown = keyScene->time;
     for (int i = 0; i < shownKeyset->keyShapeCount; i++) {

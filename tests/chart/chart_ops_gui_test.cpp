@@ -89,6 +89,31 @@ INSTANTIATE_TEST_SUITE_P(
         AddCase{"ReplacesTheActiveKey", 1, 5, 1, "0@0/0/1 1@60/1/1 2@150/1/1 3@300/0/1 ", -1}),
     [](const auto& info) { return std::string(info.param.name); });
 
+// With the indicator hidden (as on a fresh chart) it reports one pixel before the chart's
+// start; the new key goes to time 0 instead, never before it.
+TEST_F(ChartOps, AddKeyframeWithTheIndicatorHiddenNeverGoesBeforeTimeZero) {
+    keyset->kind = 1;
+    track->RemoveKey(Seconds(0));
+    chart->geometry.indicatorX = -1;
+    ASSERT_LT(chart->GetIndicatorTime(), CueTime());
+    EXPECT_EQ(chart->AddKeyframe(2, keyset->GetKeyShape(2), 1), 1);
+    EXPECT_EQ(Keys(), "2@0/1/1 1@60/1/1 2@150/2/0.5 3@300/0/1 ");
+}
+
+// A hidden indicator (as after opening a track) sits one pixel left of the chart, next to the
+// key at time 0; that key must not become active, or Delete Key removes a key nobody chose.
+TEST_F(ChartOps, AHiddenIndicatorMakesNoKeyActive) {
+    chart->geometry.indicatorX = -1;
+    KLSyncChartTestAccess::Feedback(chart);
+    EXPECT_EQ(chart->activeKey, nullptr);
+    chart->DeleteActiveKeyframe();
+    EXPECT_EQ(Keys(), kStart);
+    // Shown at the start again, the key there is picked as before.
+    chart->SetIndicatorTime(CueTime());
+    KLSyncChartTestAccess::Feedback(chart);
+    EXPECT_EQ(ActiveFrame(), 0);
+}
+
 TEST_F(ChartOps, AddTimeKeyframeIgnoresTheKindAndRefusesAnOccupiedTime) {
     keyset->kind = 2;
     EXPECT_EQ(chart->AddTimeKeyframe(3, Seconds(4), keyset->GetKeyShape(3), 1), 1);

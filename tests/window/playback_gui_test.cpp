@@ -296,4 +296,36 @@ TEST_F(PlaybackWindowTest, PlayForwardSaveMakesOneFrameSlotPerRegionFrame) {
     EXPECT_EQ(XtIsManaged(W("mixScn")), gnome->mixViewOn != 0);
 }
 
+// Dragging the indicator by hand across the sound, away from any key, the information bar
+// shows where it was let go, not where the press was.
+TEST_F(PlaybackWindowTest, TheTimecodeFollowsAnIndicatorDraggedByHand) {
+    const KLChartGeometry& g = chart->geometry;
+    chart->SetRegionRange(CueTime(), CueTime());
+    chart->SetZoomRange(CueTime(), g.duration);
+    KLKeyTrack* track = theImp.GetKeyTrack(gnome->GetActiveKeyset());
+    ASSERT_NE(track, nullptr);
+    // A column at least ten pixels from every key, in the right half of the chart.
+    auto clear = [&](int x) {
+        for (const KLKeyEvent* e : track->events)
+            if (std::abs(g.ColumnFromTime(e->time) - x) < 10)
+                return false;
+        return true;
+    };
+    int to = int(g.width) - 20;
+    while (to > int(g.width) / 2 && !clear(to))
+        to--;
+    ASSERT_GT(to, int(g.width) / 2) << "no column clear of keys";
+    const int from = to - 60, y = int(g.height) / 3;
+    guitest::MoveTo(W("syncChart"), from, y);
+    guitest::Press(1);
+    for (int x = from + 10; x <= to; x += 10)
+        guitest::MoveTo(W("syncChart"), x, y);
+    guitest::MoveTo(W("syncChart"), to, y);
+    guitest::Release(1);
+    guitest::Settle();
+    const CueTime at = chart->GetIndicatorTime();
+    EXPECT_EQ(g.indicatorX, to);
+    EXPECT_EQ(LabelText("infoTimeValue"), at.Text());
+}
+
 }  // namespace

@@ -16,6 +16,7 @@
 
 #include "chart/KLSyncChart.h"
 #include "guitest/GuiTest.h"
+#include "model/KLKey.h"
 #include "model/KLKeyEvent.h"
 #include "model/KLKeySet.h"
 #include "model/KLKeyTrack.h"
@@ -137,6 +138,19 @@ TEST_F(TilesTest, DoubleClickAddsAKeyOfThatShapeAtTheIndicator) {
 
 TEST_F(TilesTest, TheKeysetMenuSwitchesChartTitleAndPanel) {
     ASSERT_NE(gnome->keysetMenuEntries[1], nullptr);
+    Widget status = XtNameToWidget(gnome->AppShell(), "*statusLine");
+    ASSERT_NE(status, nullptr);
+    // The event loop as the program runs it, work procedures included, until "Ready.".
+    auto ready = [&] {
+        XtAppContext app = KLXmGnome::AppContext();
+        return guitest::WaitFor([&] {
+            XtAppAddTimeOut(
+                app, 5, [](XtPointer, XtIntervalId*) {}, nullptr);
+            XtAppProcessEvent(app, XtIMAll);
+            return LabelText(status) == "Ready.";
+        });
+    };
+    ASSERT_TRUE(ready()) << "after loading";
     XtCallCallbacks(gnome->keysetMenuEntries[1], XmNvalueChangedCallback, nullptr);
     EXPECT_EQ(gnome->GetActiveKeyset(), 1);
     EXPECT_EQ(chart->keyTrack, theImp.GetKeyTrack(1));
@@ -147,6 +161,12 @@ TEST_F(TilesTest, TheKeysetMenuSwitchesChartTitleAndPanel) {
     EXPECT_NE(gnome->tileBoxes[0], nullptr) << "other panels stay built";
     EXPECT_TRUE(XmToggleButtonGetState(gnome->keysetMenuEntries[1]));
     EXPECT_FALSE(XmToggleButtonGetState(gnome->keysetMenuEntries[0]));
+    // Shown for the first time, the keyset's key shapes get their pictures from the key view.
+    ASSERT_TRUE(theImp.geometryActive);
+    KLKeySet* brows = theImp.GetKeySet(1);
+    for (int i = 0; i < brows->keyShapeCount; i++)
+        EXPECT_NE(brows->GetKeyShape(i)->GetImage(), nullptr) << brows->GetKeyShape(i)->Name();
+    EXPECT_TRUE(ready()) << "the status line still says " << LabelText(status);
 }
 
 TEST_F(TilesTest, DisplayStylesAreARadioGroup) {

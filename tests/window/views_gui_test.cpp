@@ -267,6 +267,37 @@ TEST_F(ViewsTest, KeyViewHoldsOtherKeysetsStatic) {
     theImp.PrepareKeyFrames(-1);
 }
 
+// Whichever alternative a view shows (key pictures, scene or blank), it fills the view's frame:
+// the frame keeps its size and does not shrink to a picture view that has no picture yet.
+TEST_F(ViewsTest, EveryViewChoiceFillsItsFrame) {
+    struct Choice {
+        int keyOn, keyMode, mixOn;
+        const char *key, *mix;
+    };
+    const Choice choices[] = {{1, 0, 1, "keyVu", "mixScn"},
+                              {1, 1, 0, "keyScn", "mixFake"},
+                              {0, 1, 1, "keyFake", "mixScn"},
+                              {1, 0, 0, "keyVu", "mixFake"}};
+    for (const Choice& c : choices) {
+        gnome->keyViewOn = c.keyOn;
+        gnome->keyViewMode = c.keyMode;
+        gnome->mixViewOn = c.mixOn;
+        gnome->SetViewStatus();
+        guitest::Settle();
+        for (const char* name : {c.key, c.mix}) {
+            ASSERT_TRUE(XtIsManaged(W(name))) << name;
+            Dimension width = 0, height = 0;
+            XtVaGetValues(W(name), XmNwidth, &width, XmNheight, &height, nullptr);
+            EXPECT_GE(width, 300) << name << " after choice " << c.key << "/" << c.mix;
+            EXPECT_GE(height, 220) << name << " after choice " << c.key << "/" << c.mix;
+        }
+    }
+    gnome->keyViewOn = 1;
+    gnome->keyViewMode = 1;
+    gnome->mixViewOn = 1;
+    gnome->SetViewStatus();
+}
+
 // ClearViews leaves both views without a scene; showing the keyset gives it back.
 TEST_F(ViewsTest, ClearViewsAndShowAgain) {
     gnome->ClearViews();
