@@ -21,23 +21,16 @@
 #include "window/PlaybackPass.h"
 #include "workspace/Imp.h"
 
-#if __has_include("scene/gl/KLSceneView.h")
 #include "scene/gl/KLSceneView.h"
-#define GNOME_HAS_SCENE_VIEW 1
-#endif
 
 namespace {
 // The display is updated at most this often during playback (about once per display frame).
 constexpr double kFrameSeconds = 1.0 / 120;
 
 void set_views_playing(Gnome* g, int playing) {
-#ifdef GNOME_HAS_SCENE_VIEW
     for (KLSceneView* view : {g->keyScene, g->mixScene})
         if (view)
             view->playing = playing;
-#else
-    (void)g, (void)playing;
-#endif
 }
 }  // namespace
 
@@ -191,20 +184,16 @@ Boolean Gnome::playback_workproc(XtPointer gnome) {
 void Gnome::GoToTime(CueTime t) {
     if (syncChart)
         syncChart->SetIndicatorTime(t);
-#ifdef GNOME_HAS_SCENE_VIEW
     if (mixViewOn && theImp.geometryActive && mixScene) {
         mixScene->time = t;
         mixScene->Draw();
     }
-#endif
     if (shownKeyset && keyViewOn) {
         if (keyViewMode == 1 && theImp.geometryActive) {
-#ifdef GNOME_HAS_SCENE_VIEW
             if (keyScene) {
                 keyScene->time = t;
                 keyScene->Draw();
             }
-#endif
         } else if (KLKeyTrack* track = theImp.GetKeyTrack(activeKeyset)) {
             KLKeyEvent* prev = nullptr;
             KLKeyEvent* next = nullptr;
