@@ -110,12 +110,9 @@ void KLSyncChart::DeleteTimeKeyframe(CueTime t) {
 }
 
 void KLSyncChart::DeleteActiveKeyframe() {
-    if (activeKey && keyTrack) {
-        const CueTime t = activeKey->time;
-        set_active_key(nullptr);
-        if (hitKey && hitKey->time == t)
-            hitKey = nullptr;
-        keyTrack->RemoveKey(t);
+    if (activeKey) {
+        DeleteTimeKeyframe(activeKey->time);
+        return;
     }
     needRedraw = true;
     full_expose();

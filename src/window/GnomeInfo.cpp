@@ -306,24 +306,7 @@ void Gnome::ShowKeyframeImage() {
     if (!syncChart)
         return;
     CueTime t = syncChart->GetIndicatorTime();
-    if (shownKeyset && keyViewOn) {
-        if (keyViewMode == 1 && theImp.geometryActive) {
-            if (keyScene) {
-                keyScene->time = t;
-                keyScene->Draw();
-            }
-        } else if (KLKeyTrack* track = theImp.GetKeyTrack(activeKeyset)) {
-            KLKeyEvent* prev = nullptr;
-            KLKeyEvent* next = nullptr;
-            float fraction = track->bracket_keys_from_time(t, &prev, &next);
-            show_key_images(prev ? prev->key : nullptr, next ? next->key : nullptr, prev != nullptr,
-                            next != nullptr, fraction);
-        }
-    }
-    if (mixViewOn && theImp.geometryActive && mixScene) {
-        mixScene->time = t;
-        mixScene->Draw();
-    }
+    show_views_at(t);
 }
 
 void Gnome::show_keyframe_cb(Widget, XtPointer, KLFiend*) {

@@ -181,9 +181,8 @@ Boolean Gnome::playback_workproc(XtPointer gnome) {
     return False;
 }
 
-void Gnome::GoToTime(CueTime t) {
-    if (syncChart)
-        syncChart->SetIndicatorTime(t);
+// The mix view and the key view (its scene, or the key images around `t`) at time `t`.
+void Gnome::show_views_at(CueTime t) {
     if (mixViewOn && theImp.geometryActive && mixScene) {
         mixScene->time = t;
         mixScene->Draw();
@@ -202,6 +201,12 @@ void Gnome::GoToTime(CueTime t) {
                             next != nullptr, fraction);
         }
     }
+}
+
+void Gnome::GoToTime(CueTime t) {
+    if (syncChart)
+        syncChart->SetIndicatorTime(t);
+    show_views_at(t);
     DisplayReference(t);
     if (soundPlaying)
         stopWatch.Mark();

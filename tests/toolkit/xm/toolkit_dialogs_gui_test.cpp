@@ -164,16 +164,7 @@ class FileManagerTest : public ToolkitTest {
         Widget w = XtNameToWidget(form, "*Attention");
         return w && XtIsManaged(w) ? w : nullptr;
     }
-    static std::string MessageOf(Widget box) {
-        XmString s = nullptr;
-        XtVaGetValues(box, XmNmessageString, &s, nullptr);
-        char* text = nullptr;
-        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-        std::string result = text ? text : "";
-        XtFree(text);
-        XmStringFree(s);
-        return result;
-    }
+    static std::string MessageOf(Widget box) { return guitest::XmText(box, XmNmessageString); }
     std::string dir;
 };
 
