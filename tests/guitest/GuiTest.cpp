@@ -204,6 +204,19 @@ void Screenshot(const std::string& name) {
         fprintf(stderr, "guitest: could not save the screenshot %s\n", name.c_str());
 }
 
+void CloseFromWindowManager(Widget dialog) {
+    Widget shell = XtParent(dialog);
+    Display* dpy = XtDisplay(shell);
+    XClientMessageEvent ev{};
+    ev.type = ClientMessage;
+    ev.window = XtWindow(shell);
+    ev.message_type = XInternAtom(dpy, "WM_PROTOCOLS", False);
+    ev.format = 32;
+    ev.data.l[0] = long(XInternAtom(dpy, "WM_DELETE_WINDOW", False));
+    ev.data.l[1] = CurrentTime;
+    XSendEvent(dpy, XtWindow(shell), False, NoEventMask, reinterpret_cast<XEvent*>(&ev));
+}
+
 std::string XmText(Widget widget, const char* resource) {
     XmString s = nullptr;
     XtVaGetValues(widget, resource, &s, nullptr);
