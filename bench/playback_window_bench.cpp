@@ -7,24 +7,20 @@
 #include <benchmark/benchmark.h>
 #include <stdlib.h>
 #include <sys/resource.h>
-#include <unistd.h>
 
 #include <X11/Intrinsic.h>
 
 #include <chrono>
-#include <filesystem>
 #include <memory>
 #include <string>
 
 #include "chart/KLSyncChart.h"
-#include "toolkit/CuePrefs.h"
 #include "toolkit/KLImageSGI.h"
 #include "toolkit/MonotonicClock.h"
+#include "window/DemoProject.h"
 #include "window/FallbackResources.h"
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
-
-namespace fs = std::filesystem;
 
 namespace {
 
@@ -38,17 +34,8 @@ double CpuSeconds() {
 // The window on a copy of the demo project, with a reference picture for every frame.
 Gnome* OpenWindow() {
     static Gnome* gnome = [] {
-        std::string dir = fs::temp_directory_path() / ("chirrup-bench-" + std::to_string(getpid()));
-        std::string demo = std::string(CHIRRUP_SOURCE_DIR) + "/resources/demo";
-        for (const char* sub : {"misc_data", "wire", "pix"}) {
-            fs::create_directories(dir + "/" + sub);
-            for (const auto& entry : fs::directory_iterator(demo))
-                fs::copy(entry.path(), dir + "/" + sub + "/" + entry.path().filename().string(),
-                         fs::copy_options::overwrite_existing);
-        }
-        setenv("TESSEL_PROJECT", dir.c_str(), 1);
+        const std::string dir = windowtest::DemoProject();
         setenv("VX_NOCONFIRM", "1", 1);
-        CuePrefs::Refresh();
         auto* g = new Gnome;
         theGhost = g;
         int argc = 1;

@@ -164,6 +164,9 @@ class KLSyncChart : public KLFiend {
     void handle_keyboard_input(unsigned long keysym, int count, char* text);
     void feedback_meter_movement();
     void set_active_key(KLKeyEvent* event);
+    // Removes the key at `t` from the key track (there must be one), forgetting it first as
+    // the active or the hit key.
+    void remove_key(CueTime t);
     void set_active_mark(KLMarkEvent* mark);
     void move_indicator(int x);
     void draw_stick(Drawable d, int x, float value, unsigned long pixel);

@@ -100,25 +100,25 @@ int KLSyncChart::AddTimeKeyframe(int shapeIndex, CueTime t, KLKey* key, int upda
     return inserted ? 1 : 0;
 }
 
+void KLSyncChart::remove_key(CueTime t) {
+    if (activeKey && activeKey->time == t)
+        set_active_key(nullptr);
+    if (hitKey && hitKey->time == t)
+        hitKey = nullptr;
+    keyTrack->RemoveKey(t);
+}
+
 void KLSyncChart::DeleteTimeKeyframe(CueTime t) {
-    if (keyTrack) {
-        if (activeKey && activeKey->time == t)
-            set_active_key(nullptr);
-        if (hitKey && hitKey->time == t)
-            hitKey = nullptr;
-        keyTrack->RemoveKey(t);
-    }
+    if (keyTrack)
+        remove_key(t);
     needRedraw = true;
     full_expose();
 }
 
 void KLSyncChart::DeleteActiveKeyframe() {
-    if (activeKey && keyTrack) {
-        const CueTime t = activeKey->time;
-        set_active_key(nullptr);
-        if (hitKey && hitKey->time == t)
-            hitKey = nullptr;
-        keyTrack->RemoveKey(t);
+    if (activeKey) {
+        DeleteTimeKeyframe(activeKey->time);
+        return;
     }
     needRedraw = true;
     full_expose();
@@ -135,13 +135,8 @@ void KLSyncChart::DeleteActiveKeyframeRegion() {
             if (e->time >= start)
                 doomed.push_back(e->time);
         }
-        for (CueTime t : doomed) {
-            if (activeKey && activeKey->time == t)
-                set_active_key(nullptr);
-            if (hitKey && hitKey->time == t)
-                hitKey = nullptr;
-            keyTrack->RemoveKey(t);
-        }
+        for (CueTime t : doomed)
+            remove_key(t);
     }
     needRedraw = true;
     full_expose();

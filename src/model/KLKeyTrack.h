@@ -107,8 +107,10 @@ class KLKeyTrack {
 
   private:
     KLKeyEvent* prev_event(CueTime t) const;
-    // Makes the two preview channels and registers them with `list` unless they exist.
-    void make_channels(KLKeyFrameList* list);
+    // Empties the two preview channels, or makes them and registers them with `list` (the
+    // keyset's list when null); false, doing nothing, when there is no list or the workspace
+    // is not preparing key frames.
+    bool make_channels(KLKeyFrameList* list);
     void release_channels();
 
     std::unique_ptr<KLChannel> ownShape_;

@@ -113,11 +113,8 @@ void KLKeyTrack::PrepareKeyFrames(KLKeyFrameList* list) {
     if (!keySet)
         return;
     if (keySet->kind == 1) {
-        if (!list)
-            list = keySet->keyFrameList;
-        if (!list || !KLStdImp::Workspace().KeyFramePreparation())
+        if (!make_channels(list))
             return;
-        make_channels(list);
         vuKeyFrames = false;
         ++previewRevision;
         for (const KLKeyEvent* event : events) {
@@ -135,11 +132,15 @@ void KLKeyTrack::PrepareKeyFrames(KLKeyFrameList* list) {
     }
 }
 
-void KLKeyTrack::make_channels(KLKeyFrameList* list) {
+bool KLKeyTrack::make_channels(KLKeyFrameList* list) {
+    if (!list)
+        list = keySet->keyFrameList;
+    if (!list || !KLStdImp::Workspace().KeyFramePreparation())
+        return false;
     if (shapeChannel && weightChannel) {
         shapeChannel->ClearAnimation();
         weightChannel->ClearAnimation();
-        return;
+        return true;
     }
     release_channels();
     ownShape_ = std::make_unique<KLSplineChannel>();
@@ -149,6 +150,7 @@ void KLKeyTrack::make_channels(KLKeyFrameList* list) {
     shapeChannel = ownShape_.get();
     weightChannel = ownWeight_.get();
     list->AddKeyChannel(shapeChannel, weightChannel);
+    return true;
 }
 
 // Kind 1: one key per key shape at the key shape's frame: the key-shape channel holds its
@@ -160,11 +162,8 @@ void KLKeyTrack::PrepareVuKeyFrames(KLKeyFrameList* list) {
     if (!keySet)
         return;
     if (keySet->kind == 1) {
-        if (!list)
-            list = keySet->keyFrameList;
-        if (!list || !KLStdImp::Workspace().KeyFramePreparation())
+        if (!make_channels(list))
             return;
-        make_channels(list);
         for (const auto& key : keySet->keyShapes) {
             const CueTime at = CueTime::FromFrames(key->frame);
             shapeChannel->AddKey(at, float(key->shapeValue));

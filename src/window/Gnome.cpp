@@ -25,14 +25,8 @@
 #include "window/WireFileApplyManager.h"
 #include "workspace/Imp.h"
 
-#if __has_include("chart/KLSyncChart.h")
 #include "chart/KLSyncChart.h"
-#define GNOME_HAS_CHART 1
-#endif
-#if __has_include("scene/gl/KLSceneView.h")
 #include "scene/gl/KLSceneView.h"
-#define GNOME_HAS_SCENE_VIEW 1
-#endif
 
 int Gnome::tilesPerRow = -1;
 void (*Gnome::exitFunction)(int) = std::exit;
@@ -93,10 +87,8 @@ int Gnome::DressWidgets() {
     load_recognizers();
 
     // 4. Scene views and the hooks around the key view's evaluation.
-#ifdef GNOME_HAS_SCENE_VIEW
     keyScene = dynamic_cast<KLSceneView*>(FindFiend("keyScn"));
     mixScene = dynamic_cast<KLSceneView*>(FindFiend("mixScn"));
-#endif
     dress_scene_views();
 
     // 5. Alerts and prompt.
@@ -181,9 +173,7 @@ int Gnome::DressWidgets() {
     if (refImageView)
         refImageView->SetZoom(theImp.referenceZoom);
     if (KLFiend* chart = FindFiend("syncChart")) {
-#ifdef GNOME_HAS_CHART
         syncChart = dynamic_cast<KLSyncChart*>(chart);
-#endif
         chart->SetFiendCallback("showKeyframeCallback", show_keyframe_cb, nullptr);
         chart->SetFiendCallback("showKeyframeImageCallback", show_keyframe_image_cb, nullptr);
         chart->SetFiendCallback("showReferenceImageCallback", show_reference_image_cb, nullptr);

@@ -81,9 +81,10 @@ class Gnome : public KLXmGnome, public virtual Ghost {
     static void change_repeat_cb(Widget, XtPointer, XtPointer);
     // Helpers: a pass over the chart's region (reversed or not) at a speed; the key image
     // view set by the display style; playback ended at once (before the workspace replaces
-    // what is playing).
+    // what is playing); the mix and key views drawn at a time.
     void start_pass(bool reverse, float speed);
     void show_key_images(KLKey* prev, KLKey* next, bool hasPrev, bool hasNext, float fraction);
+    void show_views_at(CueTime t);
     void halt_playback();
 
     // --- Key editing commands and key value (GnomeKeyEdit.cpp)

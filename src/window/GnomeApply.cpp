@@ -28,10 +28,7 @@
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
 
-#if __has_include("chart/KLSyncChart.h")
 #include "chart/KLSyncChart.h"
-#define GNOME_HAS_CHART 1
-#endif
 
 namespace {
 const char kRootItem[] = "<ROOT>";
@@ -123,12 +120,8 @@ void hide_dialog() {
 }
 
 void set_region(Gnome* g, KLEdlEvent* event) {
-#ifdef GNOME_HAS_CHART
     if (g->syncChart)
         g->syncChart->SetRegionRange(event->sourceIn, event->sourceOut);
-#else
-    (void)g, (void)event;
-#endif
 }
 }  // namespace
 

@@ -25,14 +25,8 @@
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
 
-#if __has_include("chart/KLSyncChart.h")
 #include "chart/KLSyncChart.h"
-#define GNOME_HAS_CHART 1
-#endif
-#if __has_include("scene/gl/KLSceneView.h")
 #include "scene/gl/KLSceneView.h"
-#define GNOME_HAS_SCENE_VIEW 1
-#endif
 
 namespace {
 const char kBuildStamp[] = "9704300208";
@@ -142,7 +136,6 @@ void Gnome::DisplayTimecode(CueTime t) {
 }
 
 void Gnome::chart_follows_workspace(bool withSound) {
-#ifdef GNOME_HAS_CHART
     if (!syncChart)
         return;
     // The mark track first: the chart's drawing reads it, while of the sound it only asks
@@ -151,17 +144,12 @@ void Gnome::chart_follows_workspace(bool withSound) {
         syncChart->SetMarkTrack(theImp.markTrack.get());
     if (withSound && syncChart->sound != theImp.sound.get())
         syncChart->SetSound(theImp.sound.get());
-#else
-    (void)withSound;
-#endif
 }
 
 void Gnome::DisplayDuration(CueTime duration) {
-#ifdef GNOME_HAS_CHART
     chart_follows_workspace();
     if (syncChart)
         syncChart->SetUserDuration(duration);
-#endif
     set_label(durationValueButton, time_text(duration));
 }
 
@@ -301,55 +289,27 @@ void Gnome::delete_reference_cb(Widget, XtPointer, XtPointer) {
 }
 
 void Gnome::adjust_reference_cb(Widget, XtPointer, XtPointer) {
-#ifdef GNOME_HAS_CHART
     Gnome* g = TheGnome();
     if (g && g->syncChart)
         theImp.SetReferenceOffset(g->syncChart->GetIndicatorTime());
-#endif
 }
 
 void Gnome::set_reference_region_cb(Widget, XtPointer, XtPointer) {
-#ifdef GNOME_HAS_CHART
     Gnome* g = TheGnome();
     if (g && g->syncChart)
         g->syncChart->SetZoomRange(theImp.referenceOffset, theImp.ReferenceEnd());
-#endif
 }
 
 void Gnome::ShowKeyframeImage() {
     // The key and mix views at the indicator, as GoToTime shows them, without moving the
     // indicator or the reference view.
-#ifdef GNOME_HAS_CHART
     if (!syncChart)
         return;
     CueTime t = syncChart->GetIndicatorTime();
-    if (shownKeyset && keyViewOn) {
-        if (keyViewMode == 1 && theImp.geometryActive) {
-#ifdef GNOME_HAS_SCENE_VIEW
-            if (keyScene) {
-                keyScene->time = t;
-                keyScene->Draw();
-            }
-#endif
-        } else if (KLKeyTrack* track = theImp.GetKeyTrack(activeKeyset)) {
-            KLKeyEvent* prev = nullptr;
-            KLKeyEvent* next = nullptr;
-            float fraction = track->bracket_keys_from_time(t, &prev, &next);
-            show_key_images(prev ? prev->key : nullptr, next ? next->key : nullptr, prev != nullptr,
-                            next != nullptr, fraction);
-        }
-    }
-#ifdef GNOME_HAS_SCENE_VIEW
-    if (mixViewOn && theImp.geometryActive && mixScene) {
-        mixScene->time = t;
-        mixScene->Draw();
-    }
-#endif
-#endif
+    show_views_at(t);
 }
 
 void Gnome::show_keyframe_cb(Widget, XtPointer, KLFiend*) {
-#ifdef GNOME_HAS_CHART
     Gnome* g = TheGnome();
     if (g && g->syncChart) {
         CueTime t = g->syncChart->GetIndicatorTime();
@@ -362,7 +322,6 @@ void Gnome::show_keyframe_cb(Widget, XtPointer, KLFiend*) {
             g->HighlightKeyframe(key->shapeIndex);
         }
     }
-#endif
 }
 
 void Gnome::show_keyframe_image_cb(Widget, XtPointer, KLFiend*) {
@@ -371,7 +330,6 @@ void Gnome::show_keyframe_image_cb(Widget, XtPointer, KLFiend*) {
 }
 
 void Gnome::show_reference_image_cb(Widget, XtPointer, KLFiend*) {
-#ifdef GNOME_HAS_CHART
     Gnome* g = TheGnome();
     if (g && g->syncChart) {
         // The chart calls this whenever the user moves its indicator (a click, a drag, a key
@@ -382,5 +340,4 @@ void Gnome::show_reference_image_cb(Widget, XtPointer, KLFiend*) {
         if (g->syncChart->geometry.ValidColumn(g->syncChart->geometry.indicatorX))
             g->DisplayTimecode(t);
     }
-#endif
 }

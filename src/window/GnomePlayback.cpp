@@ -21,23 +21,16 @@
 #include "window/PlaybackPass.h"
 #include "workspace/Imp.h"
 
-#if __has_include("scene/gl/KLSceneView.h")
 #include "scene/gl/KLSceneView.h"
-#define GNOME_HAS_SCENE_VIEW 1
-#endif
 
 namespace {
 // The display is updated at most this often during playback (about once per display frame).
 constexpr double kFrameSeconds = 1.0 / 120;
 
 void set_views_playing(Gnome* g, int playing) {
-#ifdef GNOME_HAS_SCENE_VIEW
     for (KLSceneView* view : {g->keyScene, g->mixScene})
         if (view)
             view->playing = playing;
-#else
-    (void)g, (void)playing;
-#endif
 }
 }  // namespace
 
@@ -188,23 +181,18 @@ Boolean Gnome::playback_workproc(XtPointer gnome) {
     return False;
 }
 
-void Gnome::GoToTime(CueTime t) {
-    if (syncChart)
-        syncChart->SetIndicatorTime(t);
-#ifdef GNOME_HAS_SCENE_VIEW
+// The mix view and the key view (its scene, or the key images around `t`) at time `t`.
+void Gnome::show_views_at(CueTime t) {
     if (mixViewOn && theImp.geometryActive && mixScene) {
         mixScene->time = t;
         mixScene->Draw();
     }
-#endif
     if (shownKeyset && keyViewOn) {
         if (keyViewMode == 1 && theImp.geometryActive) {
-#ifdef GNOME_HAS_SCENE_VIEW
             if (keyScene) {
                 keyScene->time = t;
                 keyScene->Draw();
             }
-#endif
         } else if (KLKeyTrack* track = theImp.GetKeyTrack(activeKeyset)) {
             KLKeyEvent* prev = nullptr;
             KLKeyEvent* next = nullptr;
@@ -213,6 +201,12 @@ void Gnome::GoToTime(CueTime t) {
                             next != nullptr, fraction);
         }
     }
+}
+
+void Gnome::GoToTime(CueTime t) {
+    if (syncChart)
+        syncChart->SetIndicatorTime(t);
+    show_views_at(t);
     DisplayReference(t);
     if (soundPlaying)
         stopWatch.Mark();

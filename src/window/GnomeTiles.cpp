@@ -24,10 +24,7 @@
 #include "window/KeysetFileManager.h"
 #include "workspace/Imp.h"
 
-#if __has_include("scene/gl/KLSceneView.h")
 #include "scene/gl/KLSceneView.h"
-#define GNOME_HAS_SCENE_VIEW 1
-#endif
 
 namespace {
 void set_label(const char* name, const std::string& text) {
@@ -74,11 +71,9 @@ void Gnome::ShowKeySet(int k) {
     update_recognizer_dialogs();
     if (theImp.geometryActive) {
         theImp.PrepareKeyFrames(k);
-#ifdef GNOME_HAS_SCENE_VIEW
         for (KLSceneView* view : {keyScene, mixScene})
             if (view)
                 view->SetScene(theImp.scene.get());
-#endif
     }
     ShowKeyframeImage();
 }

@@ -19,10 +19,7 @@
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
 
-#if __has_include("scene/gl/KLSceneView.h")
 #include "scene/gl/KLSceneView.h"
-#define GNOME_HAS_SCENE_VIEW 1
-#endif
 
 namespace {
 // The mouse button of a button event, else 0.
@@ -44,8 +41,6 @@ Window window_of(Widget w) {
     return XtIsWidget(w) ? XtWindow(w) : XtWindow(XtParent(w));
 }
 }  // namespace
-
-#ifdef GNOME_HAS_SCENE_VIEW
 
 void Gnome::dress_scene_views() {
     if (keyScene)
@@ -287,36 +282,6 @@ void Gnome::grab_playblast_frame(int i) {
     theImp.playblastImages[size_t(i)] =
         mixScene->DrawPix(std::max<int>(width, 1), std::max<int>(height, 1));
 }
-
-#else  // no scene view in this build: the views stay blank
-
-void Gnome::grab_playblast_frame(int) {}
-
-void Gnome::dress_scene_views() {}
-void Gnome::show_textures_cb(Widget, XtPointer, XtPointer) {}
-void Gnome::CenterKeyView() {}
-void Gnome::CenterMixView() {}
-void Gnome::ClearViews() {
-    shownKeyset = nullptr;
-    if (keyImageView)
-        keyImageView->SetImage(nullptr);
-}
-void Gnome::do_one_tumble(int) {}
-Boolean Gnome::tumble_workproc(XtPointer) {
-    return True;
-}
-void Gnome::camera_drag(Widget, XtPointer, XtPointer, int) {}
-void Gnome::tumble_key_cb(Widget, XtPointer, XtPointer) {}
-void Gnome::tumble_mix_cb(Widget, XtPointer, XtPointer) {}
-void Gnome::key_vu_lookat_cb(Widget, XtPointer, XtPointer) {}
-void Gnome::mix_vu_lookat_cb(Widget, XtPointer, XtPointer) {}
-void Gnome::feedback_cb(Widget, XtPointer, XtPointer) {}
-void Gnome::load_geometry_cb(Widget, XtPointer, XtPointer) {}
-void Gnome::key_view_set_cb(Widget, XtPointer, XtPointer) {}
-void Gnome::key_view_clear_cb(Widget, XtPointer, XtPointer) {}
-void Gnome::MakeKeysetImages() {}
-
-#endif
 
 void Gnome::show_playblast(CueTime start) {
     theImp.playblastOffset = start;

@@ -3,7 +3,6 @@
 #include <Xm/BulletinB.h>
 #include <Xm/CascadeB.h>
 #include <Xm/CascadeBG.h>
-#include <Xm/DrawingA.h>
 #include <Xm/FileSB.h>
 #include <Xm/Form.h>
 #include <Xm/Frame.h>
@@ -22,30 +21,8 @@
 #include "toolkit/xm/KLImageView.h"
 #include "window/Gnome.h"
 
-#if __has_include("chart/KLSyncChart.h")
 #include "chart/KLSyncChart.h"
-#define create_sync_chart KLSyncChart::Create
-#endif
-#if __has_include("scene/gl/KLSceneView.h")
 #include "scene/gl/KLSceneView.h"
-#define create_scene_view KLSceneView::Create
-#endif
-
-namespace {
-// Stand-ins for the sync chart and the 3D views until their widgets are linked in: plain
-// drawing areas under the same names, so that the layout, FindWidget and the view switching
-// work; FindFiend finds no object behind them.
-#ifndef create_sync_chart
-Widget create_sync_chart(Widget parent, String name, ArgList args, Cardinal count) {
-    return XmCreateDrawingArea(parent, name, args, count);
-}
-#endif
-#ifndef create_scene_view
-Widget create_scene_view(Widget parent, String name, ArgList args, Cardinal count) {
-    return XmCreateDrawingArea(parent, name, args, count);
-}
-#endif
-}  // namespace
 
 const KLWidgetSpec widget_spec[] = {
     {"-", "messageDialog", XmCreateMessageDialog},               // 1
@@ -164,7 +141,7 @@ const KLWidgetSpec widget_spec[] = {
     {"......+", "keyVuFrame", XmCreateFrame},                    // 114
     {".......+", "keyVuForm", XmCreateForm},                     // 115
     {"........+", "keyVu", KLImageView::Create},                 // 116
-    {"........-", "keyScn", create_scene_view},                  // 117
+    {"........-", "keyScn", KLSceneView::Create},                // 117
     {"........-", "keyFake", XmCreateRowColumn},                 // 118
     {"......+", "keyButtonBank", XmCreateForm},                  // 119
     {".......+", "keyVuLabel", XmCreateLabel},                   // 120
@@ -177,7 +154,7 @@ const KLWidgetSpec widget_spec[] = {
     {".....+", "mixBox", XmCreateForm},                          // 127
     {"......+", "mixVuFrame", XmCreateFrame},                    // 128
     {".......+", "mixVuForm", XmCreateForm},                     // 129
-    {"........+", "mixScn", create_scene_view},                  // 130
+    {"........+", "mixScn", KLSceneView::Create},                // 130
     {"........-", "mixFake", XmCreateBulletinBoard},             // 131
     {"......+", "mixButtonBank", XmCreateForm},                  // 132
     {".......+", "mixVuLabel", XmCreateLabel},                   // 133
@@ -213,7 +190,7 @@ const KLWidgetSpec widget_spec[] = {
     {"....+", "infoDurationBox", XmCreateForm},                  // 163
     {".....+", "infoDurationLabel", XmCreatePushButton},         // 164
     {".....+", "infoDurationValue", XmCreatePushButton},         // 165
-    {"..+", "syncChart", create_sync_chart},                     // 166
+    {"..+", "syncChart", KLSyncChart::Create},                   // 166
     {nullptr, nullptr, nullptr},
 };
 

@@ -141,18 +141,9 @@ TEST_F(RefLoadDialogTest, OkAndCancelAnswerTheModalShow) {
 
 TEST_F(RefLoadDialogTest, WindowManagerCloseIsCancel) {
     Poll close([] {
-        Widget shell = XtParent(dialog->dialog);
-        if (!viewable(shell))
+        if (!viewable(XtParent(dialog->dialog)))
             return false;
-        Display* dpy = XtDisplay(shell);
-        XClientMessageEvent ev{};
-        ev.type = ClientMessage;
-        ev.window = XtWindow(shell);
-        ev.message_type = XInternAtom(dpy, "WM_PROTOCOLS", False);
-        ev.format = 32;
-        ev.data.l[0] = long(XInternAtom(dpy, "WM_DELETE_WINDOW", False));
-        ev.data.l[1] = CurrentTime;
-        XSendEvent(dpy, XtWindow(shell), False, NoEventMask, reinterpret_cast<XEvent*>(&ev));
+        guitest::CloseFromWindowManager(dialog->dialog);
         return true;
     });
     EXPECT_EQ(dialog->Show(), 0);

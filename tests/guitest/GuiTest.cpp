@@ -23,10 +23,12 @@ namespace {
 // Points DISPLAY at the fixture's display when the fixture file names one.
 void use_fixture_display() {
     const char* file = getenv("CHIRRUP_DISPLAY_FILE");
-    if (!file) return;
+    if (!file)
+        return;
     std::ifstream in(file);
     std::string display;
-    if (in >> display) setenv("DISPLAY", display.c_str(), 1);
+    if (in >> display)
+        setenv("DISPLAY", display.c_str(), 1);
 }
 
 void sync_and_process() {
@@ -45,19 +47,25 @@ Widget Shell(const char* const* fallbackResources) {
         int argc = 1;
         shell = KLXmGnome::OpenApplication("chirrup", "Chirrup", &argc, argv, fallbackResources);
     }
-    if (!shell) ADD_FAILURE() << "no display: run the window tests under the xvfb fixture";
+    if (!shell)
+        ADD_FAILURE() << "no display: run the window tests under the xvfb fixture";
     return shell;
 }
 
-Display* GetDisplay() { return KLXmGnome::GetDisplay(); }
+Display* GetDisplay() {
+    return KLXmGnome::GetDisplay();
+}
 
 bool WaitFor(const std::function<bool()>& done, double seconds) {
     auto limit = std::chrono::steady_clock::now() + std::chrono::duration<double>(seconds);
     XtAppContext context = KLXmGnome::AppContext();
     while (true) {
-        if (done()) return true;
-        if (std::chrono::steady_clock::now() > limit) return done();
-        if (GetDisplay()) XFlush(GetDisplay());
+        if (done())
+            return true;
+        if (std::chrono::steady_clock::now() > limit)
+            return done();
+        if (GetDisplay())
+            XFlush(GetDisplay());
         if (context && XtAppPending(context)) {
             XtAppProcessEvent(context, XtIMAll);
         } else {
@@ -77,7 +85,8 @@ void Settle() {
 bool WaitMapped(Widget widget, double seconds) {
     return WaitFor(
         [widget] {
-            if (!XtIsRealized(widget)) return false;
+            if (!XtIsRealized(widget))
+                return false;
             XWindowAttributes attributes;
             return XGetWindowAttributes(XtDisplay(widget), XtWindow(widget), &attributes) &&
                    attributes.map_state == IsViewable;
@@ -88,8 +97,10 @@ bool WaitMapped(Widget widget, double seconds) {
 void MoveTo(Widget widget, int x, int y) {
     Dimension width = 0, height = 0;
     XtVaGetValues(widget, XmNwidth, &width, XmNheight, &height, nullptr);
-    if (x < 0) x = width / 2;
-    if (y < 0) y = height / 2;
+    if (x < 0)
+        x = width / 2;
+    if (y < 0)
+        y = height / 2;
     Position rootX = 0, rootY = 0;
     XtTranslateCoords(widget, static_cast<Position>(x), static_cast<Position>(y), &rootX, &rootY);
     XTestFakeMotionEvent(GetDisplay(), -1, rootX, rootY, CurrentTime);
@@ -102,7 +113,8 @@ void modifier_keys(unsigned int modifiers, bool press) {
     const std::pair<unsigned int, KeySym> keys[] = {
         {ShiftMask, XK_Shift_L}, {ControlMask, XK_Control_L}, {Mod1Mask, XK_Alt_L}};
     for (auto& [mask, sym] : keys)
-        if (modifiers & mask) XTestFakeKeyEvent(d, XKeysymToKeycode(d, sym), press, CurrentTime);
+        if (modifiers & mask)
+            XTestFakeKeyEvent(d, XKeysymToKeycode(d, sym), press, CurrentTime);
 }
 }  // namespace
 
@@ -154,9 +166,12 @@ void TypeKey(unsigned long keysym, unsigned int modifiers) {
 void TypeText(const std::string& text) {
     for (char c : text) {
         KeySym sym = c == ' ' ? XK_space : c == '\n' ? XK_Return : static_cast<KeySym>(c);
-        if (c == '.') sym = XK_period;
-        if (c == '-') sym = XK_minus;
-        if (c == ':') sym = XK_colon;
+        if (c == '.')
+            sym = XK_period;
+        if (c == '-')
+            sym = XK_minus;
+        if (c == ':')
+            sym = XK_colon;
         TypeKey(sym);
     }
 }
@@ -164,7 +179,8 @@ void TypeText(const std::string& text) {
 unsigned long PixelAt(Widget widget, int x, int y) {
     XSync(GetDisplay(), False);
     XImage* image = XGetImage(XtDisplay(widget), XtWindow(widget), x, y, 1, 1, AllPlanes, ZPixmap);
-    if (!image) return ~0ul;
+    if (!image)
+        return ~0ul;
     unsigned long pixel = XGetPixel(image, 0, 0);
     XDestroyImage(image);
     return pixel;
@@ -186,6 +202,32 @@ void Screenshot(const std::string& name) {
     XSync(GetDisplay(), False);
     if (system(command.c_str()) != 0)
         fprintf(stderr, "guitest: could not save the screenshot %s\n", name.c_str());
+}
+
+void CloseFromWindowManager(Widget dialog) {
+    Widget shell = XtParent(dialog);
+    Display* dpy = XtDisplay(shell);
+    XClientMessageEvent ev{};
+    ev.type = ClientMessage;
+    ev.window = XtWindow(shell);
+    ev.message_type = XInternAtom(dpy, "WM_PROTOCOLS", False);
+    ev.format = 32;
+    ev.data.l[0] = long(XInternAtom(dpy, "WM_DELETE_WINDOW", False));
+    ev.data.l[1] = CurrentTime;
+    XSendEvent(dpy, XtWindow(shell), False, NoEventMask, reinterpret_cast<XEvent*>(&ev));
+}
+
+std::string XmText(Widget widget, const char* resource) {
+    XmString s = nullptr;
+    XtVaGetValues(widget, resource, &s, nullptr);
+    if (!s)
+        return "";
+    char* text = nullptr;
+    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+    std::string result = text ? text : "";
+    XtFree(text);
+    XmStringFree(s);
+    return result;
 }
 
 }  // namespace guitest

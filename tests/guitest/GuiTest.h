@@ -39,6 +39,13 @@ unsigned long PixelAt(Widget widget, int x, int y);
 // The pixel value of a named colour on the default colormap.
 unsigned long NamedPixel(const char* colourName);
 
+// Asks a dialog's shell to close as the window manager does (WM_DELETE_WINDOW).
+void CloseFromWindowManager(Widget dialog);
+
+// The text of a compound-string resource of a widget (XmNlabelString, XmNmessageString...);
+// empty when it has none.
+std::string XmText(Widget widget, const char* resource);
+
 // Saves a screenshot of the whole display as build/test-screens/<name>.png (ImageMagick's
 // import). Failing to save is not a test failure; it is reported on the error stream.
 void Screenshot(const std::string& name);

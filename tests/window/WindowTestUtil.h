@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+#include "window/DemoProject.h"
+
 class Gnome;
 
 // Helpers of the main-window tests: the one Gnome of the test program, built on the test
@@ -15,10 +17,6 @@ namespace windowtest {
 
 // The window, built once per test program (Xt cannot reopen the display).
 Gnome& TheWindow();
-
-// A project folder in a fresh temporary directory whose data, scene and picture folders are
-// the demo's files: loading the demo keyset from it asks no project question.
-std::string DemoProject();
 
 // Steps run from a short timeout while the test waits in a modal loop: each step is tried
 // every few milliseconds until it returns true, then the next is tried.

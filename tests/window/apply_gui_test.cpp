@@ -154,13 +154,7 @@ TEST_F(ApplyDialogTest, ApplyWithoutDagOrKeysetAlertsAndKeepsTheDialog) {
         windowtest::AnswerScript script({[&] {
             if (!alert->Waiting() || !windowtest::Viewable(alert->Button(0)))
                 return false;
-            XmString s = nullptr;
-            XtVaGetValues(alert->GetDialog(), XmNmessageString, &s, nullptr);
-            char* text = nullptr;
-            XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-            told = text ? text : "";
-            XtFree(text);
-            XmStringFree(s);
+            told = guitest::XmText(alert->GetDialog(), XmNmessageString);
             return windowtest::ClickWhenViewable(alert->Button(0));
         }});
         Gnome::apply_cb(nullptr, nullptr, nullptr);

@@ -106,16 +106,7 @@ TEST_F(WindowTest, TableHasEveryRowUnderItsParent) {
 }
 
 TEST_F(WindowTest, ResourceFileGivesLabelsAndOptionEntries) {
-    auto label = [](const char* name) {
-        XmString s = nullptr;
-        XtVaGetValues(W(name), XmNlabelString, &s, nullptr);
-        char* text = nullptr;
-        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-        std::string result = text ? text : "";
-        XtFree(text);
-        XmStringFree(s);
-        return result;
-    };
+    auto label = [](const char* name) { return guitest::XmText(W(name), XmNlabelString); };
     EXPECT_EQ(label("openTrack"), "Open Track...");
     EXPECT_EQ(label("infoFrameValue"), "0");
     struct {

@@ -27,25 +27,11 @@ std::string LabelOf(const char* name) {
     Widget w = KLXmGnome::FindWidget(name);
     if (!w)
         return "<none>";
-    XmString s = nullptr;
-    XtVaGetValues(w, XmNlabelString, &s, nullptr);
-    char* text = nullptr;
-    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-    std::string result = text ? text : "";
-    XtFree(text);
-    XmStringFree(s);
-    return result;
+    return guitest::XmText(w, XmNlabelString);
 }
 
 std::string MessageOf(KLAlert* alert) {
-    XmString s = nullptr;
-    XtVaGetValues(alert->GetDialog(), XmNmessageString, &s, nullptr);
-    char* text = nullptr;
-    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-    std::string result = text ? text : "";
-    XtFree(text);
-    XmStringFree(s);
-    return result;
+    return guitest::XmText(alert->GetDialog(), XmNmessageString);
 }
 
 class InfoTest : public ::testing::Test {

@@ -159,14 +159,7 @@ class PlaybackWindowTest : public ::testing::Test {
         XtCallCallbacks(children[index], XmNactivateCallback, nullptr);
     }
     static std::string LabelText(const char* name) {
-        XmString s = nullptr;
-        XtVaGetValues(W(name), XmNlabelString, &s, nullptr);
-        char* text = nullptr;
-        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-        std::string out = text ? text : "";
-        XtFree(text);
-        XmStringFree(s);
-        return out;
+        return guitest::XmText(W(name), XmNlabelString);
     }
 
     Gnome* gnome = nullptr;

@@ -34,14 +34,7 @@ Widget W(const char* name) {
 }
 
 std::string LabelText(Widget w) {
-    XmString s = nullptr;
-    XtVaGetValues(w, XmNlabelString, &s, nullptr);
-    char* text = nullptr;
-    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-    std::string out = text ? text : "";
-    XtFree(text);
-    XmStringFree(s);
-    return out;
+    return guitest::XmText(w, XmNlabelString);
 }
 
 std::vector<Widget> Children(Widget w) {
@@ -238,13 +231,7 @@ TEST_F(TilesTest, TheDurationButtonAsksForANewDuration) {
     windowtest::AnswerScript answers({[&] {
         if (!windowtest::Viewable(ok))
             return false;
-        XmString s = nullptr;
-        XtVaGetValues(dialog, XmNselectionLabelString, &s, nullptr);
-        char* q = nullptr;
-        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &q);
-        question = q ? q : "";
-        XtFree(q);
-        XmStringFree(s);
+        question = guitest::XmText(dialog, XmNselectionLabelString);
         XmTextFieldSetString(text, const_cast<char*>(""));
         guitest::Click(text);
         guitest::TypeText("450");

@@ -6,18 +6,13 @@
 #include <Xm/FileSB.h>
 #include <Xm/TextF.h>
 #include <Xm/Xm.h>
-#include <unistd.h>
 
 #include <cstdlib>
-#include <filesystem>
 
 #include "guitest/GuiTest.h"
-#include "toolkit/CuePrefs.h"
 #include "window/FallbackResources.h"
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
-
-namespace fs = std::filesystem;
 
 namespace windowtest {
 
@@ -36,26 +31,6 @@ Gnome& TheWindow() {
         return g;
     }();
     return *gnome;
-}
-
-std::string DemoProject() {
-    static std::string project = [] {
-        std::string dir =
-            fs::temp_directory_path() / ("chirrup-window-" + std::to_string(getpid()));
-        fs::create_directories(dir);
-        std::string demo = std::string(CHIRRUP_SOURCE_DIR) + "/resources/demo";
-        for (const char* sub : {"misc_data", "wire", "pix"}) {
-            fs::create_directories(dir + "/" + sub);
-            for (const auto& entry : fs::directory_iterator(demo))
-                fs::copy(entry.path(), dir + "/" + sub + "/" + entry.path().filename().string(),
-                         fs::copy_options::overwrite_existing);
-        }
-        setenv("TESSEL_PROJECT", dir.c_str(), 1);
-        unsetenv("TESSEL_MISC_DIR");
-        CuePrefs::Refresh();
-        return dir;
-    }();
-    return project;
 }
 
 AnswerScript::AnswerScript(std::vector<std::function<bool()>> steps) : steps_(std::move(steps)) {

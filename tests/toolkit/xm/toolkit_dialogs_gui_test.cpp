@@ -70,18 +70,6 @@ bool PressWhenShown(Widget button) {
     return true;
 }
 
-void CloseFromWindowManager(Widget dialog) {
-    Widget shell = XtParent(dialog);
-    Display* dpy = XtDisplay(shell);
-    XClientMessageEvent ev{};
-    ev.type = ClientMessage;
-    ev.window = XtWindow(shell);
-    ev.message_type = XInternAtom(dpy, "WM_PROTOCOLS", False);
-    ev.format = 32;
-    ev.data.l[0] = long(XInternAtom(dpy, "WM_DELETE_WINDOW", False));
-    XSendEvent(dpy, XtWindow(shell), False, NoEventMask, reinterpret_cast<XEvent*>(&ev));
-}
-
 class ToolkitTest : public ::testing::Test {
   protected:
     static void SetUpTestSuite() {
@@ -109,7 +97,7 @@ TEST_F(ToolkitTest, Confirm3AnswersByButtonAndCloseIsTheLast) {
     Poll close([&] {
         if (!alert.Waiting() || !Viewable(alert.Button(0)))
             return false;
-        CloseFromWindowManager(alert.GetDialog());
+        guitest::CloseFromWindowManager(alert.GetDialog());
         return true;
     });
     EXPECT_EQ(alert.Confirm3("Save?", "Save", "Don't Save", "Cancel"), 0);
@@ -164,16 +152,7 @@ class FileManagerTest : public ToolkitTest {
         Widget w = XtNameToWidget(form, "*Attention");
         return w && XtIsManaged(w) ? w : nullptr;
     }
-    static std::string MessageOf(Widget box) {
-        XmString s = nullptr;
-        XtVaGetValues(box, XmNmessageString, &s, nullptr);
-        char* text = nullptr;
-        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-        std::string result = text ? text : "";
-        XtFree(text);
-        XmStringFree(s);
-        return result;
-    }
+    static std::string MessageOf(Widget box) { return guitest::XmText(box, XmNmessageString); }
     std::string dir;
 };
 
