@@ -2,8 +2,10 @@
 
 #include <cstdlib>
 
+#include "toolkit/CuePrefs.h"
 #include "toolkit/CueRecognizer.h"
 #include "toolkit/KLErrHandler.h"
+#include "toolkit/KLFilePath.h"
 
 std::unique_ptr<CueRecognizer> CueRecognizerCatalog::FetchRecognizer(const char* name) const {
     if (!name)
@@ -41,5 +43,11 @@ std::string CueRecognizerCatalog::SearchPath() {
         if (value && *value)
             return value;
     }
-    return "./plugins:/usr/tesselbeta/plugins:/usr/tessel/plugins";
+    // The program's own plug-ins (<location>/lib/chirrup/plugins, in the build tree or the
+    // installation) come last, so that they are found without any set-up but never hide a
+    // plug-in of the same name earlier on the path.
+    std::string path = "./plugins:/usr/tesselbeta/plugins:/usr/tessel/plugins";
+    if (const char* location = CuePrefs::Location())
+        path += ":" + KLFilePath::Join(location, "lib/chirrup/plugins");
+    return path;
 }

@@ -19,6 +19,7 @@ class CueRecognizerCatalog : public KLPlugCatalog {
     // ownership of the prototype.
     void Register(std::unique_ptr<CueRecognizer> prototype);
     // The default plug-in search path: TESSEL_PLUGIN_PATH, else KL_PLUGIN_PATH, else
-    // "./plugins:/usr/tesselbeta/plugins:/usr/tessel/plugins".
+    // "./plugins:/usr/tesselbeta/plugins:/usr/tessel/plugins" followed by the program's own
+    // plug-in directory, <CuePrefs::Location()>/lib/chirrup/plugins.
     static std::string SearchPath();
 };

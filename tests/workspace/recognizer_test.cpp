@@ -10,6 +10,7 @@
 
 #include "WorkspaceTestUtil.h"
 #include "model/KLKeySet.h"
+#include "toolkit/CuePrefs.h"
 #include "toolkit/CueRecognizerCatalog.h"
 #include "toolkit/CueSound.h"
 #include "workspace/Imp.h"
@@ -82,8 +83,10 @@ class PluginCatalog : public ::testing::Test {
 TEST_F(PluginCatalog, SearchPathPrefersTesselThenKlThenDefaultAndIsScannedOnFirstFetch) {
     ScopedEnv tessel("TESSEL_PLUGIN_PATH", nullptr);
     ScopedEnv kl("KL_PLUGIN_PATH", nullptr);
+    ASSERT_TRUE(CuePrefs::Location());
     EXPECT_EQ(CueRecognizerCatalog::SearchPath(),
-              "./plugins:/usr/tesselbeta/plugins:/usr/tessel/plugins");
+              "./plugins:/usr/tesselbeta/plugins:/usr/tessel/plugins:" +
+                  std::string(CuePrefs::Location()) + "/lib/chirrup/plugins");
     ScopedEnv kl2("KL_PLUGIN_PATH", "/kl");
     EXPECT_EQ(CueRecognizerCatalog::SearchPath(), "/kl");
     ScopedEnv tessel2("TESSEL_PLUGIN_PATH", (dir.path() + ":" + kGoodPlugins).c_str());
