@@ -25,6 +25,8 @@ for sub in misc_data wire pix; do
 done
 export TESSEL_PROJECT="$work/project"
 unset TESSEL_MISC_DIR
+# The demo keyset names the Phoneme recognizer: the build's plug-ins are on the path.
+export TESSEL_PLUGIN_PATH="${TESSEL_PLUGIN_PATH:-$(dirname "$program")/../lib/chirrup/plugins}"
 cd "$work"
 
 times=()

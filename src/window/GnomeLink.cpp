@@ -41,11 +41,21 @@ struct LinkWidgets {
     Widget doneButton = nullptr;
 };
 LinkWidgets theLink;
-// The target's picture being shown (the view borrows it), and the sound being auditioned
-// with the timer that paces it.
+// The target's picture being shown (the view borrows it).
 std::unique_ptr<KLImageSGI> theTargetPicture;
-std::unique_ptr<CueSound> theAuditionSound;
-std::unique_ptr<KLTimer> theAuditionTimer;
+// The sound being auditioned and the timer that paces it. The sound output reads them from
+// its own thread, so they are replaced only after KLSoundControl::Stop and are never
+// destroyed when the process ends (the output may still be running then).
+CueSound* theAuditionSound = nullptr;
+KLTimer* theAuditionTimer = nullptr;
+
+void stop_audition() {
+    KLSoundControl::Stop();
+    delete theAuditionSound;
+    theAuditionSound = nullptr;
+    delete theAuditionTimer;
+    theAuditionTimer = nullptr;
+}
 
 Widget make(WidgetClass cls, const char* name, Widget parent, const char* label = nullptr) {
     Widget w = XtVaCreateManagedWidget(name, cls, parent, nullptr);
@@ -308,21 +318,23 @@ void Gnome::link_audition_cb(Widget, XtPointer client, XtPointer) {
     auto* target = static_cast<CueRecognizer::Target*>(client);
     if (!target || target->soundFile.empty())
         return;
-    KLSoundControl::Stop();
+    stop_audition();
     auto sound = std::make_unique<CueSound>(target->soundFile.c_str());
     if (!sound->Valid()) {
         if (Gnome* g = TheGnome())
             g->Inform(sound->ErrorText().c_str(), "Dismiss");
         return;
     }
-    theAuditionTimer = std::make_unique<KLTimer>(
-        CueTime(), CueTime::FromSeconds(double(sound->FrameCount()) / sound->Rate()));
-    theAuditionSound = std::move(sound);
+    theAuditionTimer =
+        new KLTimer(CueTime(), CueTime::FromSeconds(double(sound->FrameCount()) / sound->Rate()));
+    theAuditionSound = sound.release();
     theAuditionTimer->start();
-    KLSoundControl::Play(theAuditionSound.get(), theAuditionTimer.get(), CueTime());
+    KLSoundControl::Play(theAuditionSound, theAuditionTimer, CueTime());
 }
 
 void Gnome::link_done_cb(Widget, XtPointer, XtPointer) {
+    if (theAuditionSound)
+        stop_audition();
     if (Widget dialog = FindWidget("linkDialog"))
         XtUnmanageChild(dialog);
 }

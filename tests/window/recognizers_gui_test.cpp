@@ -24,6 +24,7 @@
 #include "toolkit/CueChirrup.h"
 #include "toolkit/CueRecognizer.h"
 #include "toolkit/CueSound.h"
+#include "toolkit/KLSoundControl.h"
 #include "toolkit/xm/KLAlert.h"
 #include "window/Gnome.h"
 #include "window/WindowTestUtil.h"
@@ -36,7 +37,10 @@ namespace {
 // The shipped plug-ins, and no sound device, before the window scans for them.
 const bool kEnvironment = [] {
     setenv("TESSEL_PLUGIN_PATH", CHIRRUP_BINARY_DIR "/lib/chirrup/plugins", 1);
-    setenv("SDL_AUDIODRIVER", "dummy", 1);
+    setenv("SDL_AUDIODRIVER", "disk", 1);
+    setenv("SDL_DISKAUDIOFILE",
+           (fs::temp_directory_path() / "chirrup-recognizers-audio.raw").c_str(), 1);
+    setenv("SDL_DISKAUDIODELAY", "0", 1);
     return true;
 }();
 
@@ -355,6 +359,8 @@ TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
     guitest::Click(L("done_button"));
     EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(W("linkDialog")); }));
     click_panel("Phoneme", "Dismiss");
+    // The output's thread must be gone before the program's statics are.
+    KLSoundControl::Close();
 }
 
 // A keyset without the recognizer hides its panel; coming back shows it again for the keyset.
