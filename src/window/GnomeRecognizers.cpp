@@ -17,6 +17,7 @@
 #include <memory>
 #include <string>
 
+#include "chart/KLSyncChart.h"
 #include "model/KLKeySet.h"
 #include "toolkit/CueChirrup.h"
 #include "toolkit/CueRecognizer.h"
@@ -29,10 +30,6 @@
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
 
-#if __has_include("chart/KLSyncChart.h")
-#include "chart/KLSyncChart.h"
-#define GNOME_HAS_CHART 1
-#endif
 
 namespace {
 
@@ -504,10 +501,8 @@ void Gnome::dismiss_cb(Widget, XtPointer client, XtPointer) {
 }
 
 void Gnome::UpdateDisplay() {
-#ifdef GNOME_HAS_CHART
     if (syncChart)
         syncChart->UpdateDisplay();
-#endif
 }
 
 void Gnome::RecognizeProgress(CueRecognizer*, float done) {
@@ -526,7 +521,6 @@ void Gnome::recognize_cb(Widget, XtPointer client, XtPointer) {
     auto* r = static_cast<CueRecognizer*>(client);
     if (!g || !r || !theImp.sound)
         return;
-#ifdef GNOME_HAS_CHART
     KLSyncChart* chart = g->syncChart;
     KLKeySet* keyset = theImp.GetKeySet(g->GetActiveKeyset());
     if (!chart || !keyset)
@@ -551,5 +545,4 @@ void Gnome::recognize_cb(Widget, XtPointer client, XtPointer) {
     g->informationAlert->Hide();
     g->UpdateDisplay();
     theImp.PrepareKeyFrames(0);
-#endif
 }
