@@ -1,6 +1,7 @@
 #include "toolkit/KLSoundControl.h"
 
 #include <SDL2/SDL.h>
+#include <dlfcn.h>
 
 #include <algorithm>
 #include <atomic>
@@ -158,6 +159,31 @@ void install(Pass next) {
     SDL_UnlockAudioDevice(out.device);
 }
 
+// Set by DisableAudioLibraryErrors: the ALSA library that SDL loads prints its own failures
+// ("ALSA lib pcm.c:... Unknown PCM default") straight onto the error stream.
+bool quietAudioLibrary = false;
+
+// ALSA's error handler type; its header is not needed for this one call.
+using AlsaErrorHandler = void (*)(const char*, int, const char*, int, const char*, ...);
+void ignore_alsa_error(const char*, int, const char*, int, const char*, ...) {}
+
+// Gives the ALSA library a handler that says nothing, before SDL loads it. The library is kept
+// loaded, so that SDL's own load of it finds the same instance with the handler set. What
+// went wrong still reaches the user through SDL's error text.
+void silence_alsa() {
+    static bool done = false;
+    if (done)
+        return;
+    done = true;
+    void* alsa = dlopen("libasound.so.2", RTLD_NOW | RTLD_LOCAL);
+    if (!alsa)
+        return;
+    using SetHandler = int (*)(AlsaErrorHandler);
+    auto set = reinterpret_cast<SetHandler>(dlsym(alsa, "snd_lib_error_set_handler"));
+    if (set)
+        set(ignore_alsa_error);
+}
+
 bool open_device(const char* driver) {
     // A driver named here wins over the SDL_AUDIODRIVER variable; none leaves SDL's choice.
     if (driver)
@@ -194,6 +220,8 @@ bool KLSoundControl::Open() {
     if (out.device)
         return true;
     SDL_SetHint(SDL_HINT_NO_SIGNAL_HANDLERS, "1");
+    if (quietAudioLibrary)
+        silence_alsa();
     if (!open_device(nullptr)) {
         KLWarning("No audio output could be opened (%s); sound is not heard.\n", SDL_GetError());
         if (!open_device("dummy")) {
@@ -289,6 +317,7 @@ void log_to_reports(void*, int, SDL_LogPriority priority, const char* message) {
 }  // namespace
 
 void KLSoundControl::DisableAudioLibraryErrors() {
+    quietAudioLibrary = true;  // the device is opened on first use, so this costs no start-up
     SDL_LogSetOutputFunction(log_to_reports, nullptr);
     SDL_LogSetAllPriority(SDL_LOG_PRIORITY_WARN);
 }

@@ -25,7 +25,8 @@ class KLSoundControl {
     static void Stop();
     // Stops when `sound` is what is playing (a sound being destroyed calls this).
     static void Forget(const CueSound* sound);
-    // Routes the audio library's own messages into the program's reports.
+    // Routes SDL's messages into the program's reports and silences the ALSA library's own
+    // printing on the error stream (the reason a device failed reaches the reports anyway).
     static void DisableAudioLibraryErrors();
 
     // Opens the output device (Play and PlayDrag do so when needed); without a usable device

@@ -17,6 +17,7 @@
 #include "toolkit/CueSound.h"
 #include "toolkit/KLImageSGI.h"
 #include "toolkit/KLString.h"
+#include "toolkit/KLSoundControl.h"
 #include "toolkit/OnSignal.h"
 #include "workspace/ConsoleGhost.h"
 #include "workspace/Ghost.h"
@@ -33,6 +34,7 @@ const int kCrashSignals[] = {SIGSEGV, SIGSYS,  SIGTERM, SIGBUS,  SIGFPE,
 }  // namespace
 
 Imp::Imp() {
+    KLSoundControl::DisableAudioLibraryErrors();
     // The display settings reach the scene again at the next keyset clear or load, once the
     // entry has set the tesselation levels.
     scene = make_scene();

@@ -328,4 +328,18 @@ TEST_F(SoundFallback, NoDeviceFallsBackToTheSilentDriverAndReportsThroughTheProg
     EXPECT_NE(errors.reports[0].second.find("device 3 lost"), std::string::npos);
 }
 
+// A machine without a sound card: SDL's ALSA driver fails, and the ALSA library would print
+// its own lines on the error stream; the program says it once, in its own words.
+TEST_F(SoundFallback, TheAudioLibraryPrintsNothingOfItsOwn) {
+    setenv("SDL_AUDIODRIVER", "alsa", 1);
+    setenv("ALSA_CONFIG_PATH", "/nonexistent/chirrup-no-alsa.conf", 1);  // no card here either
+    KLSoundControl::DisableAudioLibraryErrors();
+    testing::internal::CaptureStderr();
+    const bool opened = KLSoundControl::Open();
+    const std::string printed = testing::internal::GetCapturedStderr();
+    unsetenv("ALSA_CONFIG_PATH");
+    EXPECT_TRUE(opened);
+    EXPECT_EQ(printed.find("ALSA lib"), std::string::npos) << printed;
+}
+
 }  // namespace
