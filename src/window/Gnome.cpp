@@ -202,11 +202,7 @@ int Gnome::DressWidgets() {
     displayMenu = FindWidget("displayMenu");
     timeValueLabel = FindWidget("infoTimeValue");
     frameValueLabel = FindWidget("infoFrameValue");
-    if (frameValueLabel) {
-        XmString zero = XmStringCreateLocalized(const_cast<char*>("0"));
-        XtVaSetValues(frameValueLabel, XmNlabelString, zero, nullptr);
-        XmStringFree(zero);
-    }
+    KLXmGnome::SetLabel(frameValueLabel, "0");
     keysetTitleLabel = FindWidget("infoKeysetTitle");
     durationValueButton = FindWidget("infoDurationValue");
     create_error_flag();

@@ -216,8 +216,15 @@ class Gnome : public KLXmGnome, public virtual Ghost {
                      int value, void (*callback)(void*, int));
     int SetOption(CueRecognizer* r, const char* name, int index);
     void RecognizeProgress(CueRecognizer* r, float done);
-    // A labelled horizontal row "rc" for one control in a recognizer's container.
-    Widget add_control_row(Widget container, const char* name);
+    // The panels' controls: a labelled row "rc" for a new one, a slider and its value label
+    // (the record is the control's callback record, kept for the life of the process), and
+    // finding a slider again.
+    static void install_chirrup_host();
+    Widget control_row(CueRecognizer* r, const char* name, void** existing);
+    void add_scale(CueRecognizer* r, const char* name, Widget row, int low, int high, int at,
+                   int decimals, const std::string& shown, void* record);
+    Widget find_scale(CueRecognizer* r, const char* name, int* minimum, int* maximum,
+                      void** record);
 
     // --- Link dialog (GnomeLink.cpp)
     void create_link_dialog();

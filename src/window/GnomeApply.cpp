@@ -36,11 +36,8 @@ const int kMaxApplyKeysets = 10;
 
 Widget make(WidgetClass cls, const char* name, Widget parent, const char* label = nullptr) {
     Widget w = XtVaCreateManagedWidget(name, cls, parent, nullptr);
-    if (label) {
-        XmString s = XmStringCreateLocalized(const_cast<char*>(label));
-        XtVaSetValues(w, XmNlabelString, s, nullptr);
-        XmStringFree(s);
-    }
+    if (label)
+        KLXmGnome::SetLabel(w, label);
     KLXmGnome::RegisterWidget(w);
     return w;
 }

@@ -31,14 +31,6 @@
 namespace {
 const char kBuildStamp[] = "9704300208";
 
-void set_label(Widget w, const std::string& text) {
-    if (!w)
-        return;
-    XmString s = XmStringCreateLocalized(const_cast<char*>(text.c_str()));
-    XtVaSetValues(w, XmNlabelString, s, nullptr);
-    XmStringFree(s);
-}
-
 // A time in the form the program writes times (text, or binary when times are in binary).
 std::string time_text(CueTime t) {
     std::ostringstream out;
@@ -106,7 +98,7 @@ void Gnome::ShowStatus(const char* message) {
     std::string text = message ? message : "";
     while (!text.empty() && (text.back() == '\n' || text.back() == ' '))
         text.pop_back();
-    set_label(statusLine, text);
+    KLXmGnome::SetLabel(statusLine, text);
     // Shown at once, also in the middle of a long load.
     if (XtIsRealized(statusLine))
         XmUpdateDisplay(statusLine);
@@ -127,10 +119,10 @@ Boolean Gnome::status_idle_workproc(XtPointer gnome) {
 }
 
 void Gnome::DisplayTimecode(CueTime t) {
-    set_label(timeValueLabel, time_text(t));
+    KLXmGnome::SetLabel(timeValueLabel, time_text(t));
     std::ostringstream frames;
     frames << t.Ticks() * double(CueTime::default_fps) / 6000.0;
-    set_label(frameValueLabel, frames.str());
+    KLXmGnome::SetLabel(frameValueLabel, frames.str());
     if (Display* dpy = GetDisplay())
         XFlush(dpy);
 }
@@ -150,11 +142,12 @@ void Gnome::DisplayDuration(CueTime duration) {
     chart_follows_workspace();
     if (syncChart)
         syncChart->SetUserDuration(duration);
-    set_label(durationValueButton, time_text(duration));
+    KLXmGnome::SetLabel(durationValueButton, time_text(duration));
 }
 
 void Gnome::DisplayReferenceOffset(CueTime offset) {
-    set_label(refAdjustButton, KLFmt("Set Reference Time [%s]", time_text(offset).c_str()));
+    KLXmGnome::SetLabel(refAdjustButton,
+                        KLFmt("Set Reference Time [%s]", time_text(offset).c_str()));
 }
 
 void Gnome::DisplayReference(CueTime t) {

@@ -59,11 +59,8 @@ void stop_audition() {
 
 Widget make(WidgetClass cls, const char* name, Widget parent, const char* label = nullptr) {
     Widget w = XtVaCreateManagedWidget(name, cls, parent, nullptr);
-    if (label) {
-        XmString s = XmStringCreateLocalized(const_cast<char*>(label));
-        XtVaSetValues(w, XmNlabelString, s, nullptr);
-        XmStringFree(s);
-    }
+    if (label)
+        KLXmGnome::SetLabel(w, label);
     // Names other dialogs use too ("top_form", "frame", "done_button" ...) stay theirs.
     if (!KLXmGnome::FindWidget(name))
         KLXmGnome::RegisterWidget(w);
@@ -71,11 +68,7 @@ Widget make(WidgetClass cls, const char* name, Widget parent, const char* label 
 }
 
 void set_label(Widget w, const char* text) {
-    if (!w)
-        return;
-    XmString s = XmStringCreateLocalized(const_cast<char*>(text ? text : ""));
-    XtVaSetValues(w, XmNlabelString, s, nullptr);
-    XmStringFree(s);
+    KLXmGnome::SetLabel(w, text ? text : "");
 }
 
 void fill(Widget w, Widget above) {

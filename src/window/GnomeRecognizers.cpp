@@ -30,116 +30,19 @@
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
 
-
 namespace {
-
-// What a slider or option menu calls: the recognizer it currently serves and the plug-in's
-// callback. Kept for the life of the process (panels are never destroyed before it ends).
-struct SliderRecord {
-    CueRecognizer* recognizer = nullptr;
-    CueChirrupHost::IntCallback intCallback = nullptr;
-    CueChirrupHost::FloatCallback floatCallback = nullptr;
-    CueChirrupHost::OptionCallback optionCallback = nullptr;
-    Widget valueLabel = nullptr;
-    std::vector<Widget> buttons;  // an option menu's entries, in index order
-};
-std::vector<std::unique_ptr<SliderRecord>> theRecords;
-
-// Float sliders keep their value in thousandths on the integer scale.
-constexpr int kFloatScale = 1000;
-
-void set_label(Widget w, const std::string& text) {
-    if (!w)
-        return;
-    XmString s = XmStringCreateLocalized(const_cast<char*>(text.c_str()));
-    XtVaSetValues(w, XmNlabelString, s, nullptr);
-    XmStringFree(s);
-}
-
-std::string int_text(int value) {
-    return KLFmt(" %5d ", value);
-}
-std::string float_text(float value) {
-    return KLFmt("%8.3f", value);
-}
 
 // The panel (form dialog) that holds a recognizer's container.
 Widget panel_of(Widget container) {
     return container ? XtParent(container) : nullptr;
 }
 
-void int_changed_cb(Widget, XtPointer client, XtPointer call) {
-    auto* record = static_cast<SliderRecord*>(client);
-    const int value = static_cast<XmScaleCallbackStruct*>(call)->value;
-    set_label(record->valueLabel, int_text(value));
-    if (record->intCallback && record->recognizer)
-        record->intCallback(record->recognizer, value);
-}
-void int_drag_cb(Widget, XtPointer client, XtPointer call) {
-    set_label(static_cast<SliderRecord*>(client)->valueLabel,
-              int_text(static_cast<XmScaleCallbackStruct*>(call)->value));
-}
-void float_changed_cb(Widget, XtPointer client, XtPointer call) {
-    auto* record = static_cast<SliderRecord*>(client);
-    const float value = float(static_cast<XmScaleCallbackStruct*>(call)->value) / kFloatScale;
-    set_label(record->valueLabel, float_text(value));
-    if (record->floatCallback && record->recognizer)
-        record->floatCallback(record->recognizer, value);
-}
-void float_drag_cb(Widget, XtPointer client, XtPointer call) {
-    set_label(static_cast<SliderRecord*>(client)->valueLabel,
-              float_text(float(static_cast<XmScaleCallbackStruct*>(call)->value) / kFloatScale));
-}
-void option_cb(Widget w, XtPointer client, XtPointer) {
-    auto* record = static_cast<SliderRecord*>(client);
-    for (size_t i = 0; i < record->buttons.size(); ++i)
-        if (record->buttons[i] == w && record->optionCallback && record->recognizer)
-            record->optionCallback(record->recognizer, int(i));
-}
-
-// CueChirrup's host: the operations go to the one main window.
-class GnomeChirrupHost : public CueChirrupHost {
-  public:
-    int CreateFloatSlider(CueRecognizer* r, const char* name, float minimum, float maximum,
-                          float value, FloatCallback callback) override {
-        Gnome* g = TheGnome();
-        return g ? g->CreateFloatSlider(r, name, minimum, maximum, value, callback) : 0;
-    }
-    int SetFloatSlider(CueRecognizer* r, const char* name, float value) override {
-        Gnome* g = TheGnome();
-        return g ? g->SetFloatSlider(r, name, value) : 0;
-    }
-    int CreateIntSlider(CueRecognizer* r, const char* name, int minimum, int maximum, int value,
-                        IntCallback callback) override {
-        Gnome* g = TheGnome();
-        return g ? g->CreateIntSlider(r, name, minimum, maximum, value, callback) : 0;
-    }
-    int SetIntSlider(CueRecognizer* r, const char* name, int value) override {
-        Gnome* g = TheGnome();
-        return g ? g->SetIntSlider(r, name, value) : 0;
-    }
-    int CreateOption(CueRecognizer* r, const char* name, int count, const char* const* labels,
-                     int value, OptionCallback callback) override {
-        Gnome* g = TheGnome();
-        return g ? g->CreateOption(r, name, count, labels, value, callback) : 0;
-    }
-    int SetOption(CueRecognizer* r, const char* name, int index) override {
-        Gnome* g = TheGnome();
-        return g ? g->SetOption(r, name, index) : 0;
-    }
-    void Progress(CueRecognizer* r, float done) override {
-        if (Gnome* g = TheGnome())
-            g->RecognizeProgress(r, done);
-    }
-};
-GnomeChirrupHost theHost;
-
 }  // namespace
 
 // --- The catalogue, the menu and the panels
 
 void Gnome::load_recognizers() {
-    CueChirrup::SetHost(&theHost);
+    install_chirrup_host();
     theImp.recognizers.ScanDirectory(CueRecognizerCatalog::SearchPath().c_str());
 }
 
@@ -172,7 +75,7 @@ void Gnome::dress_recognizer_widgets() {
         Widget label = XtVaCreateManagedWidget("label", xmLabelWidgetClass, top, XmNtopAttachment,
                                                XmATTACH_FORM, XmNleftAttachment, XmATTACH_FORM,
                                                XmNrightAttachment, XmATTACH_FORM, nullptr);
-        set_label(label, KLFmt("Recognizer [%s]", key));
+        SetLabel(label, KLFmt("Recognizer [%s]", key));
         stash_recognizer_widget(key, "label", label, nullptr);
 
         Widget sep1 = XtVaCreateManagedWidget("horiz_separator", xmSeparatorWidgetClass, dialog,
@@ -205,7 +108,7 @@ void Gnome::dress_recognizer_widgets() {
                 XmNleftPosition, b.left, XmNrightAttachment, XmATTACH_POSITION, XmNrightPosition,
                 b.right, XmNtopAttachment, XmATTACH_FORM, XmNbottomAttachment, XmATTACH_FORM,
                 XmNtopOffset, 4, XmNbottomOffset, 4, nullptr);
-            set_label(w, b.label);
+            SetLabel(w, b.label);
             stash_recognizer_widget(key, b.label, w, nullptr);
         }
         XtRealizeWidget(XtParent(dialog));
@@ -232,8 +135,8 @@ void Gnome::ShowRecognizerGui(CueRecognizer* recognizer) {
     if (Widget w = find_recognizer_widget(name, "Recognize", nullptr))
         XtSetSensitive(w, recognizer->Configured());
     KLKeySet* keyset = theImp.GetKeySet(GetActiveKeyset());
-    set_label(find_recognizer_widget(name, "label", nullptr),
-              KLFmt("Recognizer [%s] (%s)", name, keyset && keyset->Name() ? keyset->Name() : ""));
+    SetLabel(find_recognizer_widget(name, "label", nullptr),
+             KLFmt("Recognizer [%s] (%s)", name, keyset && keyset->Name() ? keyset->Name() : ""));
     try {
         recognizer->UpdatePanel();
     } catch (const std::exception& e) {
@@ -288,174 +191,6 @@ Widget Gnome::find_recognizer_widget(const char* name, const char* item, void** 
         }
     }
     return nullptr;
-}
-
-// --- The plug-ins' controls
-
-int Gnome::CreateIntSlider(CueRecognizer* r, const char* name, int minimum, int maximum, int value,
-                           CueChirrupHost::IntCallback callback) {
-    if (!r || !name)
-        return 0;
-    void* found = nullptr;
-    if (find_recognizer_widget(r->Name(), name, &found) && found) {
-        static_cast<SliderRecord*>(found)->recognizer = r;
-        SetIntSlider(r, name, value);
-        return 0;
-    }
-    Widget container = find_recognizer_widget(r->Name(), nullptr, nullptr);
-    if (!container) {
-        std::fprintf(stderr, "Couldn't find widget %s\n", r->Name());
-        return 0;
-    }
-    if (maximum <= minimum)
-        maximum = minimum + 1;
-    value = std::min(std::max(value, minimum), maximum);
-    auto record = std::make_unique<SliderRecord>();
-    record->recognizer = r;
-    record->intCallback = callback;
-    Widget row = add_control_row(container, name);
-    Widget scale = XtVaCreateManagedWidget(
-        name, xmScaleWidgetClass, row, XmNorientation, XmHORIZONTAL, XmNminimum, minimum,
-        XmNmaximum, maximum, XmNvalue, value, XmNshowValue, False, XmNscaleWidth, 160, nullptr);
-    const std::string valueName = KLFmt("value-%s", name);
-    record->valueLabel =
-        XtVaCreateManagedWidget(valueName.c_str(), xmLabelWidgetClass, row, nullptr);
-    set_label(record->valueLabel, int_text(value));
-    XtAddCallback(scale, XmNvalueChangedCallback, int_changed_cb, record.get());
-    XtAddCallback(scale, XmNdragCallback, int_drag_cb, record.get());
-    stash_recognizer_widget(r->Name(), valueName.c_str(), record->valueLabel, nullptr);
-    stash_recognizer_widget(r->Name(), name, scale, record.get());
-    theRecords.push_back(std::move(record));
-    return 1;
-}
-
-int Gnome::SetIntSlider(CueRecognizer* r, const char* name, int value) {
-    void* found = nullptr;
-    Widget scale = r && name ? find_recognizer_widget(r->Name(), name, &found) : nullptr;
-    if (!scale || !found || !XmIsScale(scale)) {
-        std::fprintf(stderr, "Couldn't find slider %s\n", name ? name : "");
-        return 0;
-    }
-    int minimum = 0, maximum = 0;
-    XtVaGetValues(scale, XmNminimum, &minimum, XmNmaximum, &maximum, nullptr);
-    value = std::min(std::max(value, minimum), maximum);
-    XmScaleSetValue(scale, value);
-    set_label(static_cast<SliderRecord*>(found)->valueLabel, int_text(value));
-    return 1;
-}
-
-int Gnome::CreateFloatSlider(CueRecognizer* r, const char* name, float minimum, float maximum,
-                             float value, CueChirrupHost::FloatCallback callback) {
-    if (!r || !name)
-        return 0;
-    void* found = nullptr;
-    if (find_recognizer_widget(r->Name(), name, &found) && found) {
-        static_cast<SliderRecord*>(found)->recognizer = r;
-        SetFloatSlider(r, name, value);
-        return 0;
-    }
-    Widget container = find_recognizer_widget(r->Name(), nullptr, nullptr);
-    if (!container) {
-        std::fprintf(stderr, "Couldn't find widget %s\n", r->Name());
-        return 0;
-    }
-    const int low = int(std::lround(minimum * kFloatScale));
-    int high = int(std::lround(maximum * kFloatScale));
-    if (high <= low)
-        high = low + 1;
-    const int at = std::min(std::max(int(std::lround(value * kFloatScale)), low), high);
-    auto record = std::make_unique<SliderRecord>();
-    record->recognizer = r;
-    record->floatCallback = callback;
-    Widget row = add_control_row(container, name);
-    Widget scale = XtVaCreateManagedWidget(
-        name, xmScaleWidgetClass, row, XmNorientation, XmHORIZONTAL, XmNminimum, low, XmNmaximum,
-        high, XmNvalue, at, XmNdecimalPoints, 3, XmNshowValue, False, XmNscaleWidth, 160, nullptr);
-    const std::string valueName = KLFmt("value-%s", name);
-    record->valueLabel =
-        XtVaCreateManagedWidget(valueName.c_str(), xmLabelWidgetClass, row, nullptr);
-    set_label(record->valueLabel, float_text(float(at) / kFloatScale));
-    XtAddCallback(scale, XmNvalueChangedCallback, float_changed_cb, record.get());
-    XtAddCallback(scale, XmNdragCallback, float_drag_cb, record.get());
-    stash_recognizer_widget(r->Name(), valueName.c_str(), record->valueLabel, nullptr);
-    stash_recognizer_widget(r->Name(), name, scale, record.get());
-    theRecords.push_back(std::move(record));
-    return 1;
-}
-
-int Gnome::SetFloatSlider(CueRecognizer* r, const char* name, float value) {
-    void* found = nullptr;
-    Widget scale = r && name ? find_recognizer_widget(r->Name(), name, &found) : nullptr;
-    if (!scale || !found || !XmIsScale(scale)) {
-        std::fprintf(stderr, "Couldn't find slider %s\n", name ? name : "");
-        return 0;
-    }
-    int minimum = 0, maximum = 0;
-    XtVaGetValues(scale, XmNminimum, &minimum, XmNmaximum, &maximum, nullptr);
-    const int at = std::min(std::max(int(std::lround(value * kFloatScale)), minimum), maximum);
-    XmScaleSetValue(scale, at);
-    set_label(static_cast<SliderRecord*>(found)->valueLabel, float_text(float(at) / kFloatScale));
-    return 1;
-}
-
-int Gnome::CreateOption(CueRecognizer* r, const char* name, int count, const char* const* labels,
-                        int value, CueChirrupHost::OptionCallback callback) {
-    if (!r || !name)
-        return 0;
-    void* found = nullptr;
-    if (find_recognizer_widget(r->Name(), name, &found) && found) {
-        static_cast<SliderRecord*>(found)->recognizer = r;
-        SetOption(r, name, value);
-        return 0;
-    }
-    Widget container = find_recognizer_widget(r->Name(), nullptr, nullptr);
-    if (!container) {
-        std::fprintf(stderr, "Couldn't find widget %s\n", r->Name());
-        return 0;
-    }
-    auto record = std::make_unique<SliderRecord>();
-    record->recognizer = r;
-    record->optionCallback = callback;
-    Widget row = add_control_row(container, name);
-    const std::string menuName = KLFmt("%s-menu", name);
-    Widget pulldown = XmCreatePulldownMenu(row, const_cast<char*>(menuName.c_str()), nullptr, 0);
-    for (int i = 0; i < count; ++i) {
-        Widget b = XtVaCreateManagedWidget(labels[i] ? labels[i] : "", xmPushButtonWidgetClass,
-                                           pulldown, nullptr);
-        XtAddCallback(b, XmNactivateCallback, option_cb, record.get());
-        record->buttons.push_back(b);
-    }
-    Arg args[1];
-    XtSetArg(args[0], XmNsubMenuId, pulldown);
-    Widget option = XmCreateOptionMenu(row, const_cast<char*>(name), args, 1);
-    XtManageChild(option);
-    if (value >= 0 && value < count)
-        XtVaSetValues(option, XmNmenuHistory, record->buttons[size_t(value)], nullptr);
-    stash_recognizer_widget(r->Name(), name, option, record.get());
-    theRecords.push_back(std::move(record));
-    return 1;
-}
-
-int Gnome::SetOption(CueRecognizer* r, const char* name, int index) {
-    void* found = nullptr;
-    Widget option = r && name ? find_recognizer_widget(r->Name(), name, &found) : nullptr;
-    auto* record = static_cast<SliderRecord*>(found);
-    if (!option || !record || record->buttons.empty()) {
-        std::fprintf(stderr, "Couldn't find option %s\n", name ? name : "");
-        return 0;
-    }
-    if (index < 0 || index >= int(record->buttons.size()))
-        return 0;
-    XtVaSetValues(option, XmNmenuHistory, record->buttons[size_t(index)], nullptr);
-    return 1;
-}
-
-Widget Gnome::add_control_row(Widget container, const char* name) {
-    Widget row = XtVaCreateManagedWidget("rc", xmRowColumnWidgetClass, container, XmNorientation,
-                                         XmHORIZONTAL, nullptr);
-    Widget label = XtVaCreateManagedWidget("label", xmLabelWidgetClass, row, nullptr);
-    set_label(label, name);
-    return row;
 }
 
 // --- Callbacks

@@ -28,12 +28,7 @@
 
 namespace {
 void set_label(const char* name, const std::string& text) {
-    Widget w = KLXmGnome::FindWidget(name);
-    if (!w)
-        return;
-    XmString s = XmStringCreateLocalized(const_cast<char*>(text.c_str()));
-    XtVaSetValues(w, XmNlabelString, s, nullptr);
-    XmStringFree(s);
+    KLXmGnome::SetLabel(KLXmGnome::FindWidget(name), text);
 }
 }  // namespace
 
@@ -199,9 +194,7 @@ void Gnome::DressKeyset(int k) {
         button->SetButtonStyle(1);
         XtManageChild(button->GetWidget());
         Widget label = XmCreateLabel(tile, const_cast<char*>("tileLabel"), nullptr, 0);
-        XmString text = XmStringCreateLocalized(const_cast<char*>(name ? name : ""));
-        XtVaSetValues(label, XmNlabelString, text, nullptr);
-        XmStringFree(text);
+        KLXmGnome::SetLabel(label, name ? name : "");
         XtManageChild(label);
         set->GetKeyShapeImage(i);  // loads the picture
         tiles[k][i] = button;

@@ -200,6 +200,14 @@ Widget KLXmGnome::AddMenuToggle(Widget menu, const char* label, XtCallbackProc f
     return add_entry(menu, label ? label : "", function, clientData, position, true);
 }
 
+void KLXmGnome::SetLabel(Widget widget, const std::string& text) {
+    if (!widget)
+        return;
+    XmString s = XmStringCreateLocalized(const_cast<char*>(text.c_str()));
+    XtVaSetValues(widget, XmNlabelString, s, nullptr);
+    XmStringFree(s);
+}
+
 void KLXmGnome::EmptyMenu(Widget menu, int keep) {
     if (!menu)
         return;
