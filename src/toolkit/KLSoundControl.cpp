@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <atomic>
 #include <cmath>
+#include <cstdlib>
 #include <limits>
 #include <memory>
 #include <string>
@@ -63,7 +64,11 @@ struct Output {
     DeviceClock deviceClock;  // sound thread only
 };
 
-Output out;
+// Never destroyed: the program's statics (the workspace's sound, an audition's sample and
+// timer) may be destroyed after this file's, and a sound being destroyed still asks the
+// output to let go of it. The device itself is closed at exit, before any static is
+// destroyed (see Open), so the sound thread never outlives what it reads.
+Output& out = *new Output;
 float speed = 1.0f;
 
 void publish(double clock, double woke, double position) {
@@ -188,11 +193,21 @@ bool open_device(const char* driver) {
     return true;
 }
 
+// Closes the device when the program ends: registered after every static that exists
+// before the first Open is made, so it runs before their destructors free anything the
+// sound thread reads.
+void close_at_exit() {
+    KLSoundControl::Close();
+}
+
 }  // namespace
 
 bool KLSoundControl::Open() {
     if (out.device)
         return true;
+    static const bool closesAtExit = std::atexit(close_at_exit) == 0;
+    if (!closesAtExit)
+        KLWarning("The audio output cannot be closed when the program ends.\n");
     SDL_SetHint(SDL_HINT_NO_SIGNAL_HANDLERS, "1");
     if (!open_device(nullptr)) {
         KLWarning("No audio output could be opened (%s); sound is not heard.\n", SDL_GetError());

@@ -19,7 +19,8 @@ class KLSoundControl {
     static int Play(CueSound* sound, KLTimer* timer, CueTime offset);
     // Scrubbing: plays grains of `grainMs` milliseconds of `sound` at `*position` (a fraction
     // 0..1 of the sound's length) whenever it moves, silent while it rests, until Stop or the
-    // timer stops.
+    // timer stops. The sound thread reads `*position` as it plays: the caller stores it
+    // atomically (__atomic_store, relaxed) and keeps it until Stop.
     static int PlayDrag(CueSound* sound, KLTimer* timer, int grainMs, const float* position);
     // Stops whatever is playing.
     static void Stop();
