@@ -1,6 +1,7 @@
 #include "toolkit/KLSoundControl.h"
 
 #include <SDL2/SDL.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <atomic>
@@ -193,11 +194,15 @@ bool open_device(const char* driver) {
     return true;
 }
 
+// The process that opened the device: a child forked from it has no sound thread to stop.
+pid_t openedBy = 0;
+
 // Closes the device when the program ends: registered after every static that exists
 // before the first Open is made, so it runs before their destructors free anything the
 // sound thread reads.
 void close_at_exit() {
-    KLSoundControl::Close();
+    if (getpid() == openedBy)
+        KLSoundControl::Close();
 }
 
 }  // namespace
@@ -208,6 +213,7 @@ bool KLSoundControl::Open() {
     static const bool closesAtExit = std::atexit(close_at_exit) == 0;
     if (!closesAtExit)
         KLWarning("The audio output cannot be closed when the program ends.\n");
+    openedBy = getpid();
     SDL_SetHint(SDL_HINT_NO_SIGNAL_HANDLERS, "1");
     if (!open_device(nullptr)) {
         KLWarning("No audio output could be opened (%s); sound is not heard.\n", SDL_GetError());

@@ -12,11 +12,12 @@ constexpr int kMaxSignal = 65;
 KLSignalHandler handlers[kMaxSignal];
 void* handler_data[kMaxSignal];
 
-// Idle; an asynchronous signal noted, its handler waiting for the event loop; a handler
-// running (or about to), after which the program ends.
-enum State : int { kIdle, kPending, kHandling };
+// kIdle; a positive signal number: that asynchronous signal noted, its handler waiting for
+// the event loop; kHandling: a handler running (or about to), after which the program ends.
+// One atomic, so that the signal noted is never seen apart from the state.
+constexpr int kIdle = 0;
+constexpr int kHandling = -1;
 std::atomic<int> state{kIdle};
-std::atomic<int> pending{0};  // the noted signal while kPending
 std::atomic<KLSignalNotify> deferNotify{nullptr};
 std::atomic<unsigned> fallbackSeconds{0};
 static_assert(std::atomic<int>::is_always_lock_free, "used inside signal handlers");
@@ -52,9 +53,9 @@ void run_handler(int sig) {
 // SIGALRM while a deferred signal still waits: the event loop did not come back in time, so
 // its handler runs here after all.
 void fallback() {
-    int seen = kPending;
-    if (state.compare_exchange_strong(seen, kHandling))
-        run_handler(pending.load());
+    int seen = state.load();
+    if (seen > 0 && state.compare_exchange_strong(seen, kHandling))
+        run_handler(seen);
     // Otherwise a late alarm: the handler already runs, or nothing was deferred.
 }
 
@@ -70,10 +71,9 @@ void trampoline(int sig) {
         if (seen == kHandling)
             break;
         if (defer) {
-            if (seen == kPending)
+            if (seen > 0)
                 return;  // the handler of the one noted first is on its way
-            if (state.compare_exchange_weak(seen, kPending)) {
-                pending.store(sig);
+            if (state.compare_exchange_weak(seen, sig)) {
                 alarm(fallbackSeconds.load());
                 notify();
                 return;
@@ -148,7 +148,8 @@ void DeferAsynchronousSignals(KLSignalNotify notify, unsigned seconds) {
 }
 
 int DeferredSignal() {
-    return state.load() == kPending ? pending.load() : 0;
+    const int seen = state.load();
+    return seen > 0 ? seen : 0;
 }
 
 void RunDeferredSignal() {
@@ -157,8 +158,8 @@ void RunDeferredSignal() {
     sigset_t mask = handled_signals(), before;
     sigaddset(&mask, SIGALRM);
     pthread_sigmask(SIG_BLOCK, &mask, &before);
-    int seen = kPending;
-    if (state.compare_exchange_strong(seen, kHandling))
-        run_handler(pending.load());
+    int seen = state.load();
+    if (seen > 0 && state.compare_exchange_strong(seen, kHandling))
+        run_handler(seen);
     pthread_sigmask(SIG_SETMASK, &before, nullptr);
 }
