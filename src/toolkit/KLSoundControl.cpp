@@ -60,6 +60,7 @@ struct Output {
     std::atomic<unsigned> seq{0};
     std::atomic<double> handedClock{0.0}, handedPosition{kSilent};
     std::atomic<long> buffers{0};
+    std::atomic<long> sounding{0};
     std::atomic<long> cuts{0};
     std::atomic<double> handedWoke{0.0};
     DeviceClock deviceClock;  // sound thread only
@@ -78,6 +79,8 @@ void publish(double clock, double woke, double position) {
     out.handedWoke.store(woke, std::memory_order_relaxed);
     out.handedPosition.store(position, std::memory_order_relaxed);
     out.buffers.fetch_add(1, std::memory_order_relaxed);
+    if (!std::isnan(position))
+        out.sounding.fetch_add(1, std::memory_order_relaxed);
     out.seq.fetch_add(1, std::memory_order_acq_rel);
 }
 
@@ -225,6 +228,7 @@ bool KLSoundControl::Open() {
     out.voice = std::make_unique<SoundVoice>(out.rate, out.channels);
     out.handed = 0;
     out.buffers = 0;
+    out.sounding = 0;
     out.cuts = 0;
     out.deviceClock.Reset();
     out.pass = Pass{};
@@ -341,6 +345,7 @@ KLSoundControl::Handed KLSoundControl::LastHanded() {
         h.woke = out.handedWoke.load(std::memory_order_relaxed);
         h.position = out.handedPosition.load(std::memory_order_relaxed);
         h.buffers = out.buffers.load(std::memory_order_relaxed);
+        h.sounding = out.sounding.load(std::memory_order_relaxed);
         h.cuts = out.cuts.load(std::memory_order_relaxed);
         after = out.seq.load(std::memory_order_acquire);
     } while ((before & 1) || before != after);

@@ -51,8 +51,9 @@ class KLSoundControl {
         double clock;
         double woke;
         double position;
-        long buffers;  // buffers handed since Open
-        long cuts;     // times the position was cut back into step with the timer since Open
+        long buffers;   // buffers handed since Open
+        long sounding;  // of them, those with sound in them
+        long cuts;      // times the position was cut back into step with the timer since Open
     };
     static Handed LastHanded();
 };

@@ -357,14 +357,18 @@ TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
     EXPECT_EQ(label_of(L("keyshapeLabel")), "O") << "the demo links OW to O";
     // The sample reaches the output; a second press replaces it while it plays, and
     // dismissing the dialog silences it. The program then ends with the output still open.
-    const auto sounding = [] { return std::isfinite(KLSoundControl::LastHanded().position); };
+    const auto heard = [] { return KLSoundControl::LastHanded().sounding; };
+    long before = heard();
     guitest::Click(L("audition_button"));
-    ASSERT_TRUE(guitest::WaitFor(sounding)) << "driver " << KLSoundControl::DriverName();
+    ASSERT_TRUE(guitest::WaitFor([&] { return heard() > before; }))
+        << "driver " << KLSoundControl::DriverName();
+    before = heard();
     guitest::Click(L("audition_button"));
-    ASSERT_TRUE(guitest::WaitFor(sounding));
+    ASSERT_TRUE(guitest::WaitFor([&] { return heard() > before; }));
     guitest::Click(L("done_button"));
     EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(W("linkDialog")); }));
-    EXPECT_TRUE(guitest::WaitFor([&] { return !sounding(); })) << "Dismiss stops the audition";
+    EXPECT_TRUE(guitest::WaitFor([] { return std::isnan(KLSoundControl::LastHanded().position); }))
+        << "Dismiss stops the audition";
     click_panel("Phoneme", "Dismiss");
 }
 
