@@ -179,12 +179,15 @@ bool open_device(const char* driver) {
     want.freq = 48000;
     want.format = AUDIO_F32SYS;
     want.channels = 2;
-    want.samples = 512;  // a power of two: SDL 2.26 overruns its buffers with others
+    want.samples = 512;
     want.callback = feed;
+    // The buffer size is never left to the driver: SDL 2.26's silent driver rounds it up to a
+    // power of two without growing the buffer it hands to `feed`, which then writes past its
+    // end on every call (480 frames: 4096 bytes into 3840). Held at the size asked for, SDL
+    // rebuffers for a driver that wants another size, and the buffer always fits.
     out.device =
         SDL_OpenAudioDevice(nullptr, 0, &want, &have,
-                            SDL_AUDIO_ALLOW_FREQUENCY_CHANGE | SDL_AUDIO_ALLOW_CHANNELS_CHANGE |
-                                SDL_AUDIO_ALLOW_SAMPLES_CHANGE);
+                            SDL_AUDIO_ALLOW_FREQUENCY_CHANGE | SDL_AUDIO_ALLOW_CHANNELS_CHANGE);
     if (out.device == 0) {
         SDL_QuitSubSystem(SDL_INIT_AUDIO);
         return false;
