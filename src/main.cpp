@@ -7,11 +7,18 @@
 #include "toolkit/CuePrefs.h"
 #include "toolkit/CueTime.h"
 #include "toolkit/KLFilePath.h"
+#include "toolkit/xm/KLSignalPipe.h"
 #include "window/FallbackResources.h"
 #include "window/Gnome.h"
 #include "workspace/CommandLine.h"
 #include "workspace/ConsoleGhost.h"
 #include "workspace/Imp.h"
+
+namespace {
+// Seconds the event loop has to start the emergency save after a signal; after that the
+// signal handler saves by itself.
+constexpr unsigned kSignalFallbackSeconds = 5;
+}  // namespace
 
 int main(int argc, char** argv) {
     KLWire::Initialize();
@@ -51,6 +58,9 @@ int main(int argc, char** argv) {
                   << "\" for the window; use -B for batch mode." << std::endl;
         return 1;
     }
+    // A signal sent to the window (TERM, USR1, USR2) has the emergency save run by the event
+    // loop, where it cannot interrupt malloc or stdio halfway; faults still save at once.
+    KLSignalPipe::Install(KLXmGnome::AppContext(), kSignalFallbackSeconds);
     if (line.infile)
         gnome.PostLoadKeyset(line.infile->c_str());
     KLXmGnome::MainLoop();

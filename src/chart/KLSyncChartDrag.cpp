@@ -198,7 +198,9 @@ void KLSyncChart::scrub(int x, int phase) {
     const double s = geometry.FractionFromTime(CueTime());
     const double e = geometry.FractionFromTime(sound_length());
     const double f = geometry.IndicatorFraction();
-    scrubPosition = (s == e || f <= s) ? 0.0f : f >= e ? 1.0f : float((f - s) / (e - s));
+    // The sound thread reads the position as it plays: stored as an atomic.
+    float at = (s == e || f <= s) ? 0.0f : f >= e ? 1.0f : float((f - s) / (e - s));
+    __atomic_store(&scrubPosition, &at, __ATOMIC_RELAXED);
     if (phase == 0) {
         if (scrubTimer)
             return;
@@ -220,5 +222,6 @@ void KLSyncChart::stop_scrub() {
     std::this_thread::sleep_for(std::chrono::milliseconds(200));
     KLSoundControl::Stop();
     scrubTimer.reset();
-    scrubPosition = 0.0f;
+    float rest = 0.0f;
+    __atomic_store(&scrubPosition, &rest, __ATOMIC_RELAXED);
 }

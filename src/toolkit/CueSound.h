@@ -15,6 +15,9 @@ class CueSound {
     // Stops the sound output first when it is playing this sound.
     ~CueSound();
     CueSound(const CueSound&) = default;
+    // The sound output's thread may be reading a sound's samples: a sound is replaced by
+    // another object (whose destructor stops the output), never overwritten in place.
+    CueSound& operator=(const CueSound&) = delete;
     // Reads the sound file `path`; check Valid() afterwards.
     explicit CueSound(const char* path);
 
@@ -47,7 +50,8 @@ class CueSound {
     const std::vector<float>& Channel(int channel) const { return channels_.at(size_t(channel)); }
 
     std::unique_ptr<CueSound> Copy() const;
-    // Keeps only the frames of [startSeconds, endSeconds) (clamped to the sound).
+    // Keeps only the frames of [startSeconds, endSeconds) (clamped to the sound). Not on a
+    // sound being played: trim a Copy.
     void Trim(double startSeconds, double endSeconds);
     // The mix of all channels resampled to `rate` frames per second (16 kHz for recognizers);
     // empty for an empty sound or a rate outside 1/256 to 256 times the sound's own.

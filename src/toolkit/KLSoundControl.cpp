@@ -2,10 +2,12 @@
 
 #include <SDL2/SDL.h>
 #include <dlfcn.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <atomic>
 #include <cmath>
+#include <cstdlib>
 #include <limits>
 #include <memory>
 #include <string>
@@ -59,12 +61,17 @@ struct Output {
     std::atomic<unsigned> seq{0};
     std::atomic<double> handedClock{0.0}, handedPosition{kSilent};
     std::atomic<long> buffers{0};
+    std::atomic<long> sounding{0};
     std::atomic<long> cuts{0};
     std::atomic<double> handedWoke{0.0};
     DeviceClock deviceClock;  // sound thread only
 };
 
-Output out;
+// Never destroyed: the program's statics (the workspace's sound, an audition's sample and
+// timer) may be destroyed after this file's, and a sound being destroyed still asks the
+// output to let go of it. The device itself is closed at exit, before any static is
+// destroyed (see Open), so the sound thread never outlives what it reads.
+Output& out = *new Output;
 float speed = 1.0f;
 
 void publish(double clock, double woke, double position) {
@@ -73,6 +80,8 @@ void publish(double clock, double woke, double position) {
     out.handedWoke.store(woke, std::memory_order_relaxed);
     out.handedPosition.store(position, std::memory_order_relaxed);
     out.buffers.fetch_add(1, std::memory_order_relaxed);
+    if (!std::isnan(position))
+        out.sounding.fetch_add(1, std::memory_order_relaxed);
     out.seq.fetch_add(1, std::memory_order_acq_rel);
 }
 
@@ -196,12 +205,15 @@ bool open_device(const char* driver) {
     want.freq = 48000;
     want.format = AUDIO_F32SYS;
     want.channels = 2;
-    want.samples = 512;  // a power of two: SDL 2.26 overruns its buffers with others
+    want.samples = 512;
     want.callback = feed;
+    // The buffer size is never left to the driver: SDL 2.26's silent driver rounds it up to a
+    // power of two without growing the buffer it hands to `feed`, which then writes past its
+    // end on every call (480 frames: 4096 bytes into 3840). Held at the size asked for, SDL
+    // rebuffers for a driver that wants another size, and the buffer always fits.
     out.device =
         SDL_OpenAudioDevice(nullptr, 0, &want, &have,
-                            SDL_AUDIO_ALLOW_FREQUENCY_CHANGE | SDL_AUDIO_ALLOW_CHANNELS_CHANGE |
-                                SDL_AUDIO_ALLOW_SAMPLES_CHANGE);
+                            SDL_AUDIO_ALLOW_FREQUENCY_CHANGE | SDL_AUDIO_ALLOW_CHANNELS_CHANGE);
     if (out.device == 0) {
         SDL_QuitSubSystem(SDL_INIT_AUDIO);
         return false;
@@ -214,11 +226,26 @@ bool open_device(const char* driver) {
     return true;
 }
 
+// The process that opened the device: a child forked from it has no sound thread to stop.
+pid_t openedBy = 0;
+
+// Closes the device when the program ends: registered after every static that exists
+// before the first Open is made, so it runs before their destructors free anything the
+// sound thread reads.
+void close_at_exit() {
+    if (getpid() == openedBy)
+        KLSoundControl::Close();
+}
+
 }  // namespace
 
 bool KLSoundControl::Open() {
     if (out.device)
         return true;
+    static const bool closesAtExit = std::atexit(close_at_exit) == 0;
+    if (!closesAtExit)
+        KLWarning("The audio output cannot be closed when the program ends.\n");
+    openedBy = getpid();
     SDL_SetHint(SDL_HINT_NO_SIGNAL_HANDLERS, "1");
     if (quietAudioLibrary)
         silence_alsa();
@@ -232,6 +259,7 @@ bool KLSoundControl::Open() {
     out.voice = std::make_unique<SoundVoice>(out.rate, out.channels);
     out.handed = 0;
     out.buffers = 0;
+    out.sounding = 0;
     out.cuts = 0;
     out.deviceClock.Reset();
     out.pass = Pass{};
@@ -349,6 +377,7 @@ KLSoundControl::Handed KLSoundControl::LastHanded() {
         h.woke = out.handedWoke.load(std::memory_order_relaxed);
         h.position = out.handedPosition.load(std::memory_order_relaxed);
         h.buffers = out.buffers.load(std::memory_order_relaxed);
+        h.sounding = out.sounding.load(std::memory_order_relaxed);
         h.cuts = out.cuts.load(std::memory_order_relaxed);
         after = out.seq.load(std::memory_order_acquire);
     } while ((before & 1) || before != after);

@@ -19,7 +19,8 @@ class KLSoundControl {
     static int Play(CueSound* sound, KLTimer* timer, CueTime offset);
     // Scrubbing: plays grains of `grainMs` milliseconds of `sound` at `*position` (a fraction
     // 0..1 of the sound's length) whenever it moves, silent while it rests, until Stop or the
-    // timer stops.
+    // timer stops. The sound thread reads `*position` as it plays: the caller stores it
+    // atomically (__atomic_store, relaxed) and keeps it until Stop.
     static int PlayDrag(CueSound* sound, KLTimer* timer, int grainMs, const float* position);
     // Stops whatever is playing.
     static void Stop();
@@ -51,8 +52,9 @@ class KLSoundControl {
         double clock;
         double woke;
         double position;
-        long buffers;  // buffers handed since Open
-        long cuts;     // times the position was cut back into step with the timer since Open
+        long buffers;   // buffers handed since Open
+        long sounding;  // of them, those with sound in them
+        long cuts;      // times the position was cut back into step with the timer since Open
     };
     static Handed LastHanded();
 };

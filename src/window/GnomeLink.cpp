@@ -44,17 +44,15 @@ LinkWidgets theLink;
 // The target's picture being shown (the view borrows it).
 std::unique_ptr<KLImageSGI> theTargetPicture;
 // The sound being auditioned and the timer that paces it. The sound output reads them from
-// its own thread, so they are replaced only after KLSoundControl::Stop and are never
-// destroyed when the process ends (the output may still be running then).
-CueSound* theAuditionSound = nullptr;
-KLTimer* theAuditionTimer = nullptr;
+// its own thread, so they are replaced only after KLSoundControl::Stop (the output closes
+// its device at exit before statics such as these are destroyed).
+std::unique_ptr<CueSound> theAuditionSound;
+std::unique_ptr<KLTimer> theAuditionTimer;
 
 void stop_audition() {
     KLSoundControl::Stop();
-    delete theAuditionSound;
-    theAuditionSound = nullptr;
-    delete theAuditionTimer;
-    theAuditionTimer = nullptr;
+    theAuditionSound.reset();
+    theAuditionTimer.reset();
 }
 
 Widget make(WidgetClass cls, const char* name, Widget parent, const char* label = nullptr) {
@@ -318,11 +316,11 @@ void Gnome::link_audition_cb(Widget, XtPointer client, XtPointer) {
             g->Inform(sound->ErrorText().c_str(), "Dismiss");
         return;
     }
-    theAuditionTimer =
-        new KLTimer(CueTime(), CueTime::FromSeconds(double(sound->FrameCount()) / sound->Rate()));
-    theAuditionSound = sound.release();
+    theAuditionTimer = std::make_unique<KLTimer>(
+        CueTime(), CueTime::FromSeconds(double(sound->FrameCount()) / sound->Rate()));
+    theAuditionSound = std::move(sound);
     theAuditionTimer->start();
-    KLSoundControl::Play(theAuditionSound, theAuditionTimer, CueTime());
+    KLSoundControl::Play(theAuditionSound.get(), theAuditionTimer.get(), CueTime());
 }
 
 void Gnome::link_done_cb(Widget, XtPointer, XtPointer) {

@@ -1,0 +1,163 @@
+// Signal handlers deferred to an event loop: an asynchronous signal is only noted inside the
+// signal handler and its handler runs when the loop asks; faults, a loop that never comes back
+// and a second signal during the handler behave as without deferral. Each case runs in a child
+// process, which the signal ends.
+
+#include <fcntl.h>
+#include <poll.h>
+#include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
+#include "toolkit/OnSignal.h"
+#include "toolkit_test_util.h"
+
+namespace {
+
+int loopPipe[2];    // the "event loop" is woken through this pipe
+int reportPipe[2];  // the child tells the test what happened, in order
+
+void report(const char* text) {
+    const ssize_t n = write(reportPipe[1], text, strlen(text));
+    (void)n;
+}
+
+void wake_loop() {
+    const char byte = 1;
+    const ssize_t n = write(loopPipe[1], &byte, 1);
+    (void)n;
+}
+
+bool loop_woken() {
+    struct pollfd p = {loopPipe[0], POLLIN, 0};
+    return poll(&p, 1, 0) == 1;
+}
+
+// The handler under test: says which signal it runs for; `raiseInside` raises a second
+// signal from inside it, as a fault or another signal during an emergency save would.
+int raiseInside = 0;
+void handler(int sig, void*) {
+    report(("handler " + std::to_string(sig) + ";").c_str());
+    if (raiseInside)
+        ::raise(raiseInside);
+    report("handler done;");
+}
+
+struct Deferral {
+    const char* name;
+    void (*child)();     // runs in the child after the handlers are installed and deferred
+    int endedBy;         // the signal that ends the child
+    const char* events;  // what the child reported, in order
+};
+
+// The loop asks for the noted signal's handler once woken.
+void noted_then_run_by_the_loop() {
+    ::raise(SIGTERM);
+    report(DeferredSignal() == SIGTERM ? "noted;" : "not noted;");
+    report(loop_woken() ? "woken;" : "not woken;");
+    RunDeferredSignal();
+}
+
+// USR1 and USR2 are deferred as well; a second asynchronous signal while one waits is ignored.
+void second_while_waiting_is_ignored() {
+    ::raise(SIGUSR1);
+    ::raise(SIGUSR2);
+    ::raise(SIGTERM);
+    report(DeferredSignal() == SIGUSR1 ? "noted;" : "not noted;");
+    RunDeferredSignal();
+}
+
+// The loop never comes back: the alarm runs the handler inside the signal handler.
+void loop_never_comes_back() {
+    ::raise(SIGTERM);
+    report("noted;");
+    for (;;)
+        ::pause();
+}
+
+// A fault while a signal waits saves at once, for the fault.
+void fault_while_waiting() {
+    ::raise(SIGTERM);
+    report("noted;");
+    ::raise(SIGSEGV);
+    report("survived;");
+}
+
+// A fault is never deferred.
+void fault_is_not_deferred() {
+    ::raise(SIGBUS);
+    report("survived;");
+}
+
+// A second signal while the loop runs the handler ends the program at once, by that signal.
+void second_signal_during_the_handler() {
+    raiseInside = SIGTERM;
+    ::raise(SIGUSR1);
+    RunDeferredSignal();
+}
+
+// With nothing waiting, the loop's call does nothing.
+void nothing_waiting() {
+    RunDeferredSignal();
+    report("nothing;");
+    ::raise(SIGTERM);
+    RunDeferredSignal();
+}
+
+class DeferredSignals : public ::testing::TestWithParam<Deferral> {};
+
+TEST_P(DeferredSignals, RunAsTheLoopAsksAndEndTheProgramAsBefore) {
+    const Deferral& c = GetParam();
+    ASSERT_EQ(pipe(loopPipe), 0);
+    ASSERT_EQ(pipe(reportPipe), 0);
+    fcntl(loopPipe[1], F_SETFL, O_NONBLOCK);
+    const pid_t pid = fork();
+    ASSERT_GE(pid, 0);
+    if (pid == 0) {
+        struct rlimit noCore = {0, 0};
+        setrlimit(RLIMIT_CORE, &noCore);
+        for (int sig : {SIGSEGV, SIGBUS, SIGTERM, SIGUSR1, SIGUSR2})
+            OnSignal(sig, handler, nullptr);
+        DeferAsynchronousSignals(wake_loop, 1);
+        c.child();
+        _exit(99);
+    }
+    close(reportPipe[1]);
+    std::string events;
+    char buffer[256];
+    for (ssize_t n; (n = read(reportPipe[0], buffer, sizeof buffer)) > 0;)
+        events.append(buffer, size_t(n));
+    int status = 0;
+    ASSERT_EQ(waitpid(pid, &status, 0), pid);
+    close(reportPipe[0]);
+    close(loopPipe[0]);
+    close(loopPipe[1]);
+    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == c.endedBy)
+        << (WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
+                              : "signal " + std::to_string(WTERMSIG(status)));
+    EXPECT_EQ(events, c.events);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Cases, DeferredSignals,
+    ::testing::Values(
+        Deferral{"NotedThenRunByTheLoop", noted_then_run_by_the_loop, SIGTERM,
+                 "noted;woken;handler 15;handler done;"},
+        Deferral{"SecondWhileWaitingIsIgnored", second_while_waiting_is_ignored, SIGUSR1,
+                 "noted;handler 10;handler done;"},
+        Deferral{"LoopNeverComesBack", loop_never_comes_back, SIGTERM,
+                 "noted;handler 15;handler done;"},
+        Deferral{"FaultWhileWaiting", fault_while_waiting, SIGSEGV,
+                 "noted;handler 11;handler done;"},
+        Deferral{"FaultIsNotDeferred", fault_is_not_deferred, SIGBUS, "handler 7;handler done;"},
+        Deferral{"SecondSignalDuringTheHandler", second_signal_during_the_handler, SIGTERM,
+                 "handler 10;"},
+        Deferral{"NothingWaiting", nothing_waiting, SIGTERM, "nothing;handler 15;handler done;"}),
+    [](const auto& info) { return std::string(info.param.name); });
+
+}  // namespace

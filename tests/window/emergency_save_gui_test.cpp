@@ -1,0 +1,217 @@
+// The emergency save of a running window: a signal sent to it (TERM, USR1) is saved by the
+// event loop, not inside the signal handler, so a signal that interrupts the program while it
+// holds a lock (malloc's, stdio's) does not deadlock the save. The window runs in a child
+// process with the demo keyset and track, set up as the program's entry sets it up; the saved
+// files must load back as what the window held.
+
+#include <gtest/gtest.h>
+#include <poll.h>
+#include <pthread.h>
+#include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <Xm/Xm.h>
+#include <algorithm>
+#include <chrono>
+#include <csignal>
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "model/KLKeySet.h"
+#include "model/KLKeyTrack.h"
+#include "testkit/TempDir.h"
+#include "toolkit/SafeFile.h"
+#include "toolkit/xm/KLSignalPipe.h"
+#include "toolkit/xm/KLXmGnome.h"
+#include "window/DemoProject.h"
+#include "window/Gnome.h"
+#include "window/WindowTestUtil.h"
+#include "workspace/Imp.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+struct SignalCase {
+    int signal;
+    // Raised by the event loop's own thread while it holds a lock that the save also takes
+    // (as malloc's arena lock would be), rather than sent by another process.
+    bool raisedHoldingALock;
+};
+
+void PrintTo(const SignalCase& c, std::ostream* os) {
+    *os << sigabbrev_np(c.signal) << (c.raisedHoldingALock ? " raised holding a lock" : " sent");
+}
+
+int reportEnd = -1;  // the child's end of the pipe it reports on
+pthread_mutex_t theLock;
+SignalCase theCase;
+
+void report(const std::string& text) {
+    const ssize_t n = write(reportEnd, text.data(), text.size());
+    (void)n;
+}
+
+// The save's first file opens: it takes the lock, as a save that mallocs takes malloc's.
+void take_the_lock(SafeFile::Stage stage) {
+    if (stage != SafeFile::Stage::Opened)
+        return;
+    if (pthread_mutex_lock(&theLock) != 0) {
+        report("the save would deadlock;");
+        return;
+    }
+    pthread_mutex_unlock(&theLock);
+}
+
+void send_inside_the_lock(XtPointer, XtIntervalId*) {
+    pthread_mutex_lock(&theLock);
+    ::raise(theCase.signal);
+    pthread_mutex_unlock(&theLock);
+}
+
+// The child: the window with the demo, the signal pipe installed as the entry does, then
+// the event loop for good. Never returns.
+[[noreturn]] void run_window(const std::string& project, const std::string& work) {
+    struct rlimit noCore = {0, 0};
+    setrlimit(RLIMIT_CORE, &noCore);
+    pthread_mutexattr_t attributes;
+    pthread_mutexattr_init(&attributes);
+    pthread_mutexattr_settype(&attributes, PTHREAD_MUTEX_ERRORCHECK);
+    pthread_mutex_init(&theLock, &attributes);
+    if (chdir(work.c_str()) != 0 || !std::freopen((work + "/../child.err").c_str(), "w", stderr))
+        _exit(120);
+    windowtest::TheWindow();
+    if (theImp.LoadKeyset((project + "/misc_data/demo.kset").c_str()) != 1 ||
+        theImp.LoadTrack((project + "/misc_data/demo.track").c_str()) != 1 ||
+        !KLSignalPipe::Install(KLXmGnome::AppContext(), 5))
+        _exit(121);
+    const KLKeySet* keyset = theImp.GetKeySet(0);
+    const KLKeyTrack* track = theImp.GetKeyTrack(0);
+    if (!keyset || !track || !theImp.sound)
+        _exit(122);
+    SafeFile::SetStageHook(take_the_lock);
+    report("ready " + std::to_string(theImp.keysetCount) + " " +
+           std::to_string(keyset->keyShapeCount) + " " + std::to_string(track->events.Count()) +
+           ";");
+    if (theCase.raisedHoldingALock)
+        XtAppAddTimeOut(KLXmGnome::AppContext(), 50, send_inside_the_lock, nullptr);
+    KLXmGnome::MainLoop();
+    _exit(123);
+}
+
+std::string read_file(const std::string& path) {
+    std::ifstream in(path);
+    std::stringstream text;
+    text << in.rdbuf();
+    return text.str();
+}
+
+class WindowEmergencySave : public ::testing::TestWithParam<SignalCase> {
+  protected:
+    // Reads what the child reports until it closes its end or `seconds` pass.
+    std::string ReadReports(int fd, double seconds) {
+        std::string text;
+        auto limit = std::chrono::steady_clock::now() + std::chrono::duration<double>(seconds);
+        for (;;) {
+            struct pollfd p = {fd, POLLIN, 0};
+            if (std::chrono::steady_clock::now() > limit || poll(&p, 1, 50) < 0)
+                return text;
+            if (!(p.revents & (POLLIN | POLLHUP)))
+                continue;
+            char buffer[256];
+            const ssize_t n = read(fd, buffer, sizeof buffer);
+            if (n <= 0)
+                return text;
+            text.append(buffer, size_t(n));
+            if (text.find(';') != std::string::npos && !readToEnd_)
+                return text;
+        }
+    }
+    // The child's wait status, killing it if it has not ended within `seconds`.
+    int Wait(pid_t pid, double seconds) {
+        auto limit = std::chrono::steady_clock::now() + std::chrono::duration<double>(seconds);
+        int status = 0;
+        while (waitpid(pid, &status, WNOHANG) == 0) {
+            if (std::chrono::steady_clock::now() > limit) {
+                kill(pid, SIGKILL);
+                waitpid(pid, &status, 0);
+                ADD_FAILURE() << "the window did not end";
+                return -1;
+            }
+            poll(nullptr, 0, 10);
+        }
+        return status;
+    }
+
+    bool readToEnd_ = false;
+};
+
+TEST_P(WindowEmergencySave, TheEventLoopSavesFilesThatLoadBack) {
+    theCase = GetParam();
+    const std::string project = windowtest::DemoProject();
+    testkit::TempDir dir;
+    const std::string work = dir / "work";
+    fs::create_directories(work);
+    int reports[2];
+    ASSERT_EQ(pipe(reports), 0);
+    const pid_t pid = fork();
+    ASSERT_GE(pid, 0);
+    if (pid == 0) {
+        close(reports[0]);
+        reportEnd = reports[1];
+        run_window(project, work);
+    }
+    close(reports[1]);
+    int keysets = 0, shapes = 0, events = 0;
+    const std::string ready = ReadReports(reports[0], 60);
+    ASSERT_EQ(std::sscanf(ready.c_str(), "ready %d %d %d;", &keysets, &shapes, &events), 3)
+        << "the window did not come up: " << ready << read_file(dir / "child.err");
+    if (!theCase.raisedHoldingALock)
+        kill(pid, theCase.signal);
+    readToEnd_ = true;
+    const std::string later = ReadReports(reports[0], 30);
+    close(reports[0]);
+    const int status = Wait(pid, 30);
+    EXPECT_EQ(later, "") << "the save ran inside the signal handler, holding the lock";
+    ASSERT_TRUE(WIFEXITED(status)) << "ended by signal " << WTERMSIG(status);
+    EXPECT_EQ(WEXITSTATUS(status), 255);
+    const std::string said = read_file(dir / "child.err");
+    const std::string saved =
+        "EMERGENCY SAVE ON SIGNAL " + std::to_string(theCase.signal) + " ... Done.\n";
+    EXPECT_TRUE(said.size() >= saved.size() &&
+                said.compare(said.size() - saved.size(), saved.size(), saved) == 0)
+        << said;
+
+    std::vector<std::string> files;
+    for (const auto& e : fs::directory_iterator(work))
+        files.push_back(e.path().filename().string());
+    std::sort(files.begin(), files.end());
+    EXPECT_EQ(files, (std::vector<std::string>{"_m.keyset", "_m.track"})) << "no temporaries";
+
+    theImp.batchMode = 1;
+    ASSERT_EQ(theImp.LoadKeyset((work + "/_m.keyset").c_str()), 1);
+    ASSERT_EQ(theImp.LoadTrack((work + "/_m.track").c_str()), 1);
+    ASSERT_EQ(theImp.keysetCount, keysets);
+    ASSERT_NE(theImp.GetKeySet(0), nullptr);
+    EXPECT_STREQ(theImp.GetKeySet(0)->Name(), "mouth");
+    EXPECT_EQ(theImp.GetKeySet(0)->keyShapeCount, shapes);
+    ASSERT_NE(theImp.GetKeyTrack(0), nullptr);
+    EXPECT_EQ(theImp.GetKeyTrack(0)->events.Count(), events);
+    EXPECT_EQ(fs::path(theImp.soundFile).filename(), "dialogue.aiff");
+}
+
+INSTANTIATE_TEST_SUITE_P(Signals, WindowEmergencySave,
+                         ::testing::Values(SignalCase{SIGTERM, false}, SignalCase{SIGUSR1, false},
+                                           SignalCase{SIGTERM, true}, SignalCase{SIGUSR2, true}),
+                         [](const auto& info) {
+                             return std::string(sigabbrev_np(info.param.signal)) +
+                                    (info.param.raisedHoldingALock ? "_RaisedHoldingALock"
+                                                                   : "_Sent");
+                         });
+
+}  // namespace
