@@ -115,7 +115,7 @@ int KLWire::StoreChannel(OrDagNode* node, int channel, int count, const CueTime*
     if (!ChannelCurve::FromApplyArrays(count, times, values, inTangents, outTangents, &keys)) {
         return 0;
     }
-    node->document()->SetCurve(node->index(), channel, keys, alwaysClearChannel != 0);
+    node->document()->SetCurve(node->index(), channel, std::move(keys), alwaysClearChannel != 0);
     return 1;
 }
 

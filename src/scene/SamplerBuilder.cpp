@@ -113,9 +113,20 @@ bool slerp_fits(const std::vector<double>& times, const std::vector<EulerRotatio
 
 SamplerBuilder::SamplerBuilder(const ChannelCurve* const curves[3], const double rest[3], int fps)
     : fps_(fps > 0 ? fps : 30) {
+    bool anyMoving = false;
     for (int a = 0; a < 3; ++a) {
         curves_[a] = curves[a] && !curves[a]->empty() ? curves[a] : nullptr;
         rest_[a] = rest[a];
+        anyMoving = anyMoving || (curves_[a] && !curves_[a]->Constant());
+    }
+    for (int a = 0; a < 3; ++a) {
+        // An axis that holds one value throughout is written as that value: its key times
+        // bring nothing the other axes need, so they neither widen the union nor make pieces.
+        // (When no axis moves the curves are kept, so that the path stays animated.)
+        if (anyMoving && curves_[a] && curves_[a]->Constant()) {
+            rest_[a] = curves_[a]->keys().front().value;
+            curves_[a] = nullptr;
+        }
         lead_ = lead_ ? lead_ : curves_[a];
     }
 }
@@ -267,34 +278,36 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
         }
     }
     out->interpolation = "LINEAR";
-    out->times.reserve(kept.size());
-    out->values.reserve(kept.size() * 4);
-    for (size_t n = 0; n < kept.size(); ++n) {
-        out->times.push_back(stored(times[kept[n]]));
-        for (double v : q[n]) {
-            out->values.push_back(stored(v));
+    out->times.resize(kept.size());
+    out->values.resize(kept.size() * 4);
+    float* v = out->values.data();
+    for (size_t n = 0; n < kept.size(); ++n, v += 4) {
+        out->times[n] = stored(times[kept[n]]);
+        for (size_t c = 0; c < 4; ++c) {
+            v[c] = stored(q[n][c]);
         }
     }
     return true;
 }
 
 void SamplerBuilder::keysExact(BuiltSampler* out) const {
-    bool cubic = out->interpolation == "CUBICSPLINE";
+    const bool cubic = out->interpolation == "CUBICSPLINE";
     const auto& lead = lead_->keys();
-    out->times.reserve(lead.size());
-    out->values.reserve(lead.size() * (cubic ? 9 : 3));
-    for (size_t k = 0; k < lead.size(); ++k) {
-        out->times.push_back(stored(lead[k].time));
-        for (int part = cubic ? 0 : 1; part < (cubic ? 3 : 2); ++part) {
-            for (int a = 0; a < 3; ++a) {
-                const ChannelCurve* c = curves_[a];
-                double v = 0;
-                if (part == 1) {
-                    v = c ? c->keys()[k].value : rest_[a];
-                } else if (c) {
-                    v = part == 0 ? c->InSlope(k) : c->OutSlope(k);
-                }
-                out->values.push_back(stored(v));
+    const size_t n = lead.size(), stride = cubic ? 9 : 3;
+    out->times.resize(n);
+    out->values.resize(n * stride);
+    for (size_t k = 0; k < n; ++k) {
+        out->times[k] = stored(lead[k].time);
+    }
+    // Axis by axis into the interleaved values: in-tangents, values, out-tangents of each key.
+    for (int a = 0; a < 3; ++a) {
+        const ChannelCurve* c = curves_[a];
+        float* v = out->values.data() + (cubic ? 3 : 0) + a;
+        for (size_t k = 0; k < n; ++k, v += stride) {
+            v[0] = stored(c ? c->keys()[k].value : rest_[a]);
+            if (cubic) {
+                v[-3] = c ? stored(c->InSlope(k)) : 0.0f;
+                v[3] = c ? stored(c->OutSlope(k)) : 0.0f;
             }
         }
     }
@@ -306,24 +319,25 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     out->interpolation = "CUBICSPLINE";
     std::vector<double> times = unionTimes();
     std::vector<double> axis[3], in[3], leave[3];
-    evaluate(times, axis);
     for (int a = 0; a < 3; ++a) {
         if (curves_[a]) {
-            curves_[a]->SlopesSorted(times, false, &in[a]);
-            curves_[a]->SlopesSorted(times, true, &leave[a]);
+            curves_[a]->SampleSorted(times, &axis[a], &in[a], &leave[a]);
         } else {
+            axis[a].assign(times.size(), rest_[a]);
             in[a].assign(times.size(), 0.0);
             leave[a].assign(times.size(), 0.0);
         }
     }
-    out->times.reserve(times.size());
-    out->values.reserve(times.size() * 9);
-    for (size_t k = 0; k < times.size(); ++k) {
-        out->times.push_back(stored(times[k]));
-        for (const std::vector<double>* part : {in, axis, leave}) {
-            for (int a = 0; a < 3; ++a) {
-                out->values.push_back(stored(part[a][k]));
-            }
+    const size_t n = times.size();
+    out->times.resize(n);
+    out->values.resize(n * 9);
+    float* v = out->values.data();
+    for (size_t k = 0; k < n; ++k, v += 9) {
+        out->times[k] = stored(times[k]);
+        for (int a = 0; a < 3; ++a) {
+            v[a] = stored(in[a][k]);
+            v[3 + a] = stored(axis[a][k]);
+            v[6 + a] = stored(leave[a][k]);
         }
     }
 }

@@ -15,7 +15,8 @@ struct BuiltSampler {
 };
 
 // Builds the sampler of one node path (translation, rotation or scale) from the key curves of
-// its three axes. What is written how:
+// its three axes. An axis whose curve holds one value throughout counts as unanimated at that
+// value (its key times are not needed) unless no axis moves. What is written how:
 //   - translation or scale whose animated axes share their key times: the keys themselves,
 //     LINEAR when every segment is a straight line, STEP when every one is a step, else
 //     CUBICSPLINE with the keys' slopes (exact);

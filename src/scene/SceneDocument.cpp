@@ -19,6 +19,17 @@ const char* const kPaths[3] = {"translation", "rotation", "scale"};
 constexpr double kMaxSeconds = 360000.0;
 const char* const kNotRegular = " is not a regular file";
 
+// Whether each key lies later than the one before by more than ChannelCurve::Merge's "same
+// time", so that merging them one by one into an empty curve would keep them as they are.
+bool separate_times(const std::vector<ChannelCurve::Key>& keys) {
+    for (size_t k = 1; k < keys.size(); ++k) {
+        if (!(keys[k].time > keys[k - 1].time + ChannelCurve::kSameTime)) {
+            return false;
+        }
+    }
+    return true;
+}
+
 uint32_t read_u32(const unsigned char* p) {
     return uint32_t(p[0]) | uint32_t(p[1]) << 8 | uint32_t(p[2]) << 16 | uint32_t(p[3]) << 24;
 }
@@ -412,19 +423,19 @@ ChannelCurve* SceneDocument::Curve(int node, int channel) const {
     return curves_[size_t(node)][size_t(channel)].get();
 }
 
-size_t SceneDocument::SetCurve(int node, int channel, const std::vector<ChannelCurve::Key>& keys,
+size_t SceneDocument::SetCurve(int node, int channel, std::vector<ChannelCurve::Key> keys,
                                bool clearFirst) {
     auto& slot = curves_[size_t(node)][size_t(channel)];
     if (clearFirst || !slot) {
         slot = std::make_unique<ChannelCurve>();
     }
-    if (slot->empty()) {
-        // Keys in time order, as the scene interface gives them, are taken as they are; of
-        // two at one time the later wins, as Merge would have it.
-        slot->keys().reserve(keys.size());
-    }
-    for (const ChannelCurve::Key& k : keys) {
-        slot->Merge(k);
+    if (slot->empty() && separate_times(keys)) {
+        slot->keys() = std::move(keys);  // in time order, no two at one time: taken as they are
+    } else {
+        // Of two keys at one time the later wins, as Merge has it.
+        for (const ChannelCurve::Key& k : keys) {
+            slot->Merge(k);
+        }
     }
     size_t dropped = slot->TrimBefore(0.0);
     if (slot->empty()) {

@@ -41,8 +41,7 @@ class SceneDocument {
     // Replaces (or with `clearFirst` false, merges keys into) one channel's curve and marks the
     // channel for rewriting at the next Store. An empty key list removes the curve. glTF has no
     // time before 0: the curve is cut at time 0 (TrimBefore); returns the keys that dropped.
-    size_t SetCurve(int node, int channel, const std::vector<ChannelCurve::Key>& keys,
-                    bool clearFirst);
+    size_t SetCurve(int node, int channel, std::vector<ChannelCurve::Key> keys, bool clearFirst);
     // Whether any channel of the node, or of its path (0 translation, 1 rotation, 2 scale),
     // was set since the last Store.
     bool Touched(int node) const { return touched_[size_t(node)] != 0; }

@@ -163,6 +163,24 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
         }
     }
     ExpectValidGltf(out);
+    // An axis that holds one value at key times of its own adds none of them: the moving
+    // axis's keys alone, exact, with the held axis at its value throughout.
+    ASSERT_TRUE(scene.Open(out));
+    a = scene.Fetch("a");
+    ASSERT_EQ(StoreKeys(a.get(), 0, {{0, 0, 0, 0}, {3000, 4, 0, 0}, {6000, 1, 0, 0}}), 1);
+    ASSERT_EQ(StoreKeys(a.get(), 2, {{1000, 2, 1, 1}, {2500, 2, 2, 0}, {9000, 2, 0, 1}}), 1);
+    back = StoreAndRead();
+    ASSERT_TRUE(back);
+    w = WrittenSampler(back->model(), 0, "translation");
+    EXPECT_EQ(w.interpolation, "CUBICSPLINE");
+    EXPECT_EQ(w.times, (std::vector<float>{0, 0.5f, 1}));
+    for (int f = 0; f <= 50; ++f) {
+        ASSERT_NEAR(back->Curve(0, 0)->eval(f), scene.source->document()->Curve(0, 0)->eval(f),
+                    1e-5)
+            << "frame " << f;
+        ASSERT_NEAR(back->Curve(0, 2)->eval(f), 2, 1e-6) << "frame " << f;
+    }
+    ExpectValidGltf(out);
 }
 
 // Sampled curves (rotation; translation mixing steps with axes at other times) stay within
