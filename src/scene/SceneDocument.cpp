@@ -263,8 +263,10 @@ bool SceneDocument::buildHierarchy(std::string* why) {
             }
         }
     }
+    inScene_.assign(n, 0);
     for (size_t k = 0; k < roots_.size(); ++k) {
         next_[size_t(roots_[k])] = k + 1 < roots_.size() ? roots_[k + 1] : -1;
+        inScene_[size_t(roots_[k])] = 1;
     }
     return true;
 }
@@ -272,17 +274,18 @@ bool SceneDocument::buildHierarchy(std::string* why) {
 void SceneDocument::buildNames() {
     size_t n = model_.nodes.size();
     names_.assign(n, std::string());
-    std::set<std::string> taken;
+    byName_.clear();
+    byName_.reserve(n);
     for (size_t i = 0; i < n; ++i) {
         std::string base = model_.nodes[i].name;
         if (base.empty()) {
             base = "node" + std::to_string(i);
         }
         std::string name = base;
-        for (int k = 2; taken.count(name); ++k) {
+        for (int k = 2; byName_.count(name); ++k) {
             name = base + "#" + std::to_string(k);
         }
-        taken.insert(name);
+        byName_.emplace(name, int(i));
         names_[i] = name;
     }
     curves_.clear();
@@ -402,6 +405,23 @@ bool SceneDocument::readSampler(const tinygltf::AnimationSampler& s, int path,
 
 const std::string& SceneDocument::NodeName(int index) const {
     return index < 0 ? rootName_ : names_[size_t(index)];
+}
+
+int SceneDocument::FindNode(const std::string& name) const {
+    auto it = byName_.find(name);
+    return it == byName_.end() ? -2 : it->second;
+}
+
+bool SceneDocument::Below(int node, int ancestor) const {
+    int top = node;
+    for (int up = node; up >= 0; up = parent_[size_t(up)]) {
+        if (up == ancestor) {
+            return true;
+        }
+        top = up;
+    }
+    // Every node of the scene is below the root group; nodes outside the scene are not.
+    return ancestor == -1 && top >= 0 && inScene_[size_t(top)];
 }
 
 int SceneDocument::FirstChild(int index) const {

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <cmath>
 #include <filesystem>
+#include <map>
 
 #include "scene/EulerRotation.h"
 #include "scene/SamplerBuilder.h"
@@ -138,6 +139,45 @@ TEST_F(SceneWriterTest, SharedKeyTimesAreWrittenAsTheKeys) {
     Written w = WrittenSampler(StoreAndRead()->model(), 0, "translation");
     EXPECT_EQ(w.interpolation, "STEP");
     EXPECT_EQ(w.times, (std::vector<float>{0, 0.5f}));
+}
+
+// Paths keyed at the same times (as the nodes one keyset drives are) share one input accessor;
+// other times get their own, and each path keeps its own values.
+TEST_F(SceneWriterTest, PathsKeyedAtTheSameTimesShareTheirTimes) {
+    ModelBuilder b;
+    for (const char* name : {"a", "b", "c"}) {
+        b.Node(name);
+    }
+    Open(b);
+    const int shifts[] = {0, 0, 100};  // ticks: "c" is keyed at other times
+    for (int n = 0; n < 3; ++n) {
+        const char name[2] = {char('a' + n), 0};
+        Node node = scene.Fetch(name);
+        for (int axis : {0, 4}) {
+            ASSERT_EQ(
+                StoreKeys(node.get(), axis,
+                          {{shifts[n], float(n), 0, 0}, {3000 + shifts[n], float(n + 1), 0, 0}}),
+                1);
+        }
+    }
+    auto back = StoreAndRead();
+    ASSERT_TRUE(back);
+    const tinygltf::Model& m = back->model();
+    std::map<std::string, int> input;  // node name and path to the sampler's input accessor
+    for (const tinygltf::Animation& anim : m.animations) {
+        for (const tinygltf::AnimationChannel& c : anim.channels) {
+            input[back->NodeName(c.target_node) + " " + c.target_path] =
+                anim.samplers[size_t(c.sampler)].input;
+        }
+    }
+    EXPECT_EQ(input["a translation"], input["b translation"]);
+    EXPECT_NE(input["a translation"], input["c translation"]);
+    EXPECT_NE(input["a rotation"], input["c rotation"]);
+    for (int n = 0; n < 3; ++n) {
+        EXPECT_NEAR(back->Curve(n, 0)->Evaluate(0.5 + shifts[n] / 6000.0), n + 1, 1e-6);
+        EXPECT_NEAR(back->Curve(n, 4)->Evaluate(0.5 + shifts[n] / 6000.0), n + 1, 1e-3);
+    }
+    ExpectValidGltf(out);
 }
 
 // Axes keyed at different times are cut at the union of the key times as cubic pieces: exact
