@@ -175,8 +175,12 @@ void ChannelCurve::SampleSorted(const std::vector<double>& times, std::vector<do
             } else if (std::fabs(seconds - keys_[i - 1].time) <= eps) {
                 const size_t j = i - 1;  // at key j: the slopes of the segments on either side
                 value = keys_[j].value;
-                out = j + 1 < n && keys_[j].out != kStep ? OutSlope(j) : 0.0;
-                in = j > 0 && keys_[j - 1].out != kStep ? InSlope(j) : 0.0;
+                if (leaving) {
+                    out = j + 1 < n && keys_[j].out != kStep ? OutSlope(j) : 0.0;
+                }
+                if (arriving) {
+                    in = j > 0 && keys_[j - 1].out != kStep ? InSlope(j) : 0.0;
+                }
             } else if (i == n) {
                 value = keys_.back().value;  // held after the last key
             } else {
@@ -204,9 +208,11 @@ void ChannelCurve::SampleSorted(const std::vector<double>& times, std::vector<do
                     const double u = (seconds - t0) / dt, u2 = u * u, u3 = u2 * u;
                     value = (2 * u3 - 3 * u2 + 1) * v0 + (u3 - 2 * u2 + u) * m0 +
                             (-2 * u3 + 3 * u2) * v1 + (u3 - u2) * m1;
-                    in = out = ((6 * u2 - 6 * u) * (v0 - v1) + (3 * u2 - 4 * u + 1) * m0 +
-                                (3 * u2 - 2 * u) * m1) /
-                               dt;
+                    if (arriving || leaving) {
+                        in = out = ((6 * u2 - 6 * u) * (v0 - v1) + (3 * u2 - 4 * u + 1) * m0 +
+                                    (3 * u2 - 2 * u) * m1) /
+                                   dt;
+                    }
                 }
             }
         }

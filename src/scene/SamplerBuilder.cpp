@@ -434,9 +434,9 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, double straightUpT
         if (k + 1 == keys.size() || still[k]) {
             continue;
         }
-        for (double f = std::ceil(keys[k] * fps_); f / fps_ < keys[k + 1]; ++f) {
-            double t = f / fps_;
-            if (float(t) > float(out->back()) && float(t) < float(keys[k + 1])) {
+        const float next = float(keys[k + 1]);
+        for (double f = std::ceil(keys[k] * fps_), t = f / fps_; t < keys[k + 1]; t = ++f / fps_) {
+            if (float(t) > float(out->back()) && float(t) < next) {
                 out->push_back(t);
             }
         }
