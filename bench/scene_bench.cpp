@@ -247,20 +247,26 @@ BENCHMARK(BM_StoreUnchanged)->Unit(benchmark::kMillisecond)->MinTime(3);
 BENCHMARK(BM_StoreChannels)->Unit(benchmark::kMillisecond)->MinTime(3);
 BENCHMARK(BM_StoreChannelsMixedAxes)->Unit(benchmark::kMillisecond)->MinTime(3);
 
-// Prints as usual and keeps each benchmark's real and CPU time for the ratios (the CPU ratio is
-// the steadier one on a shared machine; the real one includes the wait for the disk).
+// Prints as usual and keeps each benchmark's real and CPU time for the ratios: the median of
+// the repetitions when there are several (--benchmark_repetitions), else the one run. The CPU
+// ratio is the steadier one on a shared machine; the real one includes the wait for the disk.
 class RatioReporter : public benchmark::ConsoleReporter {
   public:
     void ReportRuns(const std::vector<Run>& runs) override {
         for (const Run& r : runs) {
-            if (r.run_type == Run::RT_Iteration && r.iterations > 0) {
-                real[r.run_name.function_name] = r.GetAdjustedRealTime();
-                cpu[r.run_name.function_name] = r.GetAdjustedCPUTime();
+            const std::string& name = r.run_name.function_name;
+            bool median = r.run_type == Run::RT_Aggregate && r.aggregate_name == "median";
+            if (median ||
+                (r.run_type == Run::RT_Iteration && r.iterations > 0 && !fromMedian[name])) {
+                real[name] = r.GetAdjustedRealTime();
+                cpu[name] = r.GetAdjustedCPUTime();
+                fromMedian[name] = median;
             }
         }
         ConsoleReporter::ReportRuns(runs);
     }
     std::map<std::string, double> real, cpu;
+    std::map<std::string, bool> fromMedian;
 };
 }  // namespace
 

@@ -5,10 +5,6 @@
 
 #include "toolkit/CueTime.h"
 
-namespace {
-constexpr double kSameTime = 0.5e-6;  // seconds: keys closer than this are at one time
-}
-
 double ChannelCurve::segmentSlope(size_t i) const {
     const Key& a = keys_[i];
     const Key& b = keys_[i + 1];
@@ -109,24 +105,6 @@ double ChannelCurve::SlopeAt(double seconds, bool outgoing) const {
     return slopeAfter(size_t(it - keys_.begin()), seconds, eps, outgoing);
 }
 
-void ChannelCurve::SlopesSorted(const std::vector<double>& times, bool outgoing,
-                                std::vector<double>* out) const {
-    out->resize(times.size());
-    size_t n = keys_.size(), i = 0;  // keys before i lie at or before the current time
-    for (size_t k = 0; k < times.size(); ++k) {
-        double seconds = times[k];
-        if (n < 2 || std::isnan(seconds)) {
-            (*out)[k] = 0.0;
-            continue;
-        }
-        double eps = 1e-9 + std::fabs(seconds) * 1.2e-7;
-        while (i < n && keys_[i].time <= seconds + eps) {
-            ++i;
-        }
-        (*out)[k] = slopeAfter(i, seconds, eps, outgoing);
-    }
-}
-
 double ChannelCurve::slopeAfter(size_t after, double seconds, double eps, bool outgoing) const {
     size_t n = keys_.size();
     if (after == 0) {
@@ -168,25 +146,84 @@ bool ChannelCurve::Constant() const {
 
 void ChannelCurve::EvaluateSorted(const std::vector<double>& times,
                                   std::vector<double>* out) const {
-    out->resize(times.size());
-    size_t n = keys_.size();
-    size_t i = 0;  // keys before i lie at or before the current time (within rounding)
-    for (size_t k = 0; k < times.size(); ++k) {
-        double seconds = times[k];
-        if (n == 0 || std::isnan(seconds)) {
-            (*out)[k] = n == 0 ? 0.0 : keys_.front().value;
-            continue;
+    SampleSorted(times, out, nullptr, nullptr);
+}
+
+void ChannelCurve::SampleSorted(const std::vector<double>& times, std::vector<double>* values,
+                                std::vector<double>* arriving, std::vector<double>* leaving) const {
+    const size_t count = times.size(), n = keys_.size();
+    for (std::vector<double>* v : {values, arriving, leaving}) {
+        if (v) {
+            v->resize(count);
         }
-        double eps = 1e-9 + std::fabs(seconds) * 1.2e-7;
-        while (i < n && keys_[i].time <= seconds + eps) {
-            ++i;
+    }
+    size_t i = 0;       // keys before i lie at or before the current time (within rounding)
+    size_t cached = n;  // the segment whose coefficients follow (n: none yet)
+    bool step = false, straight = false;
+    double t0 = 0, dt = 1, v0 = 0, v1 = 0, m0 = 0, m1 = 0;
+    for (size_t k = 0; k < count; ++k) {
+        const double seconds = times[k];
+        double value = n == 0 ? 0.0 : keys_.front().value, in = 0, out = 0;
+        if (n > 0 && !std::isnan(seconds)) {
+            // Within float rounding of a key is at the key, as in Evaluate.
+            const double eps = 1e-9 + std::fabs(seconds) * 1.2e-7;
+            while (i < n && keys_[i].time <= seconds + eps) {
+                ++i;
+            }
+            if (i == 0) {
+                // held before the first key
+            } else if (std::fabs(seconds - keys_[i - 1].time) <= eps) {
+                const size_t j = i - 1;  // at key j: the slopes of the segments on either side
+                value = keys_[j].value;
+                if (leaving) {
+                    out = j + 1 < n && keys_[j].out != kStep ? OutSlope(j) : 0.0;
+                }
+                if (arriving) {
+                    in = j > 0 && keys_[j - 1].out != kStep ? InSlope(j) : 0.0;
+                }
+            } else if (i == n) {
+                value = keys_.back().value;  // held after the last key
+            } else {
+                const size_t j = i - 1;  // inside the segment from key j to j + 1
+                if (cached != j) {
+                    // The segment's coefficients once for all the times inside it.
+                    cached = j;
+                    const Key& a = keys_[j];
+                    const Key& b = keys_[j + 1];
+                    step = a.out == kStep;
+                    straight = a.out == kLinear && b.in == kLinear;
+                    t0 = a.time;
+                    dt = b.time - a.time;
+                    v0 = a.value;
+                    v1 = b.value;
+                    m0 = step || straight ? 0.0 : OutSlope(j) * dt;
+                    m1 = step || straight ? 0.0 : InSlope(j + 1) * dt;
+                }
+                if (step) {
+                    value = v0;
+                } else if (straight) {
+                    value = v0 + (v1 - v0) * ((seconds - t0) / dt);  // as segment() has it
+                    in = out = (v1 - v0) / dt;
+                } else {
+                    const double u = (seconds - t0) / dt, u2 = u * u, u3 = u2 * u;
+                    value = (2 * u3 - 3 * u2 + 1) * v0 + (u3 - 2 * u2 + u) * m0 +
+                            (-2 * u3 + 3 * u2) * v1 + (u3 - u2) * m1;
+                    if (arriving || leaving) {
+                        in = out = ((6 * u2 - 6 * u) * (v0 - v1) + (3 * u2 - 4 * u + 1) * m0 +
+                                    (3 * u2 - 2 * u) * m1) /
+                                   dt;
+                    }
+                }
+            }
         }
-        if (i == 0) {
-            (*out)[k] = keys_.front().value;
-        } else if (i == n || std::fabs(seconds - keys_[i - 1].time) <= eps) {
-            (*out)[k] = keys_[i - 1].value;
-        } else {
-            (*out)[k] = segment(i - 1, seconds);
+        if (values) {
+            (*values)[k] = value;
+        }
+        if (arriving) {
+            (*arriving)[k] = in;
+        }
+        if (leaving) {
+            (*leaving)[k] = out;
         }
     }
 }
@@ -301,7 +338,10 @@ bool ChannelCurve::FromApplyArrays(int count, const CueTime* times, const float*
         k.out = KindFromCode(outTangents ? outTangents[i] : KLWire::kLinear);
         keys->push_back(k);
     }
-    std::stable_sort(keys->begin(), keys->end(),
-                     [](const Key& a, const Key& b) { return a.time < b.time; });
+    // Apply gives its keys in time order: sorting (which allocates) only when they are not.
+    auto earlier = [](const Key& a, const Key& b) { return a.time < b.time; };
+    if (!std::is_sorted(keys->begin(), keys->end(), earlier)) {
+        std::stable_sort(keys->begin(), keys->end(), earlier);
+    }
     return true;
 }

@@ -26,6 +26,9 @@ class ChannelCurve : public OrChannel {
         double outSlope = 0;
     };
 
+    // Seconds: keys closer than this are at one time.
+    static constexpr double kSameTime = 0.5e-6;
+
     ChannelCurve() = default;
     explicit ChannelCurve(std::vector<Key> keys) : keys_(std::move(keys)) {}
 
@@ -48,9 +51,11 @@ class ChannelCurve : public OrChannel {
     // The curve's derivative (units per second) at `seconds`, from the right (`outgoing`) or
     // from the left; zero where the curve holds, and at a step.
     double SlopeAt(double seconds, bool outgoing) const;
-    // SlopeAt at each of `times` (seconds, ascending), into `out`, in one pass over the keys.
-    void SlopesSorted(const std::vector<double>& times, bool outgoing,
-                      std::vector<double>* out) const;
+    // Evaluate, SlopeAt(t, false) and SlopeAt(t, true) at each of `times` (seconds, ascending)
+    // into those of `values`, `arriving` and `leaving` that are not null, in one pass over the
+    // keys, each segment's coefficients worked out once.
+    void SampleSorted(const std::vector<double>& times, std::vector<double>* values,
+                      std::vector<double>* arriving, std::vector<double>* leaving) const;
     // True when the curve has the same value everywhere.
     bool Constant() const;
     // True when every segment is a straight line (both ends linear) or every one a step.

@@ -66,7 +66,13 @@ std::unique_ptr<OrDagNode> KLWire::FetchDagNode(OrDagNode* below, const char* na
     }
     const SceneDocument& doc = *below->document();
     std::string wanted = name;
-    int found = walk(doc, below->index(), [&](int i) { return doc.NodeName(i) == wanted; });
+    // Names are unique, so the first match depth first is the one node of that name, when it
+    // lies below (the group itself is matched by its own name first: the root group's name
+    // may also be a node's).
+    int found = doc.NodeName(below->index()) == wanted ? below->index() : doc.FindNode(wanted);
+    if (found >= 0 && !doc.Below(found, below->index())) {
+        found = -2;
+    }
     if (found == -2 && demangle && wanted.find('#') == std::string::npos) {
         std::string prefix = wanted + "#";
         found = walk(doc, below->index(),
@@ -115,7 +121,7 @@ int KLWire::StoreChannel(OrDagNode* node, int channel, int count, const CueTime*
     if (!ChannelCurve::FromApplyArrays(count, times, values, inTangents, outTangents, &keys)) {
         return 0;
     }
-    node->document()->SetCurve(node->index(), channel, keys, alwaysClearChannel != 0);
+    node->document()->SetCurve(node->index(), channel, std::move(keys), alwaysClearChannel != 0);
     return 1;
 }
 

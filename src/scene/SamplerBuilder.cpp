@@ -113,9 +113,20 @@ bool slerp_fits(const std::vector<double>& times, const std::vector<EulerRotatio
 
 SamplerBuilder::SamplerBuilder(const ChannelCurve* const curves[3], const double rest[3], int fps)
     : fps_(fps > 0 ? fps : 30) {
+    bool anyMoving = false;
     for (int a = 0; a < 3; ++a) {
         curves_[a] = curves[a] && !curves[a]->empty() ? curves[a] : nullptr;
         rest_[a] = rest[a];
+        anyMoving = anyMoving || (curves_[a] && !curves_[a]->Constant());
+    }
+    for (int a = 0; a < 3; ++a) {
+        // An axis that holds one value throughout is written as that value: its key times
+        // bring nothing the other axes need, so they neither widen the union nor make pieces.
+        // (When no axis moves the curves are kept, so that the path stays animated.)
+        if (anyMoving && curves_[a] && curves_[a]->Constant()) {
+            rest_[a] = curves_[a]->keys().front().value;
+            curves_[a] = nullptr;
+        }
         lead_ = lead_ ? lead_ : curves_[a];
     }
 }
@@ -173,9 +184,10 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
     if (!sampleCandidates(&times, axis, HUGE_VAL, why)) {
         return false;
     }
+    // An axis without a curve holds its rest value (its samples are not filled in).
     auto fits = [&](size_t i, size_t j) {
         for (int a = 0; a < 3; ++a) {
-            if (!line_fits(times, axis[a], i, j, kVectorTolerance * 0.5)) {
+            if (!axis[a].empty() && !line_fits(times, axis[a], i, j, kVectorTolerance * 0.5)) {
                 return false;
             }
         }
@@ -185,7 +197,7 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
     for (size_t k : reduce(times.size(), fits)) {
         out->times.push_back(stored(times[k]));
         for (int a = 0; a < 3; ++a) {
-            out->values.push_back(stored(axis[a][k]));
+            out->values.push_back(stored(axis[a].empty() ? rest_[a] : axis[a][k]));
         }
     }
     return true;
@@ -210,91 +222,105 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     if (!sampleCandidates(&times, axis, movingAxes <= 1 ? 90.0 : 0.0, why)) {
         return false;
     }
-    auto quaternion = [&](size_t k) {
-        return EulerRotation::ToQuaternion({axis[0][k], axis[1][k], axis[2][k]});
-    };
+    // An axis without a curve holds its rest value (its samples are not filled in).
+    auto angle = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : axis[a][k]; };
     // Float storage moves a quaternion by about 1e-5 degrees: well inside the margin.
     const double tolerance = kRotationToleranceDegrees * 0.5;
-    std::vector<size_t> kept;
-    std::vector<EulerRotation::Quat> q;
+    const double halfRadians = 3.14159265358979323846 / 360;
+    out->interpolation = "LINEAR";
     if (movingAxes <= 1) {
         // One axis turning between fixed ones: the rotation is a fixed one, a turn about that
         // axis, and another fixed one, and interpolation commutes with fixed rotations on either
         // side, so the angle by which a piece misses is the angle its straight line misses by.
         int a = moving < 0 ? 0 : moving;
-        kept = reduce(times.size(), [&](size_t i, size_t j) {
+        if (axis[a].empty()) {
+            axis[a].assign(times.size(), rest_[a]);
+        }
+        std::vector<size_t> kept = reduce(times.size(), [&](size_t i, size_t j) {
             return std::fabs(axis[a][j] - axis[a][i]) < 180 &&
                    line_fits(times, axis[a], i, j, tolerance);
         });
-        // The fixed axes' half-angle sines and cosines once; only the turning one per sample.
+        // The fixed axes' half-angle sines and cosines once; only the turning one per sample,
+        // written straight out, each on the hemisphere of the one before (players take the
+        // shortest way round).
         double c[3], sn[3];
         for (int b = 0; b < 3; ++b) {
-            double half = axis[b].empty() ? 0 : axis[b][0] * 3.14159265358979323846 / 360;
-            c[b] = std::cos(half);
-            sn[b] = std::sin(half);
+            c[b] = std::cos(angle(b, 0) * halfRadians);
+            sn[b] = std::sin(angle(b, 0) * halfRadians);
         }
-        q.reserve(kept.size());
-        for (size_t k : kept) {
-            double half = axis[a][k] * 3.14159265358979323846 / 360;
-            c[a] = std::cos(half);
-            sn[a] = std::sin(half);
+        out->times.resize(kept.size());
+        out->values.resize(kept.size() * 4);
+        float* v = out->values.data();
+        double previous[4] = {0, 0, 0, 1};
+        for (size_t n = 0; n < kept.size(); ++n, v += 4) {
+            const size_t k = kept[n];
+            c[a] = std::cos(axis[a][k] * halfRadians);
+            sn[a] = std::sin(axis[a][k] * halfRadians);
             // qz * qy * qx, as EulerRotation::ToQuaternion
-            q.push_back({sn[0] * c[1] * c[2] - c[0] * sn[1] * sn[2],
-                         c[0] * sn[1] * c[2] + sn[0] * c[1] * sn[2],
-                         c[0] * c[1] * sn[2] - sn[0] * sn[1] * c[2],
-                         c[0] * c[1] * c[2] + sn[0] * sn[1] * sn[2]});
-        }
-    } else {
-        q.resize(times.size());
-        for (size_t k = 0; k < times.size(); ++k) {
-            q[k] = quaternion(k);
-        }
-        const double chord = 2 * std::sin(tolerance * 3.14159265358979323846 / 180 / 4);
-        kept = reduce(times.size(),
-                      [&](size_t i, size_t j) { return slerp_fits(times, q, i, j, chord); });
-        for (size_t n = 0; n < kept.size(); ++n) {
-            q[n] = q[kept[n]];
-        }
-        q.resize(kept.size());
-    }
-    for (size_t n = 1; n < q.size(); ++n) {
-        // Each sample on the hemisphere of the one before: players take the shortest way round.
-        const EulerRotation::Quat& p = q[n - 1];
-        if (q[n][0] * p[0] + q[n][1] * p[1] + q[n][2] * p[2] + q[n][3] * p[3] < 0) {
-            for (double& v : q[n]) {
-                v = -v;
+            double q[4] = {sn[0] * c[1] * c[2] - c[0] * sn[1] * sn[2],
+                           c[0] * sn[1] * c[2] + sn[0] * c[1] * sn[2],
+                           c[0] * c[1] * sn[2] - sn[0] * sn[1] * c[2],
+                           c[0] * c[1] * c[2] + sn[0] * sn[1] * sn[2]};
+            const double side = n > 0 && q[0] * previous[0] + q[1] * previous[1] +
+                                                 q[2] * previous[2] + q[3] * previous[3] <
+                                             0
+                                    ? -1.0
+                                    : 1.0;
+            out->times[n] = stored(times[k]);
+            for (size_t i = 0; i < 4; ++i) {
+                previous[i] = q[i] * side;
+                v[i] = stored(previous[i]);
             }
         }
+        return true;
     }
-    out->interpolation = "LINEAR";
-    out->times.reserve(kept.size());
-    out->values.reserve(kept.size() * 4);
-    for (size_t n = 0; n < kept.size(); ++n) {
-        out->times.push_back(stored(times[kept[n]]));
-        for (double v : q[n]) {
-            out->values.push_back(stored(v));
+    std::vector<EulerRotation::Quat> q(times.size());
+    for (size_t k = 0; k < times.size(); ++k) {
+        q[k] = EulerRotation::ToQuaternion({angle(0, k), angle(1, k), angle(2, k)});
+    }
+    const double chord = 2 * std::sin(tolerance * 3.14159265358979323846 / 180 / 4);
+    std::vector<size_t> kept =
+        reduce(times.size(), [&](size_t i, size_t j) { return slerp_fits(times, q, i, j, chord); });
+    out->times.resize(kept.size());
+    out->values.resize(kept.size() * 4);
+    float* v = out->values.data();
+    EulerRotation::Quat previous = {0, 0, 0, 1};
+    for (size_t n = 0; n < kept.size(); ++n, v += 4) {
+        // Each sample on the hemisphere of the one before: players take the shortest way round.
+        EulerRotation::Quat r = q[kept[n]];
+        if (n > 0 &&
+            r[0] * previous[0] + r[1] * previous[1] + r[2] * previous[2] + r[3] * previous[3] < 0) {
+            for (double& x : r) {
+                x = -x;
+            }
         }
+        out->times[n] = stored(times[kept[n]]);
+        for (size_t i = 0; i < 4; ++i) {
+            v[i] = stored(r[i]);
+        }
+        previous = r;
     }
     return true;
 }
 
 void SamplerBuilder::keysExact(BuiltSampler* out) const {
-    bool cubic = out->interpolation == "CUBICSPLINE";
+    const bool cubic = out->interpolation == "CUBICSPLINE";
     const auto& lead = lead_->keys();
-    out->times.reserve(lead.size());
-    out->values.reserve(lead.size() * (cubic ? 9 : 3));
-    for (size_t k = 0; k < lead.size(); ++k) {
-        out->times.push_back(stored(lead[k].time));
-        for (int part = cubic ? 0 : 1; part < (cubic ? 3 : 2); ++part) {
-            for (int a = 0; a < 3; ++a) {
-                const ChannelCurve* c = curves_[a];
-                double v = 0;
-                if (part == 1) {
-                    v = c ? c->keys()[k].value : rest_[a];
-                } else if (c) {
-                    v = part == 0 ? c->InSlope(k) : c->OutSlope(k);
-                }
-                out->values.push_back(stored(v));
+    const size_t n = lead.size(), stride = cubic ? 9 : 3;
+    out->times.resize(n);
+    out->values.resize(n * stride);
+    for (size_t k = 0; k < n; ++k) {
+        out->times[k] = stored(lead[k].time);
+    }
+    // Axis by axis into the interleaved values: in-tangents, values, out-tangents of each key.
+    for (int a = 0; a < 3; ++a) {
+        const ChannelCurve* c = curves_[a];
+        float* v = out->values.data() + (cubic ? 3 : 0) + a;
+        for (size_t k = 0; k < n; ++k, v += stride) {
+            v[0] = stored(c ? c->keys()[k].value : rest_[a]);
+            if (cubic) {
+                v[-3] = c ? stored(c->InSlope(k)) : 0.0f;
+                v[3] = c ? stored(c->OutSlope(k)) : 0.0f;
             }
         }
     }
@@ -306,24 +332,25 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     out->interpolation = "CUBICSPLINE";
     std::vector<double> times = unionTimes();
     std::vector<double> axis[3], in[3], leave[3];
-    evaluate(times, axis);
     for (int a = 0; a < 3; ++a) {
         if (curves_[a]) {
-            curves_[a]->SlopesSorted(times, false, &in[a]);
-            curves_[a]->SlopesSorted(times, true, &leave[a]);
+            curves_[a]->SampleSorted(times, &axis[a], &in[a], &leave[a]);
         } else {
+            axis[a].assign(times.size(), rest_[a]);
             in[a].assign(times.size(), 0.0);
             leave[a].assign(times.size(), 0.0);
         }
     }
-    out->times.reserve(times.size());
-    out->values.reserve(times.size() * 9);
-    for (size_t k = 0; k < times.size(); ++k) {
-        out->times.push_back(stored(times[k]));
-        for (const std::vector<double>* part : {in, axis, leave}) {
-            for (int a = 0; a < 3; ++a) {
-                out->values.push_back(stored(part[a][k]));
-            }
+    const size_t n = times.size();
+    out->times.resize(n);
+    out->values.resize(n * 9);
+    float* v = out->values.data();
+    for (size_t k = 0; k < n; ++k, v += 9) {
+        out->times[k] = stored(times[k]);
+        for (int a = 0; a < 3; ++a) {
+            v[a] = stored(in[a][k]);
+            v[3 + a] = stored(axis[a][k]);
+            v[6 + a] = stored(leave[a][k]);
         }
     }
 }
@@ -407,9 +434,9 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, double straightUpT
         if (k + 1 == keys.size() || still[k]) {
             continue;
         }
-        for (double f = std::ceil(keys[k] * fps_); f / fps_ < keys[k + 1]; ++f) {
-            double t = f / fps_;
-            if (float(t) > float(out->back()) && float(t) < float(keys[k + 1])) {
+        const float next = float(keys[k + 1]);
+        for (double f = std::ceil(keys[k] * fps_), t = f / fps_; t < keys[k + 1]; t = ++f / fps_) {
+            if (float(t) > float(out->back()) && float(t) < next) {
                 out->push_back(t);
             }
         }
@@ -433,7 +460,7 @@ void SamplerBuilder::evaluate(const std::vector<double>& times, std::vector<doub
         } else if (curves_[a]) {
             axis[a].assign(times.size(), curves_[a]->keys().front().value);
         } else {
-            axis[a].assign(times.size(), rest_[a]);
+            axis[a].clear();  // holds rest_[a]
         }
     }
 }

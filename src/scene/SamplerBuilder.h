@@ -15,7 +15,8 @@ struct BuiltSampler {
 };
 
 // Builds the sampler of one node path (translation, rotation or scale) from the key curves of
-// its three axes. What is written how:
+// its three axes. An axis whose curve holds one value throughout counts as unanimated at that
+// value (its key times are not needed) unless no axis moves. What is written how:
 //   - translation or scale whose animated axes share their key times: the keys themselves,
 //     LINEAR when every segment is a straight line, STEP when every one is a step, else
 //     CUBICSPLINE with the keys' slopes (exact);
@@ -59,7 +60,8 @@ class SamplerBuilder {
     // samples inside: every axis holds still across it or runs in a straight line that changes
     // by less than `straightUpTo` (0 where the written pieces do not follow straight lines).
     std::vector<char> plainSpans(const std::vector<double>& keys, double straightUpTo) const;
-    // The candidate times and every axis's value at each of them.
+    // The candidate times and each animated axis's value at each of them (an axis without a
+    // curve is left empty: it holds its rest value).
     bool sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
                           double straightUpTo, std::string* why) const;
     void evaluate(const std::vector<double>& times, std::vector<double> axis[3]) const;

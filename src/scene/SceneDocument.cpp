@@ -19,6 +19,17 @@ const char* const kPaths[3] = {"translation", "rotation", "scale"};
 constexpr double kMaxSeconds = 360000.0;
 const char* const kNotRegular = " is not a regular file";
 
+// Whether each key lies later than the one before by more than ChannelCurve::Merge's "same
+// time", so that merging them one by one into an empty curve would keep them as they are.
+bool separate_times(const std::vector<ChannelCurve::Key>& keys) {
+    for (size_t k = 1; k < keys.size(); ++k) {
+        if (!(keys[k].time > keys[k - 1].time + ChannelCurve::kSameTime)) {
+            return false;
+        }
+    }
+    return true;
+}
+
 uint32_t read_u32(const unsigned char* p) {
     return uint32_t(p[0]) | uint32_t(p[1]) << 8 | uint32_t(p[2]) << 16 | uint32_t(p[3]) << 24;
 }
@@ -252,8 +263,10 @@ bool SceneDocument::buildHierarchy(std::string* why) {
             }
         }
     }
+    inScene_.assign(n, 0);
     for (size_t k = 0; k < roots_.size(); ++k) {
         next_[size_t(roots_[k])] = k + 1 < roots_.size() ? roots_[k + 1] : -1;
+        inScene_[size_t(roots_[k])] = 1;
     }
     return true;
 }
@@ -261,17 +274,18 @@ bool SceneDocument::buildHierarchy(std::string* why) {
 void SceneDocument::buildNames() {
     size_t n = model_.nodes.size();
     names_.assign(n, std::string());
-    std::set<std::string> taken;
+    byName_.clear();
+    byName_.reserve(n);
     for (size_t i = 0; i < n; ++i) {
         std::string base = model_.nodes[i].name;
         if (base.empty()) {
             base = "node" + std::to_string(i);
         }
         std::string name = base;
-        for (int k = 2; taken.count(name); ++k) {
+        for (int k = 2; byName_.count(name); ++k) {
             name = base + "#" + std::to_string(k);
         }
-        taken.insert(name);
+        byName_.emplace(name, int(i));
         names_[i] = name;
     }
     curves_.clear();
@@ -393,6 +407,23 @@ const std::string& SceneDocument::NodeName(int index) const {
     return index < 0 ? rootName_ : names_[size_t(index)];
 }
 
+int SceneDocument::FindNode(const std::string& name) const {
+    auto it = byName_.find(name);
+    return it == byName_.end() ? -2 : it->second;
+}
+
+bool SceneDocument::Below(int node, int ancestor) const {
+    int top = node;
+    for (int up = node; up >= 0; up = parent_[size_t(up)]) {
+        if (up == ancestor) {
+            return true;
+        }
+        top = up;
+    }
+    // Every node of the scene is below the root group; nodes outside the scene are not.
+    return ancestor == -1 && top >= 0 && inScene_[size_t(top)];
+}
+
 int SceneDocument::FirstChild(int index) const {
     if (index < 0) {
         return roots_.empty() ? -1 : roots_.front();
@@ -412,19 +443,19 @@ ChannelCurve* SceneDocument::Curve(int node, int channel) const {
     return curves_[size_t(node)][size_t(channel)].get();
 }
 
-size_t SceneDocument::SetCurve(int node, int channel, const std::vector<ChannelCurve::Key>& keys,
+size_t SceneDocument::SetCurve(int node, int channel, std::vector<ChannelCurve::Key> keys,
                                bool clearFirst) {
     auto& slot = curves_[size_t(node)][size_t(channel)];
     if (clearFirst || !slot) {
         slot = std::make_unique<ChannelCurve>();
     }
-    if (slot->empty()) {
-        // Keys in time order, as the scene interface gives them, are taken as they are; of
-        // two at one time the later wins, as Merge would have it.
-        slot->keys().reserve(keys.size());
-    }
-    for (const ChannelCurve::Key& k : keys) {
-        slot->Merge(k);
+    if (slot->empty() && separate_times(keys)) {
+        slot->keys() = std::move(keys);  // in time order, no two at one time: taken as they are
+    } else {
+        // Of two keys at one time the later wins, as Merge has it.
+        for (const ChannelCurve::Key& k : keys) {
+            slot->Merge(k);
+        }
     }
     size_t dropped = slot->TrimBefore(0.0);
     if (slot->empty()) {

@@ -3,6 +3,7 @@
 #include <array>
 #include <memory>
 #include <string>
+#include <unordered_map>
 #include <vector>
 
 #include <tiny_gltf.h>
@@ -35,14 +36,18 @@ class SceneDocument {
     int NextSibling(int index) const;
     int Parent(int index) const { return index < 0 ? -1 : parent_[size_t(index)]; }
     bool HasChildren(int index) const { return FirstChild(index) >= 0; }
+    // The node whose unique name is `name`, or -2 when there is none.
+    int FindNode(const std::string& name) const;
+    // Whether `node` is `ancestor` or lies below it (-1: the root group, which holds the
+    // scene's nodes but not nodes outside the scene).
+    bool Below(int node, int ancestor) const;
 
     // The key curve of one channel, null when the node does not animate it.
     ChannelCurve* Curve(int node, int channel) const;
     // Replaces (or with `clearFirst` false, merges keys into) one channel's curve and marks the
     // channel for rewriting at the next Store. An empty key list removes the curve. glTF has no
     // time before 0: the curve is cut at time 0 (TrimBefore); returns the keys that dropped.
-    size_t SetCurve(int node, int channel, const std::vector<ChannelCurve::Key>& keys,
-                    bool clearFirst);
+    size_t SetCurve(int node, int channel, std::vector<ChannelCurve::Key> keys, bool clearFirst);
     // Whether any channel of the node, or of its path (0 translation, 1 rotation, 2 scale),
     // was set since the last Store.
     bool Touched(int node) const { return touched_[size_t(node)] != 0; }
@@ -80,6 +85,8 @@ class SceneDocument {
     std::vector<int> parent_;
     std::vector<int> next_;  // next sibling under the same parent (or among the roots)
     std::vector<int> roots_;
+    std::vector<char> inScene_;                    // per node, whether it is one of roots_
+    std::unordered_map<std::string, int> byName_;  // unique name to node
     std::vector<std::array<std::unique_ptr<ChannelCurve>, kChannels>> curves_;
     std::vector<unsigned> touched_;  // per node, one bit per channel
 };

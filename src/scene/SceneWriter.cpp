@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cstring>
 #include <map>
+#include <string_view>
+#include <unordered_map>
 
 #include "scene/EulerRotation.h"
 #include "scene/ModelCompactor.h"
@@ -163,6 +165,9 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets) {
         view_ = int(m_.bufferViews.size());
         viewStart_ = data.size();
         m_.accessors.reserve(m_.accessors.size() + 2 * targets->size());
+        // Samplers with the same key times (the paths one keyset drives share them) share one
+        // input accessor: found by a hash of the times, confirmed byte for byte.
+        std::unordered_multimap<size_t, int> inputs;
         for (Target& t : *targets) {
             if (t.sampler.times.empty()) {
                 continue;
@@ -170,7 +175,22 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets) {
             makeNodeTrs(t.node);
             const BuiltSampler& s = t.sampler;
             tinygltf::AnimationSampler sampler;
-            sampler.input = appendAccessor(s.times, TINYGLTF_TYPE_SCALAR, s.times.size(), true);
+            const size_t timeBytes = s.times.size() * sizeof(float);
+            const size_t hash = std::hash<std::string_view>()(
+                std::string_view(reinterpret_cast<const char*>(s.times.data()), timeBytes));
+            auto same = inputs.equal_range(hash);
+            for (auto it = same.first; it != same.second && sampler.input < 0; ++it) {
+                const tinygltf::Accessor& a = m_.accessors[size_t(it->second)];
+                if (a.count == s.times.size() &&
+                    std::memcmp(data.data() + viewStart_ + a.byteOffset, s.times.data(),
+                                timeBytes) == 0) {
+                    sampler.input = it->second;
+                }
+            }
+            if (sampler.input < 0) {
+                sampler.input = appendAccessor(s.times, TINYGLTF_TYPE_SCALAR, s.times.size(), true);
+                inputs.emplace(hash, sampler.input);
+            }
             sampler.output =
                 appendAccessor(s.values, s.width == 4 ? TINYGLTF_TYPE_VEC4 : TINYGLTF_TYPE_VEC3,
                                s.values.size() / size_t(s.width), false);

@@ -43,6 +43,34 @@ TEST_P(CurveEvaluate, GivesTheHermiteValueAndItsSlope) {
     }
 }
 
+// The one-pass sampling gives what Evaluate and SlopeAt give one time at a time: at every key
+// (where the sides differ), within float rounding of a key, between keys (several times in one
+// segment) and outside the keys.
+TEST_P(CurveEvaluate, OnePassSamplingMatchesPointwise) {
+    Curve c(GetParam().keys);
+    std::vector<double> times = {-1.0};
+    for (const Curve::Key& k : c.keys()) {
+        for (double t :
+             {k.time - 0.3, k.time - 1e-8, k.time, k.time + 1e-8, k.time + 0.25, k.time + 0.5}) {
+            times.push_back(t);
+        }
+    }
+    times.push_back(c.keys().back().time + 5);
+    std::sort(times.begin(), times.end());
+    std::vector<double> values, arriving, leaving;
+    c.SampleSorted(times, &values, &arriving, &leaving);
+    ASSERT_EQ(values.size(), times.size());
+    for (size_t i = 0; i < times.size(); ++i) {
+        double t = times[i];
+        EXPECT_NEAR(values[i], c.Evaluate(t), 1e-12) << "at " << t;
+        EXPECT_NEAR(arriving[i], c.SlopeAt(t, false), 1e-9) << "at " << t;
+        EXPECT_NEAR(leaving[i], c.SlopeAt(t, true), 1e-9) << "at " << t;
+    }
+    std::vector<double> only;
+    c.EvaluateSorted(times, &only);
+    EXPECT_EQ(only, values);
+}
+
 INSTANTIATE_TEST_SUITE_P(
     Kinds, CurveEvaluate,
     ::testing::Values(

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <cmath>
 #include <filesystem>
+#include <map>
 
 #include "scene/EulerRotation.h"
 #include "scene/SamplerBuilder.h"
@@ -140,6 +141,45 @@ TEST_F(SceneWriterTest, SharedKeyTimesAreWrittenAsTheKeys) {
     EXPECT_EQ(w.times, (std::vector<float>{0, 0.5f}));
 }
 
+// Paths keyed at the same times (as the nodes one keyset drives are) share one input accessor;
+// other times get their own, and each path keeps its own values.
+TEST_F(SceneWriterTest, PathsKeyedAtTheSameTimesShareTheirTimes) {
+    ModelBuilder b;
+    for (const char* name : {"a", "b", "c"}) {
+        b.Node(name);
+    }
+    Open(b);
+    const int shifts[] = {0, 0, 100};  // ticks: "c" is keyed at other times
+    for (int n = 0; n < 3; ++n) {
+        const char name[2] = {char('a' + n), 0};
+        Node node = scene.Fetch(name);
+        for (int axis : {0, 4}) {
+            ASSERT_EQ(
+                StoreKeys(node.get(), axis,
+                          {{shifts[n], float(n), 0, 0}, {3000 + shifts[n], float(n + 1), 0, 0}}),
+                1);
+        }
+    }
+    auto back = StoreAndRead();
+    ASSERT_TRUE(back);
+    const tinygltf::Model& m = back->model();
+    std::map<std::string, int> input;  // node name and path to the sampler's input accessor
+    for (const tinygltf::Animation& anim : m.animations) {
+        for (const tinygltf::AnimationChannel& c : anim.channels) {
+            input[back->NodeName(c.target_node) + " " + c.target_path] =
+                anim.samplers[size_t(c.sampler)].input;
+        }
+    }
+    EXPECT_EQ(input["a translation"], input["b translation"]);
+    EXPECT_NE(input["a translation"], input["c translation"]);
+    EXPECT_NE(input["a rotation"], input["c rotation"]);
+    for (int n = 0; n < 3; ++n) {
+        EXPECT_NEAR(back->Curve(n, 0)->Evaluate(0.5 + shifts[n] / 6000.0), n + 1, 1e-6);
+        EXPECT_NEAR(back->Curve(n, 4)->Evaluate(0.5 + shifts[n] / 6000.0), n + 1, 1e-3);
+    }
+    ExpectValidGltf(out);
+}
+
 // Axes keyed at different times are cut at the union of the key times as cubic pieces: exact
 // at every frame, and no more keys than the union.
 TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) {
@@ -161,6 +201,24 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
                         1e-5)
                 << "channel " << c << " frame " << f;
         }
+    }
+    ExpectValidGltf(out);
+    // An axis that holds one value at key times of its own adds none of them: the moving
+    // axis's keys alone, exact, with the held axis at its value throughout.
+    ASSERT_TRUE(scene.Open(out));
+    a = scene.Fetch("a");
+    ASSERT_EQ(StoreKeys(a.get(), 0, {{0, 0, 0, 0}, {3000, 4, 0, 0}, {6000, 1, 0, 0}}), 1);
+    ASSERT_EQ(StoreKeys(a.get(), 2, {{1000, 2, 1, 1}, {2500, 2, 2, 0}, {9000, 2, 0, 1}}), 1);
+    back = StoreAndRead();
+    ASSERT_TRUE(back);
+    w = WrittenSampler(back->model(), 0, "translation");
+    EXPECT_EQ(w.interpolation, "CUBICSPLINE");
+    EXPECT_EQ(w.times, (std::vector<float>{0, 0.5f, 1}));
+    for (int f = 0; f <= 50; ++f) {
+        ASSERT_NEAR(back->Curve(0, 0)->eval(f), scene.source->document()->Curve(0, 0)->eval(f),
+                    1e-5)
+            << "frame " << f;
+        ASSERT_NEAR(back->Curve(0, 2)->eval(f), 2, 1e-6) << "frame " << f;
     }
     ExpectValidGltf(out);
 }
