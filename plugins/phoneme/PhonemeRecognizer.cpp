@@ -251,8 +251,11 @@ bool PhonemeRecognizer::recognize(const CueSound& sound) {
     const long count = PhoneTimeline::StepCount(sound.FrameCount() / sound.Rate(), stepSeconds);
     std::vector<int> perStep =
         PhoneTimeline::StepTargets(segments, stepSeconds, count, PhoneSet::kSilence);
-    PhoneTimeline::SilenceQuietSteps(perStep, step_levels(samples, stepSeconds, count), kQuietLevel,
-                                     PhoneSet::kSilence);
+    const std::vector<double> levels = step_levels(samples, stepSeconds, count);
+    PhoneTimeline::SilenceQuietSteps(perStep, levels, kQuietLevel, PhoneSet::kSilence);
+    PhoneTimeline::FillLoudSilence(
+        perStep, levels, PhoneTimeline::SpeechLevel(levels, kSpeechBelowPeak, kSpeechAboveFloor),
+        std::max(1L, std::lround(kSpeechReach / stepSeconds)), PhoneSet::kSilence);
     PhoneTimeline::AbsorbShortRuns(perStep, minimum);
     results.reserve(perStep.size());
     for (int t : perStep)

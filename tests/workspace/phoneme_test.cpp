@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cmath>
 #include <filesystem>
 #include <memory>
 #include <random>
@@ -329,14 +330,16 @@ class RecordingHost : public CueChirrupHost {
     int SetFloatSlider(CueRecognizer*, const char*, float) override { return 1; }
     int CreateIntSlider(CueRecognizer*, const char* name, int minimum, int maximum, int value,
                         IntCallback callback) override {
-        controls.push_back({name, float(minimum), float(maximum), float(value), nullptr, nullptr, nullptr, {}});
+        controls.push_back(
+            {name, float(minimum), float(maximum), float(value), nullptr, nullptr, nullptr, {}});
         controls.back().intCallback = callback;
         return 1;
     }
     int SetIntSlider(CueRecognizer*, const char*, int) override { return 1; }
     int CreateOption(CueRecognizer*, const char* name, int count, const char* const* labels,
                      int value, OptionCallback callback) override {
-        controls.push_back({name, 0.0f, float(count - 1), float(value), nullptr, nullptr, nullptr, {}});
+        controls.push_back(
+            {name, 0.0f, float(count - 1), float(value), nullptr, nullptr, nullptr, {}});
         controls.back().optionCallback = callback;
         controls.back().labels.assign(labels, labels + count);
         return 1;
@@ -425,6 +428,44 @@ TEST(PhoneTimeline, QuietStepsAreSilence) {
     PhoneTimeline::SilenceQuietSteps(targets, {-20.0, -70.0, -60.0, -180.0}, -60.0, 9);
     EXPECT_THAT(targets, ElementsAre(1, 9, 3, 9));
 }
+
+TEST(PhoneTimeline, SpeechLevelSitsBelowThePeakAndAboveTheBackground) {
+    // Ten steps: a background of -60 dB under speech peaking at -10 dB.
+    const std::vector<double> quietRoom = {-60, -60, -58, -20, -10, -15, -30, -60, -59, -25};
+    EXPECT_DOUBLE_EQ(PhoneTimeline::SpeechLevel(quietRoom, 25, 20), -35.0);
+    // A noisy room (background -30 dB): speech must stand 20 dB above it.
+    const std::vector<double> noisyRoom = {-30, -30, -29, -20, -10, -15, -12, -30, -29, -25};
+    EXPECT_DOUBLE_EQ(PhoneTimeline::SpeechLevel(noisyRoom, 25, 20), -10.0);
+    EXPECT_EQ(PhoneTimeline::SpeechLevel({}, 25, 20), HUGE_VAL);
+}
+
+struct FillCase {
+    std::vector<int> in;
+    std::vector<double> levels;
+    long reach;
+    std::vector<int> out;
+};
+class FillLoudSilence : public ::testing::TestWithParam<FillCase> {};
+
+TEST_P(FillLoudSilence, LoudSilenceTakesTheNearestPhone) {
+    std::vector<int> targets = GetParam().in;
+    PhoneTimeline::FillLoudSilence(targets, GetParam().levels, -30.0, GetParam().reach, 9);
+    EXPECT_THAT(targets, ElementsAreArray(GetParam().out));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Table, FillLoudSilence,
+    ::testing::Values(
+        // Quiet silence stays; loud silence takes the nearer phone, the earlier on a tie.
+        FillCase{{1, 9, 9, 9, 2}, {-20, -50, -20, -20, -20}, 5, {1, 9, 1, 2, 2}},
+        FillCase{{1, 9, 2}, {-20, -20, -20}, 5, {1, 1, 2}},
+        // Filled steps do not spread further: only phones the decoder heard count.
+        FillCase{
+            {1, 9, 9, 9, 9, 9, 9}, {-20, -20, -20, -20, -20, -20, -20}, 2, {1, 1, 1, 9, 9, 9, 9}},
+        // All silence, however loud (white noise, say), stays silence.
+        FillCase{{9, 9, 9}, {-5, -5, -5}, 5, {9, 9, 9}},
+        // Fewer levels than steps: the steps without one are left alone.
+        FillCase{{1, 9, 9}, {-20, -20}, 5, {1, 1, 9}}));
 
 struct AbsorbCase {
     std::vector<int> in;
