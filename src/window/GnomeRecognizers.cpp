@@ -30,7 +30,6 @@
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
 
-
 namespace {
 
 // What a slider or option menu calls: the recognizer it currently serves and the plug-in's
@@ -531,8 +530,8 @@ void Gnome::recognize_cb(Widget, XtPointer client, XtPointer) {
     CueTime start, end;
     chart->GetRegionRange(start, end);
     chart->DeleteActiveKeyframeRegion();
-    std::unique_ptr<CueSound> piece = theImp.sound->Copy();
-    piece->Trim(start.Seconds(), end.Seconds());
+    // Only the region is copied: a short region of a long sound costs only its own length.
+    std::unique_ptr<CueSound> piece = theImp.sound->Excerpt(start.Seconds(), end.Seconds());
     if (end > start && piece->FrameCount() > 0 && r->GuardedRecognize(*piece)) {
         CueResultPlacement::Place(
             r->results, start, r->step,
