@@ -14,6 +14,7 @@
 #include "WorkspaceTestUtil.h"
 #include "phoneme/PauseSplitter.h"
 #include "phoneme/PhoneTimeline.h"
+#include "phoneme/SoundLevels.h"
 #include "toolkit/CueChirrup.h"
 #include "toolkit/CueRecognizerCatalog.h"
 #include "toolkit/CueSound.h"
@@ -507,6 +508,27 @@ std::vector<int16_t> tone(long samples, int16_t level) {
 std::vector<int16_t> operator+(std::vector<int16_t> a, const std::vector<int16_t>& b) {
     a.insert(a.end(), b.begin(), b.end());
     return a;
+}
+
+TEST(SoundLevels, MeasureTheMixOverSpansAtTheSoundsOwnRate) {
+    // 1000 frames per second: 0.25 s at half scale in both channels, 0.25 s of opposite
+    // channels (a silent mix), 0.1 s at half scale in one channel only.
+    std::vector<float> left(600, 0.5f), right(600, 0.5f);
+    for (size_t i = 250; i < 500; ++i)
+        right[i] = -0.5f;
+    for (size_t i = 500; i < 600; ++i)
+        right[i] = 0.0f;
+    const auto sound = CueSound::FromSamples({left, right}, 1000.0);
+    EXPECT_EQ(SoundLevels::SpanCount(*sound, 0.25), 3);  // the last span is short
+    EXPECT_EQ(SoundLevels::SpanCount(*sound, 0.1), 6);
+    const std::vector<double> levels = SoundLevels::Measure(*sound, 0.25, 4);
+    ASSERT_EQ(levels.size(), 4u);
+    EXPECT_NEAR(levels[0], -6.02, 0.01);
+    EXPECT_EQ(levels[1], SoundLevels::kSilent);
+    EXPECT_NEAR(levels[2], -12.04, 0.01);        // measured over the 0.1 s that is there
+    EXPECT_EQ(levels[3], SoundLevels::kSilent);  // wholly past the end
+    EXPECT_THAT(SoundLevels::Measure(CueSound(), 0.25, 0), IsEmpty());
+    EXPECT_EQ(SoundLevels::SpanCount(CueSound(), 0.25), 0);
 }
 
 TEST(PauseSplitter, CutsInTheMiddleOfPausesButNotAtTheEnds) {
