@@ -204,6 +204,18 @@ TEST_F(PhonemePlugin, SettingsRoundTripAndRefuseNonsense) {
                      "minimum 0\nminimum 11\nminimum\nspeed warp\nthreads -1\nthreads 99\n"
                      "models \"\"\nspeed fast slow\nend\n"));
     EXPECT_EQ(written(*r), text) << "out-of-range values leave the settings as they were";
+
+    // A damaged file: random bytes (NULs and unbalanced quotes among them), no "end".
+    std::mt19937 random(11);
+    std::string garbage(4096, '\0');
+    for (char& c : garbage)
+        c = char(random() % 256);
+    EXPECT_FALSE(read(*r, garbage));
+    EXPECT_FALSE(read(*r, "minimum 3\nspeed \"fast\nmodels \"unclosed"));
+    EXPECT_EQ(long(r->targets.size()), 40);
+    std::ostringstream again;
+    r->WriteSettings(again);
+    EXPECT_THAT(again.str(), HasSubstr("    step "));
     ASSERT_TRUE(r->GuardedResetSettings());
     EXPECT_EQ(written(*r), defaults);
 }
