@@ -4,19 +4,23 @@
 #   resources/demo/dialogue-phonemes.txt  when each word and phoneme starts, in seconds
 # Needs espeak-ng, sox, a C compiler and libespeak-ng-dev (for the timing helper, which asks
 # the same speech engine, with the same voice and speed, for its phoneme events).
-# Usage: tools/phoneme-times.sh [output-directory]   (default: resources/demo)
+# Usage: tools/phoneme-times.sh [output-directory [NAME VOICE SPEED TEXT]]
+#   (default: resources/demo, and the demo's line as "dialogue", voice en-us, 150 words per
+#   minute). With the four words, any other line is made the same way, as NAME.aiff and
+#   NAME-phonemes.txt: bench/phoneme-passages.sh makes its test passages so.
 set -euo pipefail
 here=$(cd "$(dirname "$0")/.." && pwd)
 out=${1:-$here/resources/demo}
-text="Hello there. Would you like some fresh mushroom soup?"
-voice=en-us
-speed=150   # words per minute
+name=${2:-dialogue}
+voice=${3:-en-us}
+speed=${4:-150}   # words per minute
+text=${5:-"Hello there. Would you like some fresh mushroom soup?"}
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
 
 # 1. The recording: espeak-ng speaks at 22050 Hz mono; sox writes it as AIFF 16-bit.
 espeak-ng -v "$voice" -s "$speed" -w "$work/dialogue.wav" "$text"
-sox "$work/dialogue.wav" -r 22050 -c 1 -b 16 -e signed-integer "$out/dialogue.aiff"
+sox "$work/dialogue.wav" -r 22050 -c 1 -b 16 -e signed-integer "$out/$name.aiff"
 
 # 2. The timings: a small program that synthesises the same text through the espeak-ng library
 # and prints each word and phoneme event with its position in the output.
@@ -64,19 +68,19 @@ int main(int argc, char** argv) {
 C
 cc -O1 -o "$work/times" "$work/times.c" -lespeak-ng
 {
-    echo "# Start times in seconds of the words and phonemes of resources/demo/dialogue.aiff,"
+    echo "# Start times in seconds of the words and phonemes of ${out#"$here"/}/$name.aiff,"
     echo "# as reported by espeak-ng $(espeak-ng --version | awk '{print $4}') (voice $voice, $speed words per minute)."
     echo "# Phonemes are espeak-ng's own names; \"_:\" and \"_\" are pauses; \"end\" is the end of speech."
     echo "# Text: $text"
     "$work/times" "$voice" "$speed" "$text" 2>"$work/count.txt"
-} > "$out/dialogue-phonemes.txt"
+} > "$out/$name-phonemes.txt"
 
 # The library must have produced as many samples as the recording holds, or the times would
 # not belong to it.
 made=$(awk '{print $1}' "$work/count.txt")
-recorded=$(soxi -s "$out/dialogue.aiff")
+recorded=$(soxi -s "$out/$name.aiff")
 if [ "$made" != "$recorded" ]; then
     echo "phoneme-times: timing run made $made samples, the recording has $recorded" >&2
     exit 1
 fi
-echo "wrote $out/dialogue.aiff ($(soxi -d "$out/dialogue.aiff")) and $out/dialogue-phonemes.txt"
+echo "wrote $out/$name.aiff ($(soxi -d "$out/$name.aiff")) and $out/$name-phonemes.txt"

@@ -20,11 +20,19 @@ std::vector<double> PauseSplitter::block_levels(const std::vector<int16_t>& samp
 }
 
 std::vector<PauseSplitter::Piece> PauseSplitter::Split(const std::vector<int16_t>& samples) const {
-    const long n = long(samples.size());
+    std::vector<Piece> pieces = SplitLevels(block_levels(samples));
+    for (Piece& p : pieces) {
+        p.begin *= kBlock;
+        p.end = std::min(long(samples.size()), p.end * kBlock);
+    }
+    return pieces;
+}
+
+std::vector<PauseSplitter::Piece> PauseSplitter::SplitLevels(
+    const std::vector<double>& levels) const {
     std::vector<Piece> pieces;
-    if (n == 0)
+    if (levels.empty())
         return pieces;
-    const std::vector<double> levels = block_levels(samples);
     const long blocks = long(levels.size());
     const double peak = *std::max_element(levels.begin(), levels.end());
     const double quiet = std::max(floor, peak - quietBelowPeak);
@@ -61,9 +69,9 @@ std::vector<PauseSplitter::Piece> PauseSplitter::Split(const std::vector<int16_t
     }
     long begin = 0;
     for (long cut : cuts) {
-        pieces.push_back({begin, cut * kBlock});
-        begin = cut * kBlock;
+        pieces.push_back({begin, cut});
+        begin = cut;
     }
-    pieces.push_back({begin, n});
+    pieces.push_back({begin, blocks});
     return pieces;
 }

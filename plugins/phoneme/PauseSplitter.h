@@ -9,8 +9,8 @@
 class PauseSplitter {
   public:
     struct Piece {
-        long begin;  // first sample
-        long end;    // one past the last sample
+        long begin;  // first sample (or block)
+        long end;    // one past the last sample (or block)
     };
 
     // 10 ms at 16 kHz: the unit in which loudness is measured.
@@ -26,7 +26,11 @@ class PauseSplitter {
     double quietBelowPeak = 35.0;
     double floor = -55.0;
 
+    // Pieces of 16 kHz samples.
     std::vector<Piece> Split(const std::vector<int16_t>& samples) const;
+    // Pieces in blocks, from the RMS level in dBFS of every 10 ms block of a sound at any
+    // rate (a shorter last block included).
+    std::vector<Piece> SplitLevels(const std::vector<double>& levels) const;
 
   private:
     // RMS level in dBFS of every block (a shorter last block included).

@@ -41,4 +41,5 @@ class PhoneDecoder {
   private:
     ps_decoder_s* decoder_ = nullptr;
     cmd_ln_s* config_ = nullptr;
+    std::vector<int16_t> piece_;  // the piece being decoded, dithered
 };

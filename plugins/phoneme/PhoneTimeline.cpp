@@ -37,6 +37,38 @@ void PhoneTimeline::SilenceQuietSteps(std::vector<int>& targets, const std::vect
             targets[i] = silence;
 }
 
+double PhoneTimeline::SpeechLevel(const std::vector<double>& levels, double belowPeak,
+                                  double aboveFloor) {
+    if (levels.empty())
+        return HUGE_VAL;
+    std::vector<double> sorted = levels;
+    const auto tenth = sorted.begin() + long(sorted.size() / 10);
+    std::nth_element(sorted.begin(), tenth, sorted.end());
+    const double background = *tenth;
+    const double peak = *std::max_element(levels.begin(), levels.end());
+    return std::max(peak - belowPeak, background + aboveFloor);
+}
+
+void PhoneTimeline::FillLoudSilence(std::vector<int>& targets, const std::vector<double>& levels,
+                                    double speech, long reach, int silence) {
+    const std::vector<int> heard = targets;
+    const long n = long(std::min(targets.size(), levels.size()));
+    for (long i = 0; i < n; ++i) {
+        if (heard[size_t(i)] != silence || !(levels[size_t(i)] >= speech))
+            continue;
+        for (long d = 1; d <= reach; ++d) {
+            if (i - d >= 0 && heard[size_t(i - d)] != silence) {
+                targets[size_t(i)] = heard[size_t(i - d)];
+                break;
+            }
+            if (i + d < long(heard.size()) && heard[size_t(i + d)] != silence) {
+                targets[size_t(i)] = heard[size_t(i + d)];
+                break;
+            }
+        }
+    }
+}
+
 namespace {
 struct Run {
     int target;

@@ -17,6 +17,7 @@
 #include "phoneme/PhoneSet.h"
 #include "phoneme/PhoneTimeline.h"
 #include "phoneme/Resample16k.h"
+#include "phoneme/SoundLevels.h"
 #include "toolkit/CueChirrup.h"
 #include "toolkit/CuePlugin.h"
 #include "toolkit/CueSound.h"
@@ -149,26 +150,6 @@ bool PhonemeRecognizer::Recognize(const CueSound& sound) {
     return false;
 }
 
-namespace {
-// The RMS level in dBFS of each step of 16 kHz samples.
-std::vector<double> step_levels(const std::vector<int16_t>& samples, double stepSeconds,
-                                long count) {
-    std::vector<double> levels;
-    levels.reserve(size_t(count));
-    const double perStep = stepSeconds * 16000.0;
-    for (long i = 0; i < count; ++i) {
-        const size_t begin = std::min(samples.size(), size_t(std::lround(i * perStep)));
-        const size_t end = std::min(samples.size(), size_t(std::lround((i + 1) * perStep)));
-        double sum = 0.0;
-        for (size_t j = begin; j < end; ++j)
-            sum += double(samples[j]) * samples[j];
-        const double rms = end > begin ? std::sqrt(sum / double(end - begin)) / 32768.0 : 0.0;
-        levels.push_back(rms > 1e-9 ? 20.0 * std::log10(rms) : -180.0);
-    }
-    return levels;
-}
-}  // namespace
-
 bool PhonemeRecognizer::recognize(const CueSound& sound) {
     if (!sound.Valid() || step <= CueTime())
         return false;
@@ -181,13 +162,24 @@ bool PhonemeRecognizer::recognize(const CueSound& sound) {
             Name(), missing.c_str());
         return false;
     }
-    std::vector<int16_t> samples;
-    if (!Resample16k(sound, samples)) {
+    if (!CanResample16k(sound.Rate())) {
         KLWarning("Recognizer [%s] cannot convert the sound's rate of %g Hz.\n", Name(),
                   sound.Rate());
         return false;
     }
-    const std::vector<PauseSplitter::Piece> pieces = PauseSplitter().Split(samples);
+    // The pieces are found from the loudness at the sound's own rate, and each worker
+    // converts only the piece it decodes: no copy of the whole sound is made.
+    const double rate = sound.Rate();
+    const long frames = sound.FrameCount();
+    const double block = double(PauseSplitter::kBlock) / 16000.0;
+    std::vector<PauseSplitter::Piece> pieces = PauseSplitter().SplitLevels(
+        SoundLevels::Measure(sound, block, SoundLevels::SpanCount(sound, block)));
+    for (PauseSplitter::Piece& p : pieces) {
+        p.begin = std::min(frames, std::lround(double(p.begin) * block * rate));
+        p.end = std::min(frames, std::lround(double(p.end) * block * rate));
+    }
+    if (!pieces.empty())
+        pieces.back().end = frames;
     const size_t workers = std::min(pieces.size(), size_t(thread_count()));
     if (!ready_decoders(std::max<size_t>(workers, 1))) {
         KLWarning("Recognizer [%s] could not start its speech decoder with the model in [%s].\n",
@@ -198,25 +190,41 @@ bool PhonemeRecognizer::recognize(const CueSound& sound) {
     // Workers take pieces in order; this thread reports progress until all are done.
     std::vector<std::vector<PhoneTimeline::Segment>> found(pieces.size());
     std::atomic<size_t> next{0};
-    std::atomic<long> samplesDone{0};
+    std::atomic<long> framesDone{0};
     std::atomic<bool> failed{false};
     std::mutex mutex;
     std::condition_variable finished;
-    size_t running = workers;
+    size_t running = 0;
     auto work = [&](PhoneDecoder* decoder) {
+        std::vector<int16_t> samples;
         for (size_t i; (i = next++) < pieces.size() && !failed;) {
-            if (!decoder->Decode(samples, pieces[i].begin, pieces[i].end, found[i]))
+            if (!Resample16k(sound, pieces[i].begin, pieces[i].end, samples) ||
+                !decoder->Decode(samples, 0, long(samples.size()), found[i])) {
                 failed = true;
-            samplesDone += pieces[i].end - pieces[i].begin;
+                break;
+            }
+            const double start = double(pieces[i].begin) / rate;
+            for (PhoneTimeline::Segment& s : found[i]) {
+                s.start += start;
+                s.end += start;
+            }
+            framesDone += pieces[i].end - pieces[i].begin;
         }
         std::lock_guard<std::mutex> lock(mutex);
         --running;
         finished.notify_all();
     };
+    // `running` counts the workers started, before each starts: one may finish before the
+    // next is started.
     std::vector<std::thread> pool;
     try {
-        for (size_t w = 0; w < workers; ++w)
+        for (size_t w = 0; w < workers; ++w) {
+            {
+                std::lock_guard<std::mutex> lock(mutex);
+                ++running;
+            }
             pool.emplace_back(work, decoders_[w].get());
+        }
     } catch (...) {
         // No thread may be left running when the pool goes.
         failed = true;
@@ -225,15 +233,11 @@ bool PhonemeRecognizer::recognize(const CueSound& sound) {
         throw;
     }
     {
-        std::lock_guard<std::mutex> lock(mutex);
-        running = pool.size();
-    }
-    {
         std::unique_lock<std::mutex> lock(mutex);
         while (!finished.wait_for(lock, std::chrono::milliseconds(100),
                                   [&] { return running == 0; })) {
             lock.unlock();
-            CueChirrup::Progress(this, float(samplesDone) / float(samples.size()));
+            CueChirrup::Progress(this, float(framesDone) / float(frames));
             lock.lock();
         }
     }
@@ -248,11 +252,14 @@ bool PhonemeRecognizer::recognize(const CueSound& sound) {
     for (const auto& piece : found)
         segments.insert(segments.end(), piece.begin(), piece.end());
     const double stepSeconds = step.Seconds();
-    const long count = PhoneTimeline::StepCount(sound.FrameCount() / sound.Rate(), stepSeconds);
+    const long count = PhoneTimeline::StepCount(double(frames) / rate, stepSeconds);
     std::vector<int> perStep =
         PhoneTimeline::StepTargets(segments, stepSeconds, count, PhoneSet::kSilence);
-    PhoneTimeline::SilenceQuietSteps(perStep, step_levels(samples, stepSeconds, count), kQuietLevel,
-                                     PhoneSet::kSilence);
+    const std::vector<double> levels = SoundLevels::Measure(sound, stepSeconds, count);
+    PhoneTimeline::SilenceQuietSteps(perStep, levels, kQuietLevel, PhoneSet::kSilence);
+    PhoneTimeline::FillLoudSilence(
+        perStep, levels, PhoneTimeline::SpeechLevel(levels, kSpeechBelowPeak, kSpeechAboveFloor),
+        std::max(1L, std::lround(kSpeechReach / stepSeconds)), PhoneSet::kSilence);
     PhoneTimeline::AbsorbShortRuns(perStep, minimum);
     results.reserve(perStep.size());
     for (int t : perStep)

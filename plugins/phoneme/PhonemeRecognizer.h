@@ -29,6 +29,12 @@ class PhonemeRecognizer : public CueRecognizer {
     static constexpr int kMaximumThreads = 16;
     // Steps quieter than this (dBFS) are silence whatever the decoder says.
     static constexpr double kQuietLevel = -60.0;
+    // Steps within this many dB of the loudest and this many above the background are
+    // speech: where the decoder hears silence in one, the nearest phone within kSpeechReach
+    // seconds is taken instead.
+    static constexpr double kSpeechBelowPeak = 25.0;
+    static constexpr double kSpeechAboveFloor = 20.0;
+    static constexpr double kSpeechReach = 0.2;
     static const char* const kSpeedNames[3];
 
     PhonemeRecognizer();

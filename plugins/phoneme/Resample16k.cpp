@@ -7,15 +7,23 @@
 
 #include "toolkit/CueSound.h"
 
-bool Resample16k(const CueSound& sound, std::vector<int16_t>& out) {
+bool CanResample16k(double rate) {
+    const double ratio = 16000.0 / rate;
+    return ratio > 1.0 / 256 && ratio < 256;
+}
+
+bool Resample16k(const CueSound& sound, long first, long last, std::vector<int16_t>& out) {
     out.clear();
-    const long frames = sound.FrameCount();
+    const long all = sound.FrameCount();
+    first = std::clamp(first, 0L, all);
+    last = std::clamp(last, first, all);
+    const long frames = last - first;
     const int channels = sound.ChannelCount();
     if (frames == 0 || channels == 0)
         return true;
-    const double ratio = 16000.0 / sound.Rate();
-    if (!(ratio > 1.0 / 256) || !(ratio < 256))
+    if (!CanResample16k(sound.Rate()))
         return false;
+    const double ratio = 16000.0 / sound.Rate();
     int error = 0;
     SRC_STATE* state = src_new(SRC_SINC_FASTEST, 1, &error);
     if (!state)
@@ -30,7 +38,7 @@ bool Resample16k(const CueSound& sound, std::vector<int16_t>& out) {
         for (long i = 0; i < count; ++i) {
             float mix = 0.0f;
             for (int c = 0; c < channels; ++c)
-                mix += sound.Channel(c)[size_t(begin + i)];
+                mix += sound.Channel(c)[size_t(first + begin + i)];
             in[size_t(i)] = mix / float(channels);
         }
         SRC_DATA data{};

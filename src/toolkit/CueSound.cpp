@@ -372,9 +372,23 @@ std::unique_ptr<CueSound> CueSound::Copy() const {
     return std::make_unique<CueSound>(*this);
 }
 
-void CueSound::Trim(double startSeconds, double endSeconds) {
+std::unique_ptr<CueSound> CueSound::Excerpt(double startSeconds, double endSeconds) const {
+    auto excerpt = std::make_unique<CueSound>();
+    excerpt->rate_ = rate_;
+    excerpt->fileName_ = fileName_;
+    excerpt->error_ = error_;
     if (channels_.empty() || rate_ <= 0)
-        return;
+        return excerpt;
+    long begin = 0, end = 0;
+    frame_range(startSeconds, endSeconds, begin, end);
+    for (const auto& c : channels_)
+        excerpt->channels_.emplace_back(c.begin() + begin, c.begin() + end);
+    if (min_ != 0.0f || max_ != 0.0f)
+        excerpt->ComputeMinMax();
+    return excerpt;
+}
+
+void CueSound::frame_range(double startSeconds, double endSeconds, long& begin, long& end) const {
     const long frames = FrameCount();
     // Frame i sounds at i / rate seconds; keep the frames whose time is in [start, end). The
     // small tolerance keeps a time that is a whole frame in decimal (0.1 s at 44.1 kHz) on
@@ -385,8 +399,15 @@ void CueSound::Trim(double startSeconds, double endSeconds) {
         const double f = std::ceil(seconds * rate_ - 1e-6);
         return f >= double(frames) ? frames : long(f);
     };
-    const long begin = first_frame_at(startSeconds);
-    const long end = std::max(begin, first_frame_at(endSeconds));
+    begin = first_frame_at(startSeconds);
+    end = std::max(begin, first_frame_at(endSeconds));
+}
+
+void CueSound::Trim(double startSeconds, double endSeconds) {
+    if (channels_.empty() || rate_ <= 0)
+        return;
+    long begin = 0, end = 0;
+    frame_range(startSeconds, endSeconds, begin, end);
     for (auto& c : channels_) {
         c.erase(c.begin() + end, c.end());
         c.erase(c.begin(), c.begin() + begin);

@@ -53,11 +53,16 @@ class CueSound {
     // Keeps only the frames of [startSeconds, endSeconds) (clamped to the sound). Not on a
     // sound being played: trim a Copy.
     void Trim(double startSeconds, double endSeconds);
+    // A new sound of the frames Trim would keep, copied without copying the rest: a short
+    // region of a long sound costs only its own length.
+    std::unique_ptr<CueSound> Excerpt(double startSeconds, double endSeconds) const;
     // The mix of all channels resampled to `rate` frames per second (16 kHz for recognizers);
     // empty for an empty sound or a rate outside 1/256 to 256 times the sound's own.
     std::vector<float> Resampled(double rate) const;
 
   private:
+    // The frames [begin, end) whose times lie in [startSeconds, endSeconds), clamped.
+    void frame_range(double startSeconds, double endSeconds, long& begin, long& end) const;
     // Decodes a whole sound file image; `bytes` has its size fields repaired in place.
     void load(std::vector<uint8_t>& bytes);
     // Empties the sound and keeps "Could not open sound file [name]: reason" as the error.

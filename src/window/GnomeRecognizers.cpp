@@ -265,10 +265,12 @@ void Gnome::recognize_cb(Widget, XtPointer client, XtPointer) {
         XmUpdateDisplay(dialog);
     CueTime start, end;
     chart->GetRegionRange(start, end);
-    chart->DeleteActiveKeyframeRegion();
-    std::unique_ptr<CueSound> piece = theImp.sound->Copy();
-    piece->Trim(start.Seconds(), end.Seconds());
+    // Only the region is copied: a short region of a long sound costs only its own length.
+    std::unique_ptr<CueSound> piece = theImp.sound->Excerpt(start.Seconds(), end.Seconds());
+    // The region's keys make way for the results only once there are results: a region
+    // with no sound in it, or a recognizer that cannot run, loses no key.
     if (end > start && piece->FrameCount() > 0 && r->GuardedRecognize(*piece)) {
+        chart->DeleteActiveKeyframeRegion();
         CueResultPlacement::Place(
             r->results, start, r->step,
             [&](const CueResultPlacement::Key& k) {

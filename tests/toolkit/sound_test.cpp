@@ -251,6 +251,29 @@ TEST(SoundOps, MixMinMaxAndTrimEnds) {
     EXPECT_FALSE(CueSound::FromSamples({{1, 2}}, std::nan(""))->Valid());
 }
 
+TEST(SoundOps, ExcerptIsWhatTrimKeepsAndHoldsOnlyThat) {
+    std::vector<float> a(2000), b(2000, -0.5f);
+    for (size_t i = 0; i < a.size(); ++i)
+        a[i] = float(i) / 1000.0f;
+    auto sound = CueSound::FromSamples({a, b}, 1000.0);
+    sound->ComputeMinMax();
+    const std::pair<double, double> ranges[] = {{0.25, 0.5}, {-3.0, 99.0}, {1.9995, 5.0},
+                                                {1.0, 0.5},  {0.1, 0.1},   {0.0, 0.001}};
+    for (const auto& [start, end] : ranges) {
+        auto trimmed = sound->Copy();
+        trimmed->Trim(start, end);
+        const auto excerpt = sound->Excerpt(start, end);
+        ASSERT_EQ(excerpt->ChannelCount(), 2) << start << " " << end;
+        EXPECT_EQ(excerpt->Rate(), 1000.0);
+        EXPECT_EQ(excerpt->Channel(0), trimmed->Channel(0)) << start << " " << end;
+        EXPECT_EQ(excerpt->Channel(1), trimmed->Channel(1)) << start << " " << end;
+        EXPECT_LE(excerpt->Channel(0).capacity(), excerpt->Channel(0).size() + 16);
+        EXPECT_EQ(excerpt->Min(), trimmed->Min());
+        EXPECT_EQ(excerpt->Max(), trimmed->Max());
+    }
+    EXPECT_FALSE(CueSound().Excerpt(0.0, 1.0)->Valid());
+}
+
 TEST(SoundOps, MixResampledTo16kKeepsPitchAndLevel) {
     const double rate = 44100;
     std::vector<float> tone(44100);

@@ -35,6 +35,8 @@ namespace fs = std::filesystem;
 
 namespace {
 
+const char* const PhonemeModels = "/usr/share/pocketsphinx/model/en-us";
+
 // The shipped plug-ins, and no sound device, before the window scans for them.
 const bool kEnvironment = [] {
     setenv("TESSEL_PLUGIN_PATH", CHIRRUP_BINARY_DIR "/lib/chirrup/plugins", 1);
@@ -231,6 +233,59 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     click_panel("Phoneme", "Dismiss");
     EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(container); }));
     EXPECT_EQ(r->shown, 0);
+}
+
+// A recognizer that cannot run, or a region past the end of the sound, leaves the region's
+// keys as they were.
+TEST_F(Recognizers, RecognitionThatFindsNothingKeepsTheRegionsKeys) {
+    ASSERT_EQ(theImp.LoadSound((project + "/misc_data/dialogue.aiff").c_str()), 1);
+    KLSyncChart* chart = gnome->syncChart;
+    ASSERT_TRUE(chart);
+    chart->SetSound(theImp.sound.get());
+    chart->SetKeyTrack(theImp.GetKeyTrack(0));
+    const double length = theImp.sound->Length();
+    chart->SetUserDuration(CueTime::FromSeconds(length + 2.0));
+    chart->ZoomReset();
+    Gnome::create_recognize_cb(nullptr, const_cast<char*>("Phoneme"), nullptr);
+    CueRecognizer* r = mouth->GetRecognizer("Phoneme");
+    ASSERT_TRUE(r);
+    KLKeyTrack* track = theImp.GetKeyTrack(0);
+    ASSERT_TRUE(track);
+    const int open = mouth->GetKeyShapeId("O");
+    ASSERT_GE(open, 0);
+    auto keys = [&] {
+        std::vector<std::pair<double, int>> out;
+        for (KLKeyEvent* e = track->events.Head(); e; e = track->events.Next(e))
+            out.push_back({e->time.Seconds(), e->shapeIndex});
+        return out;
+    };
+    chart->AddTimeKeyframe(open, CueTime::FromSeconds(1.0), mouth->GetKeyShape(open), 0);
+    chart->AddTimeKeyframe(open, CueTime::FromSeconds(length + 1.0), mouth->GetKeyShape(open), 0);
+    const auto before = keys();
+
+    // The speech model is missing: reported, and no key goes.
+    const fs::path missing = fs::temp_directory_path() / "chirrup-no-speech-model";
+    std::istringstream noModel("models \"" + missing.string() + "\"\nend\n");
+    r->ReadSettings(noModel);
+    chart->SetRegionRange(CueTime::FromSeconds(0.5), CueTime::FromSeconds(2.0));
+    Gnome::recognize_cb(nullptr, r, nullptr);
+    EXPECT_EQ(keys(), before);
+    EXPECT_FALSE(windowtest::Viewable(gnome->informationAlert->GetDialog()));
+
+    // A region wholly past the sound's end has nothing to hear.
+    std::istringstream model("models \"" + std::string(PhonemeModels) + "\"\nend\n");
+    r->ReadSettings(model);
+    chart->SetRegionRange(CueTime::FromSeconds(length + 0.5), CueTime::FromSeconds(length + 1.5));
+    Gnome::recognize_cb(nullptr, r, nullptr);
+    EXPECT_EQ(keys(), before);
+
+    // Over speech the region's keys make way for the results.
+    chart->SetRegionRange(CueTime::FromSeconds(0.5), CueTime::FromSeconds(2.0));
+    Gnome::recognize_cb(nullptr, r, nullptr);
+    EXPECT_NE(keys(), before);
+    for (const auto& [t, shape] : keys())
+        EXPECT_FALSE(t == 1.0 && shape == open) << "the key at 1 s is replaced";
+    chart->SetRegionRange(CueTime(), CueTime());
 }
 
 // Loudness's sliders with their value labels, and the messages for controls that are not

@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cmath>
 #include <filesystem>
 #include <memory>
 #include <random>
@@ -13,6 +14,7 @@
 #include "WorkspaceTestUtil.h"
 #include "phoneme/PauseSplitter.h"
 #include "phoneme/PhoneTimeline.h"
+#include "phoneme/SoundLevels.h"
 #include "toolkit/CueChirrup.h"
 #include "toolkit/CueRecognizerCatalog.h"
 #include "toolkit/CueSound.h"
@@ -202,6 +204,18 @@ TEST_F(PhonemePlugin, SettingsRoundTripAndRefuseNonsense) {
                      "minimum 0\nminimum 11\nminimum\nspeed warp\nthreads -1\nthreads 99\n"
                      "models \"\"\nspeed fast slow\nend\n"));
     EXPECT_EQ(written(*r), text) << "out-of-range values leave the settings as they were";
+
+    // A damaged file: random bytes (NULs and unbalanced quotes among them), no "end".
+    std::mt19937 random(11);
+    std::string garbage(4096, '\0');
+    for (char& c : garbage)
+        c = char(random() % 256);
+    EXPECT_FALSE(read(*r, garbage));
+    EXPECT_FALSE(read(*r, "minimum 3\nspeed \"fast\nmodels \"unclosed"));
+    EXPECT_EQ(long(r->targets.size()), 40);
+    std::ostringstream again;
+    r->WriteSettings(again);
+    EXPECT_THAT(again.str(), HasSubstr("    step "));
     ASSERT_TRUE(r->GuardedResetSettings());
     EXPECT_EQ(written(*r), defaults);
 }
@@ -253,6 +267,10 @@ TEST_P(PhonemeOddSounds, GiveOneResultPerStepAndFindWhatIsThere) {
     EXPECT_EQ(long(r->results.size()), frames_of(*sound));
     if (!GetParam().phones.empty()) {
         EXPECT_TRUE(in_order(phones(*r), GetParam().phones)) << joined(phones(*r));
+    } else {
+        // Nothing heard: no phone for a key to be placed from.
+        EXPECT_THAT(phones(*r), ::testing::AnyOf(IsEmpty(), ElementsAre("SIL")))
+            << joined(phones(*r));
     }
     EXPECT_THAT(reports.text, IsEmpty());
 }
@@ -329,14 +347,16 @@ class RecordingHost : public CueChirrupHost {
     int SetFloatSlider(CueRecognizer*, const char*, float) override { return 1; }
     int CreateIntSlider(CueRecognizer*, const char* name, int minimum, int maximum, int value,
                         IntCallback callback) override {
-        controls.push_back({name, float(minimum), float(maximum), float(value), nullptr, nullptr, nullptr, {}});
+        controls.push_back(
+            {name, float(minimum), float(maximum), float(value), nullptr, nullptr, nullptr, {}});
         controls.back().intCallback = callback;
         return 1;
     }
     int SetIntSlider(CueRecognizer*, const char*, int) override { return 1; }
     int CreateOption(CueRecognizer*, const char* name, int count, const char* const* labels,
                      int value, OptionCallback callback) override {
-        controls.push_back({name, 0.0f, float(count - 1), float(value), nullptr, nullptr, nullptr, {}});
+        controls.push_back(
+            {name, 0.0f, float(count - 1), float(value), nullptr, nullptr, nullptr, {}});
         controls.back().optionCallback = callback;
         controls.back().labels.assign(labels, labels + count);
         return 1;
@@ -426,6 +446,44 @@ TEST(PhoneTimeline, QuietStepsAreSilence) {
     EXPECT_THAT(targets, ElementsAre(1, 9, 3, 9));
 }
 
+TEST(PhoneTimeline, SpeechLevelSitsBelowThePeakAndAboveTheBackground) {
+    // Ten steps: a background of -60 dB under speech peaking at -10 dB.
+    const std::vector<double> quietRoom = {-60, -60, -58, -20, -10, -15, -30, -60, -59, -25};
+    EXPECT_DOUBLE_EQ(PhoneTimeline::SpeechLevel(quietRoom, 25, 20), -35.0);
+    // A noisy room (background -30 dB): speech must stand 20 dB above it.
+    const std::vector<double> noisyRoom = {-30, -30, -29, -20, -10, -15, -12, -30, -29, -25};
+    EXPECT_DOUBLE_EQ(PhoneTimeline::SpeechLevel(noisyRoom, 25, 20), -10.0);
+    EXPECT_EQ(PhoneTimeline::SpeechLevel({}, 25, 20), HUGE_VAL);
+}
+
+struct FillCase {
+    std::vector<int> in;
+    std::vector<double> levels;
+    long reach;
+    std::vector<int> out;
+};
+class FillLoudSilence : public ::testing::TestWithParam<FillCase> {};
+
+TEST_P(FillLoudSilence, LoudSilenceTakesTheNearestPhone) {
+    std::vector<int> targets = GetParam().in;
+    PhoneTimeline::FillLoudSilence(targets, GetParam().levels, -30.0, GetParam().reach, 9);
+    EXPECT_THAT(targets, ElementsAreArray(GetParam().out));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Table, FillLoudSilence,
+    ::testing::Values(
+        // Quiet silence stays; loud silence takes the nearer phone, the earlier on a tie.
+        FillCase{{1, 9, 9, 9, 2}, {-20, -50, -20, -20, -20}, 5, {1, 9, 1, 2, 2}},
+        FillCase{{1, 9, 2}, {-20, -20, -20}, 5, {1, 1, 2}},
+        // Filled steps do not spread further: only phones the decoder heard count.
+        FillCase{
+            {1, 9, 9, 9, 9, 9, 9}, {-20, -20, -20, -20, -20, -20, -20}, 2, {1, 1, 1, 9, 9, 9, 9}},
+        // All silence, however loud (white noise, say), stays silence.
+        FillCase{{9, 9, 9}, {-5, -5, -5}, 5, {9, 9, 9}},
+        // Fewer levels than steps: the steps without one are left alone.
+        FillCase{{1, 9, 9}, {-20, -20}, 5, {1, 1, 9}}));
+
 struct AbsorbCase {
     std::vector<int> in;
     int minimum;
@@ -466,6 +524,27 @@ std::vector<int16_t> tone(long samples, int16_t level) {
 std::vector<int16_t> operator+(std::vector<int16_t> a, const std::vector<int16_t>& b) {
     a.insert(a.end(), b.begin(), b.end());
     return a;
+}
+
+TEST(SoundLevels, MeasureTheMixOverSpansAtTheSoundsOwnRate) {
+    // 1000 frames per second: 0.25 s at half scale in both channels, 0.25 s of opposite
+    // channels (a silent mix), 0.1 s at half scale in one channel only.
+    std::vector<float> left(600, 0.5f), right(600, 0.5f);
+    for (size_t i = 250; i < 500; ++i)
+        right[i] = -0.5f;
+    for (size_t i = 500; i < 600; ++i)
+        right[i] = 0.0f;
+    const auto sound = CueSound::FromSamples({left, right}, 1000.0);
+    EXPECT_EQ(SoundLevels::SpanCount(*sound, 0.25), 3);  // the last span is short
+    EXPECT_EQ(SoundLevels::SpanCount(*sound, 0.1), 6);
+    const std::vector<double> levels = SoundLevels::Measure(*sound, 0.25, 4);
+    ASSERT_EQ(levels.size(), 4u);
+    EXPECT_NEAR(levels[0], -6.02, 0.01);
+    EXPECT_EQ(levels[1], SoundLevels::kSilent);
+    EXPECT_NEAR(levels[2], -12.04, 0.01);        // measured over the 0.1 s that is there
+    EXPECT_EQ(levels[3], SoundLevels::kSilent);  // wholly past the end
+    EXPECT_THAT(SoundLevels::Measure(CueSound(), 0.25, 0), IsEmpty());
+    EXPECT_EQ(SoundLevels::SpanCount(CueSound(), 0.25), 0);
 }
 
 TEST(PauseSplitter, CutsInTheMiddleOfPausesButNotAtTheEnds) {
