@@ -318,3 +318,37 @@ bool SceneChecker::ReadFloats(const tinygltf::Model& m, int index, int component
     }
     return true;
 }
+
+namespace {
+uint32_t read_u32(const unsigned char* p) {
+    return uint32_t(p[0]) | uint32_t(p[1]) << 8 | uint32_t(p[2]) << 16 | uint32_t(p[3]) << 24;
+}
+}  // namespace
+
+bool SceneChecker::CheckGlb(const unsigned char* data, size_t size, size_t* used,
+                            std::string* why) {
+    if (size < 20) {
+        *why = "binary container is truncated";
+        return false;
+    }
+    uint32_t version = read_u32(data + 4), length = read_u32(data + 8);
+    uint32_t jsonLength = read_u32(data + 12), jsonType = read_u32(data + 16);
+    if (version != 2) {
+        *why = "binary container has version " + std::to_string(version) + ", not 2";
+        return false;
+    }
+    if (length > size || length < 20 || jsonType != 0x4E4F534A || jsonLength == 0 ||
+        uint64_t(jsonLength) + 20 > length) {
+        *why = "binary container has inconsistent chunk lengths";
+        return false;
+    }
+    uint64_t rest = length - 20 - uint64_t(jsonLength);
+    if (rest != 0) {
+        if (rest < 8 || uint64_t(read_u32(data + 20 + jsonLength)) + 8 > rest) {
+            *why = "binary container has inconsistent chunk lengths";
+            return false;
+        }
+    }
+    *used = length;
+    return true;
+}

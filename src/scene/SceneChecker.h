@@ -20,6 +20,10 @@ class SceneChecker {
     static bool ReadFloats(const tinygltf::Model& model, int index, int components,
                            std::vector<float>* out, std::string* why);
 
+    // The .glb container's header and chunk lengths, so that the loader never reads past the
+    // `size` bytes it is given; *used gets the container's own length.
+    static bool CheckGlb(const unsigned char* data, size_t size, size_t* used, std::string* why);
+
   private:
     static bool checkAccessor(const tinygltf::Model& model, size_t index, std::string* why);
     static bool checkNodes(const tinygltf::Model& model, std::string* why);

@@ -30,10 +30,6 @@ bool separate_times(const std::vector<ChannelCurve::Key>& keys) {
     return true;
 }
 
-uint32_t read_u32(const unsigned char* p) {
-    return uint32_t(p[0]) | uint32_t(p[1]) << 8 | uint32_t(p[2]) << 16 | uint32_t(p[3]) << 24;
-}
-
 // Images are kept as the bytes they were read as (never decoded), so that they are written
 // back unchanged; images stored in buffer views stay there.
 bool keep_image_bytes(tinygltf::Image* image, const int, std::string*, std::string*, int, int,
@@ -74,34 +70,6 @@ bool read_regular_file(std::vector<unsigned char>* out, std::string* err, const 
         return false;
     }
     return tinygltf::ReadWholeFile(out, err, path, data);
-}
-
-// Checks the .glb container so that the loader never reads past the bytes it is given.
-bool check_glb(const unsigned char* data, size_t size, size_t* used, std::string* why) {
-    if (size < 20) {
-        *why = "binary container is truncated";
-        return false;
-    }
-    uint32_t version = read_u32(data + 4), length = read_u32(data + 8);
-    uint32_t jsonLength = read_u32(data + 12), jsonType = read_u32(data + 16);
-    if (version != 2) {
-        *why = "binary container has version " + std::to_string(version) + ", not 2";
-        return false;
-    }
-    if (length > size || length < 20 || jsonType != 0x4E4F534A || jsonLength == 0 ||
-        uint64_t(jsonLength) + 20 > length) {
-        *why = "binary container has inconsistent chunk lengths";
-        return false;
-    }
-    uint64_t rest = length - 20 - uint64_t(jsonLength);
-    if (rest != 0) {
-        if (rest < 8 || uint64_t(read_u32(data + 20 + jsonLength)) + 8 > rest) {
-            *why = "binary container has inconsistent chunk lengths";
-            return false;
-        }
-    }
-    *used = length;
-    return true;
 }
 
 std::string dir_of(const std::string& path) {
@@ -174,7 +142,7 @@ std::shared_ptr<SceneDocument> SceneDocument::parse(const unsigned char* data, s
     if (size >= 4 && std::memcmp(data, "glTF", 4) == 0) {
         size_t used = 0;
         std::string why;
-        if (!check_glb(data, size, &used, &why)) {
+        if (!SceneChecker::CheckGlb(data, size, &used, &why)) {
             return bad(why);
         }
         ok = loader.LoadBinaryFromMemory(&doc->model_, &err, &warn, data, unsigned(used), baseDir);
