@@ -176,8 +176,9 @@ TEST_P(SoundPassTest, WritesTheResampledSoundForTheWholePass) {
     Samples ref = resampled(sound->Channel(0), rate_ / (sound->Rate() * speed));
     if (reverse)
         std::reverse(ref.begin(), ref.end());
-    // The first output latency of the pass is heard before the device could play it.
-    const long latency = long(KLSoundControl::Latency() * rate_) + 1;
+    // The first output latency of the pass is heard before the device could play it, and
+    // one buffer more when the device was already filling one as the timer started.
+    const long latency = 2 * long(KLSoundControl::Latency() * rate_) + 1;
     long extent = seg[0].second - seg[0].first;
     EXPECT_NEAR(double(extent), double(ref.size()), double(latency + 64)) << "lasts length / speed";
     EXPECT_LT(mismatch(out, seg[0], ref, 64), 0.01f);
@@ -195,7 +196,8 @@ TEST_F(SoundOutputTest, HalfSpeedLastsTwiceAsLongAsFullSpeed) {
     ASSERT_EQ(seg.size(), 2u);
     double full = double(seg[0].second - seg[0].first);
     double half = double(seg[1].second - seg[1].first);
-    EXPECT_NEAR(half / full, 2.0, 0.03);
+    // Each pass may start a buffer late (see above): 2% of the full-speed pass.
+    EXPECT_NEAR(half / full, 2.0, 0.05);
 }
 
 // A looped region is a new timer and a new Play each time: each repeat is the whole region.
@@ -208,12 +210,14 @@ TEST_F(SoundOutputTest, ALoopRepeatsTheRegion) {
     Samples out = Written();
     auto seg = segments(out);
     ASSERT_EQ(seg.size(), 3u);
+    // Each repeat loses its first one or two buffers (see above).
+    const double late = 2 * KLSoundControl::Latency() * rate_ + 64;
     for (auto s : seg) {
-        EXPECT_NEAR(double(s.second - s.first), double(region.size()), 600.0);
+        EXPECT_NEAR(double(s.second - s.first), double(region.size()), late);
         EXPECT_LT(mismatch(out, s, ref, 64), 0.01f);
         long middle = (s.first + s.second) / 2 - 256;
         long at = locate(out, middle, ref) - (middle - s.first);
-        EXPECT_NEAR(double(at), double(ref.size() / 4), 600.0) << "each repeat starts at 0.25 s";
+        EXPECT_NEAR(double(at), double(ref.size() / 4), late) << "each repeat starts at 0.25 s";
     }
 }
 
