@@ -305,9 +305,14 @@ void Gnome::ShowKeyframeImage() {
 void Gnome::show_keyframe_cb(Widget, XtPointer, KLFiend*) {
     Gnome* g = TheGnome();
     if (g && g->syncChart) {
-        CueTime t = g->syncChart->GetIndicatorTime();
-        g->GoToTime(t);
-        g->DisplayTimecode(t);
+        // A key made active while the indicator is hidden (before the first click, or
+        // scrolled out of view; a recognizer placing keys) leaves the views and the time
+        // where they are: a hidden indicator has no time worth showing.
+        if (g->syncChart->geometry.ValidColumn(g->syncChart->geometry.indicatorX)) {
+            const CueTime t = g->syncChart->GetIndicatorTime();
+            g->GoToTime(t);
+            g->DisplayTimecode(t);
+        }
         // A key became active: its value in the value field, its shape's tile selected.
         if (const KLKeyEvent* key = g->syncChart->activeKey) {
             g->SetKeyValue(key->value);

@@ -228,6 +228,10 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     for (KLKeyEvent* e = track->events.Head(); e; e = track->events.Next(e))
         restInPause += e->time.Seconds() > 0.8 && e->time.Seconds() < 1.3 && e->shapeIndex == rest;
     EXPECT_GE(restInPause, 1);
+    // The placed keys become active one after another while the indicator is hidden (no
+    // click yet): the information bar keeps a time the chart can show.
+    EXPECT_EQ(label_of(W("infoTimeValue")).find('-'), std::string::npos)
+        << label_of(W("infoTimeValue"));
     guitest::Screenshot("window-phoneme-recognized");
 
     click_panel("Phoneme", "Dismiss");
