@@ -14,6 +14,8 @@
 
 #include <tiny_gltf.h>
 
+#include "GltfModelBuilder.h"
+
 namespace {
 constexpr double kPi = 3.14159265358979323846;
 constexpr int kFps = 30;
@@ -57,65 +59,18 @@ struct Vertex {
     double weight;              // of joints[0]; joints[1] gets the rest
 };
 
-class Builder {
+class Builder : public GltfModelBuilder {
   public:
-    tinygltf::Model model;
-
-    Builder() {
-        model.asset.version = "2.0";
-        model.asset.generator = "chirrup make_demo_face";
-        model.buffers.emplace_back();
-    }
+    Builder() { m.asset.generator = "chirrup make_demo_face"; }
 
     int Material(const char* name, double r, double g, double b, double roughness) {
-        tinygltf::Material m;
-        m.name = name;
-        m.pbrMetallicRoughness.baseColorFactor = {r, g, b, 1.0};
-        m.pbrMetallicRoughness.metallicFactor = 0.0;
-        m.pbrMetallicRoughness.roughnessFactor = roughness;
-        model.materials.push_back(m);
-        return int(model.materials.size()) - 1;
-    }
-
-    int View(const void* data, size_t bytes, int target) {
-        std::vector<unsigned char>& buf = model.buffers[0].data;
-        buf.resize((buf.size() + 3) & ~size_t(3), 0);
-        tinygltf::BufferView v;
-        v.buffer = 0;
-        v.byteOffset = buf.size();
-        v.byteLength = bytes;
-        v.target = target;
-        const unsigned char* p = static_cast<const unsigned char*>(data);
-        buf.insert(buf.end(), p, p + bytes);
-        model.bufferViews.push_back(v);
-        return int(model.bufferViews.size()) - 1;
-    }
-
-    int Accessor(const void* data, size_t count, int width, int componentType, int size, int target,
-                 bool minMax, const std::vector<float>* floats = nullptr) {
-        tinygltf::Accessor a;
-        a.bufferView = View(data, count * size_t(width) * size_t(size), target);
-        a.componentType = componentType;
-        a.count = count;
-        a.type = width == 1 ? TINYGLTF_TYPE_SCALAR
-                            : (width == 3 ? TINYGLTF_TYPE_VEC3
-                                          : (width == 4 ? TINYGLTF_TYPE_VEC4 : TINYGLTF_TYPE_MAT4));
-        if (minMax && floats) {
-            a.minValues.assign(size_t(width), 1e30);
-            a.maxValues.assign(size_t(width), -1e30);
-            for (size_t i = 0; i < floats->size(); ++i) {
-                size_t c = i % size_t(width);
-                a.minValues[c] = std::min(a.minValues[c], double((*floats)[i]));
-                a.maxValues[c] = std::max(a.maxValues[c], double((*floats)[i]));
-            }
-        }
-        model.accessors.push_back(a);
-        return int(model.accessors.size()) - 1;
-    }
-
-    int Floats(const std::vector<float>& v, int width, bool minMax, int target = 0) {
-        return Accessor(v.data(), v.size() / size_t(width), width, TINYGLTF_COMPONENT_TYPE_FLOAT, 4,
-                        target, minMax, &v);
+        tinygltf::Material mat;
+        mat.name = name;
+        mat.pbrMetallicRoughness.baseColorFactor = {r, g, b, 1.0};
+        mat.pbrMetallicRoughness.metallicFactor = 0.0;
+        mat.pbrMetallicRoughness.roughnessFactor = roughness;
+        m.materials.push_back(mat);
+        return int(m.materials.size()) - 1;
     }
 
     // One primitive from vertices and triangle indices.
@@ -140,14 +95,14 @@ class Builder {
             wts.insert(wts.end(), {w0, w1, 0, 0});
         }
         tinygltf::Primitive p;
-        p.attributes["POSITION"] = Floats(pos, 3, true, TINYGLTF_TARGET_ARRAY_BUFFER);
-        p.attributes["NORMAL"] = Floats(nrm, 3, false, TINYGLTF_TARGET_ARRAY_BUFFER);
+        p.attributes["POSITION"] = Floats(pos, 3, 0, true, TINYGLTF_TARGET_ARRAY_BUFFER);
+        p.attributes["NORMAL"] = Floats(nrm, 3, 0, false, TINYGLTF_TARGET_ARRAY_BUFFER);
         p.attributes["JOINTS_0"] =
-            Accessor(jts.data(), vs.size(), 4, TINYGLTF_COMPONENT_TYPE_UNSIGNED_BYTE, 1,
-                     TINYGLTF_TARGET_ARRAY_BUFFER, false);
-        p.attributes["WEIGHTS_0"] = Floats(wts, 4, false, TINYGLTF_TARGET_ARRAY_BUFFER);
+            Accessor(jts.data(), vs.size(), 4, TINYGLTF_COMPONENT_TYPE_UNSIGNED_BYTE, 1, 0,
+                     TINYGLTF_TARGET_ARRAY_BUFFER);
+        p.attributes["WEIGHTS_0"] = Floats(wts, 4, 0, false, TINYGLTF_TARGET_ARRAY_BUFFER);
         p.indices = Accessor(tris.data(), tris.size(), 1, TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT, 2,
-                             TINYGLTF_TARGET_ELEMENT_ARRAY_BUFFER, false);
+                             0, TINYGLTF_TARGET_ELEMENT_ARRAY_BUFFER);
         p.material = material;
         p.mode = TINYGLTF_MODE_TRIANGLES;
         mesh->primitives.push_back(p);
@@ -259,7 +214,7 @@ int main(int argc, char** argv) {
         return 2;
     }
     Builder b;
-    tinygltf::Model& m = b.model;
+    tinygltf::Model& m = b.m;
     int skin = b.Material("skin", 0.86, 0.64, 0.53, 0.7);
     int white = b.Material("eye_white", 0.95, 0.95, 0.92, 0.3);
     int dark = b.Material("dark", 0.05, 0.03, 0.03, 0.5);
@@ -327,7 +282,7 @@ int main(int argc, char** argv) {
     tinygltf::Skin sk;
     sk.name = "face_skeleton";
     sk.skeleton = kHead;
-    sk.inverseBindMatrices = b.Floats(ibm, 16, false);
+    sk.inverseBindMatrices = b.Floats(ibm, 16);
     for (int j = 0; j < kJoints; ++j) {
         sk.joints.push_back(j);
     }
@@ -349,13 +304,13 @@ int main(int argc, char** argv) {
     for (size_t f = 0; f < ps.size(); ++f) {
         times.push_back(float(double(f) / kFps));
     }
-    int input = b.Floats(times, 1, true);
+    int input = b.Floats(times, 1, 0, true);
     tinygltf::Animation anim;
     anim.name = "shapes";
     auto channel = [&](int node, const char* path, const std::vector<float>& values, int width) {
         tinygltf::AnimationSampler s;
         s.input = input;
-        s.output = b.Floats(values, width, false);
+        s.output = b.Floats(values, width);
         s.interpolation = "STEP";
         tinygltf::AnimationChannel c;
         c.sampler = int(anim.samplers.size());

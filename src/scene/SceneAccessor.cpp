@@ -7,23 +7,6 @@
 namespace {
 using Model = tinygltf::Model;
 
-int component_size(int type) {
-    switch (type) {
-        case TINYGLTF_COMPONENT_TYPE_BYTE:
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_BYTE:
-            return 1;
-        case TINYGLTF_COMPONENT_TYPE_SHORT:
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT:
-            return 2;
-        case TINYGLTF_COMPONENT_TYPE_INT:
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT:
-        case TINYGLTF_COMPONENT_TYPE_FLOAT:
-            return 4;
-        default:
-            return 0;
-    }
-}
-
 // One component at `p` as a number; normalised integers are scaled to [0, 1] or [-1, 1].
 double component(const unsigned char* p, int type, bool normalized) {
     switch (type) {
@@ -43,11 +26,6 @@ double component(const unsigned char* p, int type, bool normalized) {
             std::memcpy(&s, p, 2);
             return normalized ? s / 65535.0 : s;
         }
-        case TINYGLTF_COMPONENT_TYPE_INT: {
-            int32_t s;
-            std::memcpy(&s, p, 4);
-            return s;
-        }
         case TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT: {
             uint32_t s;
             std::memcpy(&s, p, 4);
@@ -63,6 +41,22 @@ double component(const unsigned char* p, int type, bool normalized) {
 
 }  // namespace
 
+int SceneAccessor::ComponentSize(int type) {
+    switch (type) {
+        case TINYGLTF_COMPONENT_TYPE_BYTE:
+        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_BYTE:
+            return 1;
+        case TINYGLTF_COMPONENT_TYPE_SHORT:
+        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT:
+            return 2;
+        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT:
+        case TINYGLTF_COMPONENT_TYPE_FLOAT:
+            return 4;
+        default:
+            return 0;
+    }
+}
+
 bool SceneAccessor::Read(const Model& m, int index, int components, std::vector<double>* out) {
     if (index < 0 || size_t(index) >= m.accessors.size()) {
         return false;
@@ -71,7 +65,7 @@ bool SceneAccessor::Read(const Model& m, int index, int components, std::vector<
     if (tinygltf::GetNumComponentsInType(uint32_t(a.type)) != components) {
         return false;
     }
-    const int csize = component_size(a.componentType);
+    const int csize = ComponentSize(a.componentType);
     out->assign(a.count * size_t(components), 0.0);
     if (a.bufferView >= 0) {
         const tinygltf::BufferView& v = m.bufferViews[size_t(a.bufferView)];
@@ -95,7 +89,7 @@ bool SceneAccessor::Read(const Model& m, int index, int components, std::vector<
             m.buffers[size_t(iv.buffer)].data.data() + iv.byteOffset + size_t(si.byteOffset);
         const unsigned char* vp =
             m.buffers[size_t(vv.buffer)].data.data() + vv.byteOffset + size_t(sv.byteOffset);
-        const int isize = component_size(si.componentType);
+        const int isize = ComponentSize(si.componentType);
         for (int k = 0; k < a.sparse.count; ++k) {
             const double at = component(ip + size_t(k * isize), si.componentType, false);
             if (at < 0 || at >= double(a.count)) {

@@ -17,6 +17,9 @@ class SceneAccessor {
     // As Read, into floats; non-finite values become 0 and are counted in *bad.
     static bool ReadFloats(const tinygltf::Model& model, int index, int components,
                            std::vector<float>* out, size_t* bad = nullptr);
+    // Bytes per component of a glTF component type; 0 for a type glTF does not allow in an
+    // accessor (signed 32-bit integers among them).
+    static int ComponentSize(int type);
     // The accessor's element count; 0 when it does not exist.
     static size_t Count(const tinygltf::Model& model, int index);
 };

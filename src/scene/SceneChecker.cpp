@@ -4,6 +4,8 @@
 #include <cmath>
 #include <cstring>
 
+#include "scene/SceneAccessor.h"
+
 namespace {
 bool fail(std::string* why, const std::string& text) {
     if (why) {
@@ -18,22 +20,6 @@ bool in_range(int index, size_t size) {
 
 std::string item(const char* kind, size_t index) {
     return std::string(kind) + " " + std::to_string(index);
-}
-
-int component_size(int type) {
-    switch (type) {
-        case TINYGLTF_COMPONENT_TYPE_BYTE:
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_BYTE:
-            return 1;
-        case TINYGLTF_COMPONENT_TYPE_SHORT:
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT:
-            return 2;
-        case TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT:
-        case TINYGLTF_COMPONENT_TYPE_FLOAT:
-            return 4;
-        default:
-            return 0;
-    }
 }
 
 int component_count(int type) {
@@ -118,7 +104,7 @@ bool SceneChecker::Check(const tinygltf::Model& m, std::string* why) {
 bool SceneChecker::checkAccessor(const tinygltf::Model& m, size_t i, std::string* why) {
     const tinygltf::Accessor& a = m.accessors[i];
     std::string what = item("accessor", i);
-    int csize = component_size(a.componentType);
+    int csize = SceneAccessor::ComponentSize(a.componentType);
     int ccount = component_count(a.type);
     if (csize == 0 || ccount == 0) {
         return fail(why, what + " has an unknown component type or element type");
@@ -147,7 +133,7 @@ bool SceneChecker::checkAccessor(const tinygltf::Model& m, size_t i, std::string
     }
     if (a.sparse.isSparse) {
         int n = a.sparse.count;
-        int isize = component_size(a.sparse.indices.componentType);
+        int isize = SceneAccessor::ComponentSize(a.sparse.indices.componentType);
         if (n <= 0 || uint64_t(n) > a.count || isize == 0 || a.sparse.indices.byteOffset < 0 ||
             a.sparse.values.byteOffset < 0) {
             return fail(why, what + " has an invalid sparse part");
@@ -270,7 +256,7 @@ bool SceneChecker::ReadFloats(const tinygltf::Model& m, int index, int component
     if (a.sparse.isSparse) {
         return fail(why, what + " is sparse, which animation data may not be here");
     }
-    int csize = component_size(a.componentType);
+    int csize = SceneAccessor::ComponentSize(a.componentType);
     bool isFloat = a.componentType == TINYGLTF_COMPONENT_TYPE_FLOAT;
     if (!isFloat && (!a.normalized || csize > 2)) {
         return fail(why, what + " holds neither floats nor normalised integers");
