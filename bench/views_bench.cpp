@@ -11,7 +11,6 @@
 #include <benchmark/benchmark.h>
 #include <unistd.h>
 
-#include <Xm/Form.h>
 #include <Xm/Xm.h>
 
 #include <algorithm>
@@ -26,6 +25,7 @@
 #include "scene/KLScene.h"
 #include "scene/gl/KLSceneView.h"
 #include "scene/gl/TestScenes.h"
+#include "scene/gl/ViewPair.h"
 #include "toolkit/CuePrefs.h"
 #include "toolkit/xm/KLXmGnome.h"
 #include "workspace/Imp.h"
@@ -47,20 +47,7 @@ bool open_views() {
     Widget shell = KLXmGnome::OpenApplication("views_bench", "Chirrup", &argc, argv, nullptr);
     if (!shell)
         return false;
-    Widget form = XmCreateForm(shell, const_cast<char*>("views"), nullptr, 0);
-    for (int i = 0; i < 2; ++i) {
-        Arg args[5];
-        int n = 0;
-        XtSetArg(args[n], XmNwidth, kWidth), ++n;
-        XtSetArg(args[n], XmNheight, kHeight), ++n;
-        XtSetArg(args[n], XmNleftAttachment, i ? XmATTACH_WIDGET : XmATTACH_FORM), ++n;
-        XtSetArg(args[n], XmNleftWidget, i ? views[0]->GetWidget() : nullptr), ++n;
-        Widget w = KLSceneView::Create(form, const_cast<char*>(i ? "mixScn" : "keyScn"), args,
-                                       Cardinal(n));
-        views[i] = KLSceneView::FromWidget(w);
-        XtManageChild(w);
-    }
-    XtManageChild(form);
+    testscenes::MakeViewPair(shell, kWidth, kHeight, views);
     XtRealizeWidget(shell);
     for (int i = 0; i < 200; ++i) {
         XSync(XtDisplay(shell), False);

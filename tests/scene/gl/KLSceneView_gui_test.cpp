@@ -1,9 +1,6 @@
 // GoogleTest first: the X headers define macros (None, Bool) that its names collide with.
 #include <gtest/gtest.h>
 
-#include <Xm/Form.h>
-#include <Xm/Xm.h>
-
 #include <cstring>
 #include <filesystem>
 #include <functional>
@@ -15,6 +12,7 @@
 #include "scene/gl/KLSceneView.h"
 #include "scene/gl/SceneRenderer.h"
 #include "scene/gl/TestScenes.h"
+#include "scene/gl/ViewPair.h"
 #include "toolkit/KLImageSGI.h"
 
 namespace {
@@ -91,21 +89,7 @@ class SceneViewTest : public ::testing::Test {
     static void SetUpTestSuite() {
         Widget shell = guitest::Shell();
         ASSERT_TRUE(shell);
-        Widget form = XmCreateForm(shell, const_cast<char*>("views"), nullptr, 0);
-        for (int i = 0; i < 2; ++i) {
-            Arg args[6];
-            int n = 0;
-            XtSetArg(args[n], XmNwidth, kWidth), ++n;
-            XtSetArg(args[n], XmNheight, kHeight), ++n;
-            XtSetArg(args[n], XmNtopAttachment, XmATTACH_FORM), ++n;
-            XtSetArg(args[n], XmNleftAttachment, i ? XmATTACH_WIDGET : XmATTACH_FORM), ++n;
-            XtSetArg(args[n], XmNleftWidget, i ? views[0]->GetWidget() : nullptr), ++n;
-            Widget w = KLSceneView::Create(form, const_cast<char*>(i ? "mixScn" : "keyScn"), args,
-                                           Cardinal(n));
-            views[i] = KLSceneView::FromWidget(w);
-            XtManageChild(w);
-        }
-        XtManageChild(form);
+        testscenes::MakeViewPair(shell, kWidth, kHeight, views);
         XtRealizeWidget(shell);
         ASSERT_TRUE(guitest::WaitMapped(shell));
     }

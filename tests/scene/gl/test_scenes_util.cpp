@@ -4,6 +4,7 @@
 
 #include <tiny_gltf.h>
 
+#include "GltfModelBuilder.h"
 #include "scene/gl/TestScenes.h"
 
 namespace testscenes {
@@ -11,36 +12,12 @@ namespace {
 
 // Appends `data` to buffer 0 as a new buffer view and accessor; returns the accessor.
 template <typename T>
-int add_accessor(tinygltf::Model& m, const std::vector<T>& data, int componentType, int type,
+int add_accessor(GltfModelBuilder& b, const std::vector<T>& data, int componentType, int type,
                  int target, bool minMax = false) {
-    tinygltf::Buffer& buffer = m.buffers[0];
-    while (buffer.data.size() % 4) {
-        buffer.data.push_back(0);
-    }
-    tinygltf::BufferView view;
-    view.buffer = 0;
-    view.byteOffset = buffer.data.size();
-    view.byteLength = data.size() * sizeof(T);
-    view.target = target;
-    const auto* bytes = reinterpret_cast<const unsigned char*>(data.data());
-    buffer.data.insert(buffer.data.end(), bytes, bytes + view.byteLength);
-    m.bufferViews.push_back(view);
-    tinygltf::Accessor a;
-    a.bufferView = int(m.bufferViews.size()) - 1;
-    a.componentType = componentType;
-    a.type = type;
     const int per = tinygltf::GetNumComponentsInType(uint32_t(type));
-    a.count = data.size() / size_t(per);
-    if (minMax) {
-        a.minValues.assign(size_t(per), 1e30);
-        a.maxValues.assign(size_t(per), -1e30);
-        for (size_t i = 0; i < data.size(); ++i) {
-            a.minValues[i % size_t(per)] = std::min(a.minValues[i % size_t(per)], double(data[i]));
-            a.maxValues[i % size_t(per)] = std::max(a.maxValues[i % size_t(per)], double(data[i]));
-        }
-    }
-    m.accessors.push_back(a);
-    return int(m.accessors.size()) - 1;
+    const std::vector<float> bounds(data.begin(), data.end());
+    return b.Accessor(data.data(), data.size() / size_t(per), per, componentType, int(sizeof(T)), 0,
+                      std::max(target, 0), minMax ? &bounds : nullptr);
 }
 
 // A PNG file of `width` x `height` RGBA pixels, compressed with stored (uncompressed) deflate
@@ -101,7 +78,7 @@ constexpr int kArray = TINYGLTF_TARGET_ARRAY_BUFFER;
 constexpr int kElements = TINYGLTF_TARGET_ELEMENT_ARRAY_BUFFER;
 
 // One sheet's primitive: positions in the plane z = `z`, facing +Z unless `flip`.
-tinygltf::Primitive sheet_primitive(tinygltf::Model& m, const Sheet& s, float z, bool flip,
+tinygltf::Primitive sheet_primitive(GltfModelBuilder& builder, const Sheet& s, float z, bool flip,
                                     bool skinned, bool morphed) {
     const int cols = std::max(1, s.columns), rows = std::max(1, s.rows);
     std::vector<float> pos, nrm, uv, weights;
@@ -135,13 +112,14 @@ tinygltf::Primitive sheet_primitive(tinygltf::Model& m, const Sheet& s, float z,
     tinygltf::Primitive p;
     p.mode = TINYGLTF_MODE_TRIANGLES;
     p.material = 0;
-    p.attributes["POSITION"] = add_accessor(m, pos, kFloat, TINYGLTF_TYPE_VEC3, kArray, true);
-    p.attributes["NORMAL"] = add_accessor(m, nrm, kFloat, TINYGLTF_TYPE_VEC3, kArray);
-    p.attributes["TEXCOORD_0"] = add_accessor(m, uv, kFloat, TINYGLTF_TYPE_VEC2, kArray);
+    p.attributes["POSITION"] = add_accessor(builder, pos, kFloat, TINYGLTF_TYPE_VEC3, kArray, true);
+    p.attributes["NORMAL"] = add_accessor(builder, nrm, kFloat, TINYGLTF_TYPE_VEC3, kArray);
+    p.attributes["TEXCOORD_0"] = add_accessor(builder, uv, kFloat, TINYGLTF_TYPE_VEC2, kArray);
     if (skinned) {
-        p.attributes["JOINTS_0"] = add_accessor(m, joints, TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT,
-                                                TINYGLTF_TYPE_VEC4, kArray);
-        p.attributes["WEIGHTS_0"] = add_accessor(m, weights, kFloat, TINYGLTF_TYPE_VEC4, kArray);
+        p.attributes["JOINTS_0"] = add_accessor(
+            builder, joints, TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT, TINYGLTF_TYPE_VEC4, kArray);
+        p.attributes["WEIGHTS_0"] =
+            add_accessor(builder, weights, kFloat, TINYGLTF_TYPE_VEC4, kArray);
     }
     if (morphed) {
         for (int k = 0; k < s.morphTargets; ++k) {
@@ -154,20 +132,20 @@ tinygltf::Primitive sheet_primitive(tinygltf::Model& m, const Sheet& s, float z,
                     delta[v + 2] = 0.5f;
                 }
             }
-            p.targets.push_back(
-                {{"POSITION", add_accessor(m, delta, kFloat, TINYGLTF_TYPE_VEC3, kArray, true)}});
+            p.targets.push_back({{"POSITION", add_accessor(builder, delta, kFloat,
+                                                           TINYGLTF_TYPE_VEC3, kArray, true)}});
         }
     }
-    p.indices =
-        add_accessor(m, idx, TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT, TINYGLTF_TYPE_SCALAR, kElements);
+    p.indices = add_accessor(builder, idx, TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT,
+                             TINYGLTF_TYPE_SCALAR, kElements);
     return p;
 }
 
 }  // namespace
 
 bool WriteSheet(const std::string& path, const Sheet& s) {
-    tinygltf::Model m;
-    m.asset.version = "2.0";
+    GltfModelBuilder builder;
+    tinygltf::Model& m = builder.m;
     m.asset.generator = "chirrup view tests";
     m.buffers.resize(1);
 
@@ -203,9 +181,9 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
     const bool skinned = s.joints > 0, morphed = s.morphTargets > 0;
     tinygltf::Mesh mesh;
     mesh.name = "sheet";
-    mesh.primitives.push_back(sheet_primitive(m, s, 0.0f, false, skinned, morphed));
+    mesh.primitives.push_back(sheet_primitive(builder, s, 0.0f, false, skinned, morphed));
     if (s.backSheet) {
-        mesh.primitives.push_back(sheet_primitive(m, s, -0.5f, true, skinned, morphed));
+        mesh.primitives.push_back(sheet_primitive(builder, s, -0.5f, true, skinned, morphed));
     }
     if (morphed) {
         mesh.weights.assign(size_t(s.morphTargets), 0.0);
@@ -241,7 +219,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
             const float mat[16] = {1, 0, 0, 0, 0, 1, 0, 0, 0, 0, 1, 0, -x, 0, 0, 1};
             inverse.insert(inverse.end(), mat, mat + 16);
         }
-        skin.inverseBindMatrices = add_accessor(m, inverse, kFloat, TINYGLTF_TYPE_MAT4, -1);
+        skin.inverseBindMatrices = add_accessor(builder, inverse, kFloat, TINYGLTF_TYPE_MAT4, -1);
         skin.skeleton = skin.joints[0];
         m.skins.push_back(skin);
         m.nodes[0].skin = 0;
@@ -253,7 +231,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
         for (int f = 0; f < s.animatedFrames; ++f) {
             times.push_back(float(f) / 30.0f);
         }
-        const int input = add_accessor(m, times, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
+        const int input = add_accessor(builder, times, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
         for (int j = 0; j < s.joints; ++j) {
             std::vector<float> quats;
             for (int f = 0; f < s.animatedFrames; ++f) {
@@ -262,7 +240,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
             }
             tinygltf::AnimationSampler sampler;
             sampler.input = input;
-            sampler.output = add_accessor(m, quats, kFloat, TINYGLTF_TYPE_VEC4, -1);
+            sampler.output = add_accessor(builder, quats, kFloat, TINYGLTF_TYPE_VEC4, -1);
             sampler.interpolation = "STEP";
             anim.samplers.push_back(sampler);
             tinygltf::AnimationChannel channel;
@@ -277,8 +255,9 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
         tinygltf::Animation anim;
         anim.name = "weights";
         tinygltf::AnimationSampler sampler;
-        sampler.input = add_accessor(m, s.weightTimes, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
-        sampler.output = add_accessor(m, s.weightValues, kFloat, TINYGLTF_TYPE_SCALAR, -1);
+        sampler.input =
+            add_accessor(builder, s.weightTimes, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
+        sampler.output = add_accessor(builder, s.weightValues, kFloat, TINYGLTF_TYPE_SCALAR, -1);
         sampler.interpolation = "LINEAR";
         anim.samplers.push_back(sampler);
         tinygltf::AnimationChannel channel;
