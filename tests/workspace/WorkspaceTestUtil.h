@@ -129,6 +129,12 @@ class VowelRecognizer : public CueRecognizer {
     void WriteParameters(std::ostream& out) const override { out << "    gain " << gain << "\n"; }
 };
 
+// Where the program's own recognizer plug-ins are built.
+inline const std::string kShippedPlugins = CHIRRUP_BINARY_DIR "/lib/chirrup/plugins";
+// A recognizer's settings block as it writes it; reading `text` as one (false: refused).
+std::string SettingsText(const CueRecognizer& r);
+bool ReadSettingsText(CueRecognizer& r, const std::string& text);
+
 // Collects the toolkit's reports at or above `level` while installed.
 class Reports : public KLErrHandler {
   public:

@@ -94,6 +94,17 @@ void RecordingGhost::UpdateApplyDialog(KLEdlEvent* event) {
     Log(KLFmt("UpdateApplyDialog(%s)", event && event->WireFile() ? event->WireFile() : ""));
 }
 
+std::string SettingsText(const CueRecognizer& r) {
+    std::ostringstream out;
+    r.WriteSettings(out);
+    return out.str();
+}
+
+bool ReadSettingsText(CueRecognizer& r, const std::string& text) {
+    std::istringstream in(text);
+    return r.GuardedReadSettings(in);
+}
+
 void ResetWorkspace() {
     theImp.batchMode = 0;
     theImp.clear_keyset_data();
