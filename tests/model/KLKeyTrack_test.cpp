@@ -2,6 +2,9 @@
 
 #include <gtest/gtest.h>
 
+#include <cmath>
+#include <tuple>
+
 #include "model/KLKeySet.h"
 #include "model/ModelTestUtil.h"
 #include "scene/KLChannel.h"
@@ -123,6 +126,23 @@ TEST_F(KLKeyTrackTest, ReadWriteGoldenAndRoundTrip) {
     ReadText(again, Written(track), &set);
     EXPECT_EQ(again.events.Count(), 9);
     EXPECT_EQ(Written(again), Written(track));
+    // Times and values whose six-digit form is another tick or float read back exactly.
+    track.Clear();
+    ReadText(track,
+             "event 0.1234567 rest Ease 0.1234567\nevent 3 jaw Linear 1e-7\n"
+             "event 123456.7 jaw Smooth 123456.7\nevent 98765.43 rest Ease -0.0\n",
+             &set);
+    EXPECT_EQ(track.events.Tail()->time, CueTime(123456.7, 0));
+    const auto events = [](const KLKeyTrack& t) {
+        std::vector<std::tuple<int32_t, float, bool>> out;
+        for (const KLKeyEvent* e : t.events)
+            out.emplace_back(e->time.Ticks(), e->value, std::signbit(e->value));
+        return out;
+    };
+    KLKeyTrack exact(&set);
+    ReadText(exact, Written(track), &set);
+    EXPECT_EQ(events(exact), events(track)) << Written(track);
+    EXPECT_EQ(std::get<1>(events(track)[1]), 1e-7f);
     CueTime::default_fps = 24;
     track.Clear();
     ReadText(track, "event 3.5 jaw\n", &set);
