@@ -26,22 +26,24 @@ const char* const kTrack =
     "    event 30 wide Smooth 0.5\nend\n"
     "begin keytrack turn\n    event 0 right Ease 20\n    event 30 left Linear -10\nend\n";
 
+// The runs apply x.track (kTrack unless the test says otherwise) with x.kset (kKeysets).
 class BatchBoundsTest : public ProjectTest {
   protected:
+    void SetUp() override {
+        ProjectTest::SetUp();
+        Data("x.kset", kKeysets);
+        Data("x.track", kTrack);
+    }
     RunResult Batch(const std::string& apply = "face.gltf", const std::string& offset = "0") {
         return RunChirrup({"-B", "x.track", apply, "VX_ROOT", offset, "out.gltf", "x.kset"},
                           dir / "work", {{"TESSEL_PROJECT", dir.path()}});
     }
     std::string Out() const { return dir / "wire/out.gltf"; }
-    // Expects the glTF validator to find no error in the stored scene.
-    void ExpectValid() { testkit::ExpectValidGltf(Out()); }
 };
 
 // A buffer or an image whose uri names a directory: the apply scene is refused with the reason.
 TEST_F(BatchBoundsTest, AUriNamingADirectoryIsRefused) {
     std::filesystem::create_directory(dir / "wire/sub");
-    Data("x.kset", kKeysets);
-    Data("x.track", kTrack);
     for (const char* json :
          {R"({"asset":{"version":"2.0"},"buffers":[{"byteLength":8,"uri":"sub"}]})",
           R"({"asset":{"version":"2.0"},"images":[{"uri":"sub"}]})"}) {
@@ -78,7 +80,6 @@ TEST_F(BatchBoundsTest, AHundredThousandNodeChainIsWalked) {
 // A frame rate above the highest supported is clamped with a warning; an event beyond the
 // time range is reported and skipped; neither makes the stored scene grow.
 TEST_F(BatchBoundsTest, FrameRateAndEventTimesOutOfRangeAreToldAndBounded) {
-    Data("x.kset", kKeysets);
     Data("x.track", std::string("fps 2147483647\n") + kTrack);
     RunResult r = Batch();
     EXPECT_EQ(r.status, 0);
@@ -86,7 +87,7 @@ TEST_F(BatchBoundsTest, FrameRateAndEventTimesOutOfRangeAreToldAndBounded) {
                 HasSubstr("Frame rate 2147483647 is above the highest supported, 1000: 1000 is "
                           "used."));
     EXPECT_LT(ReadFile(Out()).size(), 200000u);
-    ExpectValid();
+    testkit::ExpectValidGltf(Out());
 
     Data("x.track", std::string(kTrack) +
                         "begin keytrack turn\n    event 1e12 right Ease 20\n"
@@ -96,14 +97,12 @@ TEST_F(BatchBoundsTest, FrameRateAndEventTimesOutOfRangeAreToldAndBounded) {
     EXPECT_THAT(r.err, HasSubstr("Event at frame 1e12 in keyset [turn] is beyond the supported "
                                  "time range, skipped."));
     EXPECT_LT(ReadFile(Out()).size(), 20000u);
-    ExpectValid();
+    testkit::ExpectValidGltf(Out());
 }
 
 // A negative offset would put keys before time 0: each curve is cut at 0, the keys dropped
 // are counted per keyset, and the scene stays valid.
 TEST_F(BatchBoundsTest, KeysBeforeTimeZeroAreDroppedAndCounted) {
-    Data("x.kset", kKeysets);
-    Data("x.track", kTrack);
     ASSERT_EQ(Batch().status, 0);
     const double at20 = EvalChannel(Out(), "jaw", 3, 20).value_or(-99);
     const double at25 = EvalChannel(Out(), "jaw", 3, 25).value_or(-99);
@@ -114,7 +113,7 @@ TEST_F(BatchBoundsTest, KeysBeforeTimeZeroAreDroppedAndCounted) {
     // From time 0 on, the curve is the one the run without offset stored 20 frames later.
     EXPECT_NEAR(EvalChannel(Out(), "jaw", 3, 0).value_or(-99), at20, 1e-3);
     EXPECT_NEAR(EvalChannel(Out(), "jaw", 3, 5).value_or(-99), at25, 1e-3);
-    ExpectValid();
+    testkit::ExpectValidGltf(Out());
 }
 
 // A scene of under a kilobyte with one rotation key at 359,000 s, driven by a one-second
@@ -131,8 +130,6 @@ TEST_F(BatchBoundsTest, AFarKeyInASmallSceneCostsLittle) {
               R"({"sampler":0,"target":{"node":1,"path":"rotation"}}],"samplers":[{"input":0,)"
               R"("output":1}]}]})");
     EXPECT_LT(ReadFile(dir / "wire/far.gltf").size(), 800u);
-    Data("x.kset", kKeysets);
-    Data("x.track", kTrack);
     const pid_t child = fork();
     if (child == 0) {
         // Limited to 600 MB of address space: the unbounded run needed about 1 GB.
@@ -146,7 +143,7 @@ TEST_F(BatchBoundsTest, AFarKeyInASmallSceneCostsLittle) {
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
     EXPECT_LT(ReadFile(Out()).size(), 10000u);
     EXPECT_NEAR(EvalChannel(Out(), "jaw", 3, 0).value_or(-99), 20, 1e-3);
-    ExpectValid();
+    testkit::ExpectValidGltf(Out());
 }
 
 // A keyset whose key shapes are all the same pose has nothing to apply: the run says so.
