@@ -388,7 +388,6 @@ TEST_F(TrackTest, FpsStatementSetsOrKeepsTheRate) {
     for (const auto& [text, expected] :
          std::vector<std::pair<const char*, int>>{{"begin marktrack\nend\n", 24},
                                                   {"fps 0\n", 30},
-                                                  {"fps -2\n", 30},
                                                   {"fps 25\n", 25},
                                                   {"fps twelve\n", 30},
                                                   {"fps 25 extra\n", 24}}) {

@@ -223,12 +223,19 @@ TEST_F(PhonemePlugin, RefusesWhatItCannotAnalyseAndTellsAMissingModel) {
 }
 
 // Sounds that are not speech, or not as the model expects it.
+using SoundMaker = std::function<std::unique_ptr<CueSound>(const CueSound& dialogue)>;
 struct OddSound {
     const char* name;
-    std::function<std::unique_ptr<CueSound>(const CueSound& dialogue)> make;
+    SoundMaker make;
     std::vector<std::string> phones;  // phones to be found in order; none: all silence
 };
 
+SoundMaker samples(const std::vector<float>& mono, double rate) {
+    return [=](const CueSound&) { return CueSound::FromSamples({mono}, rate); };
+}
+SoundMaker resampled(double rate) {
+    return [=](const CueSound& d) { return CueSound::FromSamples({d.Resampled(rate)}, rate); };
+}
 std::vector<float> noise(size_t count, float level) {
     std::mt19937 random(7);
     std::uniform_real_distribution<float> uniform(-level, level);
@@ -258,14 +265,8 @@ TEST_P(PhonemeOddSounds, GiveOneResultPerStepAndFindWhatIsThere) {
 INSTANTIATE_TEST_SUITE_P(
     Sounds, PhonemeOddSounds,
     ::testing::Values(
-        OddSound{"Silence",
-                 [](const CueSound&) {
-                     return CueSound::FromSamples({std::vector<float>(32000, 0.0f)}, 16000);
-                 },
-                 {}},
-        OddSound{"WhiteNoise",
-                 [](const CueSound&) { return CueSound::FromSamples({noise(44100, 0.5f)}, 22050); },
-                 {}},
+        OddSound{"Silence", samples(std::vector<float>(32000, 0.0f), 16000), {}},
+        OddSound{"WhiteNoise", samples(noise(44100, 0.5f), 22050), {}},
         OddSound{"TenthOfASecond",
                  [](const CueSound& d) {
                      auto s = d.Copy();
@@ -273,19 +274,11 @@ INSTANTIATE_TEST_SUITE_P(
                      return s;
                  },
                  {}},
-        OddSound{"OneSample",
-                 [](const CueSound&) { return CueSound::FromSamples({{0.5f}}, 16000); },
-                 {}},
-        OddSound{
-            "NoSamples", [](const CueSound&) { return CueSound::FromSamples({{}}, 16000); }, {}},
+        OddSound{"OneSample", samples({0.5f}, 16000), {}},
+        OddSound{"NoSamples", samples({}, 16000), {}},
         // Telephone bandwidth loses the hiss of the fricatives, not the words' vowels.
-        OddSound{"At8kHz",
-                 [](const CueSound& d) { return CueSound::FromSamples({d.Resampled(8000)}, 8000); },
-                 {"L", "OW", "SIL", "M", "UW", "SIL"}},
-        OddSound{
-            "At96kHz",
-            [](const CueSound& d) { return CueSound::FromSamples({d.Resampled(96000)}, 96000); },
-            kDialoguePhones},
+        OddSound{"At8kHz", resampled(8000), {"L", "OW", "SIL", "M", "UW", "SIL"}},
+        OddSound{"At96kHz", resampled(96000), kDialoguePhones},
         OddSound{"StereoWithOneSilentSide",
                  [](const CueSound& d) {
                      return CueSound::FromSamples(
