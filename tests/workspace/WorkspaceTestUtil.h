@@ -1,6 +1,7 @@
 #pragma once
 
-// Helpers shared by the workspace tests.
+// Helpers shared by the workspace tests, and the matchers they use.
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <functional>
@@ -19,6 +20,12 @@
 #include "workspace/Ghost.h"
 
 namespace wstest {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::Not;
+using ::testing::StartsWith;
 
 std::string ReadFile(const std::string& path);  // empty when the file cannot be read
 void WriteFile(const std::string& path, const std::string& text);

@@ -1,7 +1,6 @@
 // Batch runs on damaged or unusual inputs, run as a program: each ends with status 0 and a
 // line on the error stream saying what was refused, or with a valid scene, and never costs
 // memory or disk out of proportion to what it applies.
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <sys/resource.h>
@@ -13,7 +12,6 @@
 #include "testkit/ValidateGltf.h"
 
 using namespace wstest;
-using ::testing::HasSubstr;
 
 namespace {
 

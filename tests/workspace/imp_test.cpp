@@ -1,7 +1,6 @@
 // The workspace's small operations, the error log and its viewer, the console window
 // interface, apply inside the program, and the emergency
 // save on a fatal signal.
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
@@ -23,9 +22,6 @@
 #include "workspace/Imp.h"
 
 using namespace wstest;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
 
 namespace {
 

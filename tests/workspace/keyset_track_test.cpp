@@ -1,6 +1,5 @@
 // Keyset description files and track files: loading with every message, recognizer blocks,
 // verification, the project check, saving back byte for byte, the sound and the duration.
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -18,9 +17,6 @@
 #include "workspace/Imp.h"
 
 using namespace wstest;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
 
 namespace {
 

@@ -1,7 +1,6 @@
 // The shipped Phoneme recognizer plug-in: recognition of the demo dialogue, its settings, its
 // report when the speech model is missing, awkward sounds, its panel; and the pure parts it is
 // built from (the step timeline, the level meter and the pause splitter), compiled in here.
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -19,9 +18,6 @@
 #include "toolkit/CueSound.h"
 
 using namespace wstest;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
 
 namespace {
 

@@ -1,6 +1,5 @@
 // The chirrup program run as a program: command line, environment, error log location and
 // batch runs end to end (progress lines, every early end, the stored scene value by value).
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <filesystem>
@@ -11,9 +10,6 @@
 #include "testkit/ValidateGltf.h"
 
 using namespace wstest;
-using ::testing::HasSubstr;
-using ::testing::Not;
-using ::testing::StartsWith;
 
 namespace {
 

@@ -1,7 +1,6 @@
 // Recognizer settings blocks, the plug-in catalogue with real shared objects, the shipped
 // Loudness plug-in, settings files read by the workspace, and recognizers in keyset files and
 // batch runs.
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <filesystem>
@@ -16,10 +15,6 @@
 #include "workspace/Imp.h"
 
 using namespace wstest;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::Not;
 
 namespace {
 

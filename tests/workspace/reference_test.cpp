@@ -1,7 +1,6 @@
 // Reference and playblast image sequences: name parsing, range search, the load dialog, zoom
 // sizes and the frame shown at a time. Frame N is an image filled with the grey level N, so
 // that each slot can be checked.
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <OpenImageIO/imageio.h>
@@ -14,8 +13,6 @@
 
 namespace fs = std::filesystem;
 using namespace wstest;
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 namespace {
 
