@@ -33,41 +33,17 @@ const std::regex kLogHeader(
     "---------- Chirrup Error Log ---------- "
     "[A-Z][a-z]{2} [A-Z][a-z]{2} [ 0-9]\\d \\d\\d:\\d\\d:\\d\\d \\d{4}\n\n");
 
-const char* const kKeysets =
-    "wire face.gltf\n"
-    "begin keyset mouth\n    key rest 0\n    key open 10\n    key wide 20\nend\n"
-    "begin shapeset turn jaw 5 0 1\n    key left 0\n    key right 1\nend\n";
-// Events in frames; the runs add 12 frames of offset unless told otherwise.
-const char* const kTrack =
-    "begin keytrack mouth\n    event 0 rest\n    event 15 open Linear\n"
-    "    event 30 wide Smooth 0.5\n    event 45 open Ease 2\nend\n"
-    "begin keytrack turn\n    event 6 right Ease 20\n    event 36 left Linear -10\nend\n";
 const char* const kApplied = "Applying mouth\nApplying turn\n  Storing to %W/out.gltf\n";
 
-// Runs start in DIR/work; the project is DIR unless the test says otherwise.
-class ProgramTest : public ProjectTest {
+// The runs add 12 frames of offset unless told otherwise.
+class ProgramTest : public BatchTest {
   protected:
-    void SetUp() override {
-        ProjectTest::SetUp();
-        Data("x.kset", kKeysets);
-        Data("x.track", kTrack);
-    }
-    RunResult Run(std::vector<std::string> args, std::vector<EnvChange> env = {}) {
-        env.insert(env.begin(), {"TESSEL_PROJECT", dir.path()});
-        env.insert(env.begin(), {"DISPLAY", std::nullopt});  // the window cannot open here
-        return RunChirrup(args, dir / "work", env);
-    }
-    RunResult Batch(const std::string& dag = "VX_ROOT", const std::string& apply = "face.gltf",
-                    std::vector<EnvChange> env = {}) {
-        return Run({"-B", "x.track", apply, dag, "12", "out.gltf", "x.kset"}, env);
-    }
     std::string Header(const std::string& dag = "VX_ROOT", const std::string& apply = "face.gltf") {
         return Fill(
             "Batch mode.\n  Reading keyset %M/x.kset\n  Reading track %M/x.track\n"
             "  Reading apply file %W/" +
             apply + "\n  Applying to dag " + dag + " with offset 12\n");
     }
-    std::string Out() const { return dir / "wire/out.gltf"; }
     std::string Log() const { return ReadFile(dir / "errlog.vx"); }
 };
 
@@ -184,7 +160,7 @@ TEST_F(ProgramTest, BatchAppliesEveryKeysetAndStoresTheScene) {
 // Batch runs whose inputs differ from the good ones: what each says after the header, and
 // what it stores (node, channel, frame, value of the stored scene; no node: nothing stored).
 TEST_F(ProgramTest, BatchRunsSayWhatHappenedAndStoreWhatTheyCan) {
-    const std::string track = kTrack;
+    const std::string track = kBatchTrack;
     const std::string nothing =
         "Failed to find keyset [mouth].\nFailed to find keyset [turn].\n"
         "You must select one or more keysets to apply.\n";
@@ -200,16 +176,16 @@ TEST_F(ProgramTest, BatchRunsSayWhatHappenedAndStoreWhatTheyCan) {
         const char* logged;
     };
     const Row rows[] = {
-        {"head", kKeysets, track, kApplied, "jaw", 1, 57, 2, ""},
+        {"head", kBatchKeysets, track, kApplied, "jaw", 1, 57, 2, ""},
         // The first keyset's failure ends the applying; the scene is stored as it was read.
-        {"nothere", kKeysets, track,
+        {"nothere", kBatchKeysets, track,
          "Applying mouth\nCannot find base dag [nothere] for apply ...\nThere was an error\n"
          "  Storing to %W/out.gltf\n",
          "jaw", 1, 10, 1, ""},
-        {"VX_ROOT", kKeysets, "sound gone.aiff\n" + track, kApplied, "jaw", 1, 57, 2,
+        {"VX_ROOT", kBatchKeysets, "sound gone.aiff\n" + track, kApplied, "jaw", 1, 57, 2,
          "\n\nAudio file [%M/gone.aiff] does not exist.\n"},
-        {"VX_ROOT", kKeysets, "-", "Failed to open track file [%M/x.track].\n" + stored, "jaw", 1,
-         20, 2, ""},
+        {"VX_ROOT", kBatchKeysets, "-", "Failed to open track file [%M/x.track].\n" + stored, "jaw",
+         1, 20, 2, ""},
         {"VX_ROOT", "wire face.gltf\n", track, nothing, nullptr, 0, 0, 0, ""},
         {"VX_ROOT", kMouth, track, "No wire file!\n", nullptr, 0, 0, 0, ""},
         {"VX_ROOT", "wire gone.gltf\n", track,
@@ -255,7 +231,7 @@ TEST_F(ProgramTest, AMissingOrUnwritableApplyFileIsTold) {
 TEST_F(ProgramTest, NamesAreTakenAsTheyStandOrFromTheWorkingDirectory) {
     TempDir elsewhere;
     WriteFile(elsewhere / "k.kset", "wire " + (dir / "wire/face.gltf") + "\n" + kMouth);
-    WriteFile(elsewhere / "t.track", kTrack);
+    WriteFile(elsewhere / "t.track", kBatchTrack);
     const std::string out = elsewhere / "o.glb";
     RunResult r = Run({"-B", elsewhere / "t.track", dir / "wire/face.gltf", "VX_ROOT", "0", out,
                        elsewhere / "k.kset"});

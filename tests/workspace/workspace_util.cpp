@@ -152,6 +152,23 @@ int ProjectTest::BatchLoadKeyset(const std::string& path) {
     return loaded;
 }
 
+void BatchTest::SetUp() {
+    ProjectTest::SetUp();
+    Data("x.kset", kBatchKeysets);
+    Data("x.track", kBatchTrack);
+}
+
+RunResult BatchTest::Run(std::vector<std::string> args, std::vector<EnvChange> env) {
+    env.insert(env.begin(), {"TESSEL_PROJECT", dir.path()});
+    env.insert(env.begin(), {"DISPLAY", std::nullopt});  // the window cannot open here
+    return RunChirrup(args, dir / "work", env);
+}
+
+RunResult BatchTest::Batch(const std::string& dag, const std::string& apply,
+                           const std::string& offset, std::vector<EnvChange> env) {
+    return Run({"-B", "x.track", apply, dag, offset, "out.gltf", "x.kset"}, std::move(env));
+}
+
 std::string FaceSceneJson() {
     // The buffer: jaw key times (3 floats) and translations (9), then the same for lip.
     return R"({"asset": {"version": "2.0"}, "scene": 0, "scenes": [{"nodes": [0]}],
