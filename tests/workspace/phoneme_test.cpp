@@ -185,6 +185,7 @@ TEST_F(PhonemePlugin, SettingsRoundTripAndRefuseNonsense) {
     EXPECT_FALSE(ReadSettingsText(*r, garbage));
     EXPECT_FALSE(ReadSettingsText(*r, "minimum 3\nspeed \"fast\nmodels \"unclosed"));
     EXPECT_EQ(r->targets.size(), 40u);
+    EXPECT_THAT(SettingsText(*r), HasSubstr("    step ")) << "still writes its settings";
     ASSERT_TRUE(r->GuardedResetSettings());
     EXPECT_EQ(SettingsText(*r), defaults);
 }
