@@ -98,10 +98,7 @@ void BM_SketchWave(benchmark::State& state) {
                    (plain ? ", plain scan" : ", summaries"));
 }
 BENCHMARK(BM_SketchWave)
-    ->Args({0, 0})
-    ->Args({1, 0})
-    ->Args({0, 1})
-    ->Args({1, 1})
+    ->ArgsProduct({{0, 1}, {0, 1}})
     ->Unit(benchmark::kMillisecond)
     ->UseRealTime();
 

@@ -148,10 +148,7 @@ BENCHMARK(BM_TwoHours)->Unit(benchmark::kSecond)->Iterations(1)->UseRealTime();
 
 // Threads (0: one per core), speed (0 fast, 1 balanced, 2 accurate).
 BENCHMARK(BM_TenMinutes)
-    ->Args({0, 0})
-    ->Args({1, 0})
-    ->Args({0, 1})
-    ->Args({1, 1})
+    ->ArgsProduct({{0, 1}, {0, 1}})
     ->Unit(benchmark::kSecond)
     ->Iterations(1)
     ->UseRealTime();
@@ -299,6 +296,15 @@ std::unique_ptr<CueRecognizer> measured_recognizer(benchmark::State& state) {
                    std::to_string(state.range(1)));
 }
 
+// The tally's confusions under `what` and the run's settings, and its agreement as counters.
+void report_accuracy(benchmark::State& state, const Tally& tally, const char* what) {
+    tally.Print((std::string(what) + ", " + kSpeeds[state.range(0)] + ", minimum " +
+                 std::to_string(state.range(1)))
+                    .c_str());
+    state.counters["accuracy"] = double(tally.agree) / double(tally.frames);
+    state.counters["frames"] = double(tally.frames);
+}
+
 void BM_DemoAccuracy(benchmark::State& state) {
     auto r = measured_recognizer(state);
     if (!r) {
@@ -312,17 +318,13 @@ void BM_DemoAccuracy(benchmark::State& state) {
     tally.Add(*r,
               reference_shapes(kDemo + "/dialogue-phonemes.txt", long(r->results.size()), links),
               links);
-    tally.Print(("demo, " + std::string(kSpeeds[state.range(0)]) + ", minimum " +
-                 std::to_string(state.range(1)))
-                    .c_str());
-    state.counters["accuracy"] = double(tally.agree) / double(tally.frames);
-    state.counters["frames"] = double(tally.frames);
+    report_accuracy(state, tally, "demo");
 }
-// Speed (0 fast, 1 balanced, 2 accurate), minimum phone length in frames.
-BENCHMARK(BM_DemoAccuracy)
-    ->ArgsProduct({{0, 1, 2}, {1, 2, 3}})
-    ->Unit(benchmark::kMillisecond)
-    ->Iterations(1);
+// Speed (0 fast, 1 balanced, 2 accurate), minimum phone length in frames; one pass each.
+void accuracy_runs(benchmark::internal::Benchmark* b) {
+    b->ArgsProduct({{0, 1, 2}, {1, 2, 3}})->Unit(benchmark::kMillisecond)->Iterations(1);
+}
+BENCHMARK(BM_DemoAccuracy)->Apply(accuracy_runs);
 
 // The same measure over other recordings: every NAME.aiff with a NAME-phonemes.txt in the
 // folder named by PHONEME_BENCH_PASSAGES (bench/phoneme-passages.sh makes such a folder with
@@ -360,16 +362,9 @@ void BM_PassageAccuracy(benchmark::State& state) {
         state.SkipWithError("no recording with its phoneme times in PHONEME_BENCH_PASSAGES");
         return;
     }
-    tally.Print(("passages, " + std::string(kSpeeds[state.range(0)]) + ", minimum " +
-                 std::to_string(state.range(1)))
-                    .c_str());
-    state.counters["accuracy"] = double(tally.agree) / double(tally.frames);
-    state.counters["frames"] = double(tally.frames);
+    report_accuracy(state, tally, "passages");
 }
-BENCHMARK(BM_PassageAccuracy)
-    ->ArgsProduct({{0, 1, 2}, {1, 2, 3}})
-    ->Unit(benchmark::kMillisecond)
-    ->Iterations(1);
+BENCHMARK(BM_PassageAccuracy)->Apply(accuracy_runs);
 
 }  // namespace
 

@@ -48,7 +48,8 @@ TEST_F(KLMarkTrackTest, ReadWriteGoldenAndRoundTrip) {
     EXPECT_EQ(Written(again), Written(track));
     track.Clear();
     EXPECT_EQ(Written(track), "");
-    ReadText(track, "mark 1e30 a\nmark -1e30 b\n");
+    ReadText(track, "mark 1e30 a\nmark -1e30 b\nmark 123456.7 c\n");
+    EXPECT_EQ(track.marks.Next(track.marks.Head())->time, CueTime(123456.7, 0)) << "not a float";
     EXPECT_EQ(track.marks.Head()->time.Ticks(), INT32_MIN);
     EXPECT_EQ(track.marks.Tail()->time.Ticks(), INT32_MAX);
     CueTime::default_fps = 24;

@@ -1,6 +1,7 @@
 #pragma once
 
-// Helpers shared by the workspace tests.
+// Helpers shared by the workspace tests, and the matchers they use.
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <functional>
@@ -19,6 +20,12 @@
 #include "workspace/Ghost.h"
 
 namespace wstest {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::Not;
+using ::testing::StartsWith;
 
 std::string ReadFile(const std::string& path);  // empty when the file cannot be read
 void WriteFile(const std::string& path, const std::string& text);
@@ -129,6 +136,12 @@ class VowelRecognizer : public CueRecognizer {
     void WriteParameters(std::ostream& out) const override { out << "    gain " << gain << "\n"; }
 };
 
+// Where the program's own recognizer plug-ins are built.
+inline const std::string kShippedPlugins = CHIRRUP_BINARY_DIR "/lib/chirrup/plugins";
+// A recognizer's settings block as it writes it; reading `text` as one (false: refused).
+std::string SettingsText(const CueRecognizer& r);
+bool ReadSettingsText(CueRecognizer& r, const std::string& text);
+
 // Collects the toolkit's reports at or above `level` while installed.
 class Reports : public KLErrHandler {
   public:
@@ -163,6 +176,29 @@ class ProjectTest : public ::testing::Test {
     ScopedEnv viewer{"TESSEL_USER_ERROR_READER", "true"};
     RecordingGhost ghost;
     GhostScope scope{&ghost};
+};
+
+// The batch runs' keysets over the face scene: "mouth" (kind 1) and "turn" (kind 2, jaw RZ).
+inline const char* const kBatchKeysets =
+    "wire face.gltf\n"
+    "begin keyset mouth\n    key rest 0\n    key open 10\n    key wide 20\nend\n"
+    "begin shapeset turn jaw 5 0 1\n    key left 0\n    key right 1\nend\n";
+// Their track; events in frames.
+inline const char* const kBatchTrack =
+    "begin keytrack mouth\n    event 0 rest\n    event 15 open Linear\n"
+    "    event 30 wide Smooth 0.5\n    event 45 open Ease 2\nend\n"
+    "begin keytrack turn\n    event 6 right Ease 20\n    event 36 left Linear -10\nend\n";
+
+// ProjectTest with DIR/misc_data/x.kset (kBatchKeysets) and x.track (kBatchTrack); the program
+// runs in DIR/work with the project DIR and no display.
+class BatchTest : public ProjectTest {
+  protected:
+    void SetUp() override;
+    RunResult Run(std::vector<std::string> args, std::vector<EnvChange> env = {});
+    // "-B x.track APPLY DAG OFFSET out.gltf x.kset"; the scene is stored as Out().
+    RunResult Batch(const std::string& dag = "VX_ROOT", const std::string& apply = "face.gltf",
+                    const std::string& offset = "12", std::vector<EnvChange> env = {});
+    std::string Out() const { return dir / "wire/out.gltf"; }
 };
 
 // A glTF face: root "head" with children "jaw" and "lip"; key shapes at frames 0, 10 and 20

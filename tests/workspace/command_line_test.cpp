@@ -62,6 +62,7 @@ TEST(CommandLineTest, FrameRateFromTheEnvironmentThenTheCommandLine) {
                                            {{"-fps", "24"}, "25", 24},
                                            {{"-fps", "-3"}, "25", 25},
                                            {{"-fps", "12", "-fps", "-1"}, nullptr, 12},
+                                           {{"-fps", "60", "-fps", "15"}, nullptr, 15},
                                            {{"-fps"}, "25", 0}}) {
         std::map<std::string, std::string> env;
         if (row.env)

@@ -94,6 +94,17 @@ void RecordingGhost::UpdateApplyDialog(KLEdlEvent* event) {
     Log(KLFmt("UpdateApplyDialog(%s)", event && event->WireFile() ? event->WireFile() : ""));
 }
 
+std::string SettingsText(const CueRecognizer& r) {
+    std::ostringstream out;
+    r.WriteSettings(out);
+    return out.str();
+}
+
+bool ReadSettingsText(CueRecognizer& r, const std::string& text) {
+    std::istringstream in(text);
+    return r.GuardedReadSettings(in);
+}
+
 void ResetWorkspace() {
     theImp.batchMode = 0;
     theImp.clear_keyset_data();
@@ -139,6 +150,23 @@ int ProjectTest::BatchLoadKeyset(const std::string& path) {
     StdErr([&] { loaded = theImp.LoadKeyset(path.c_str()); });
     theImp.batchMode = 0;
     return loaded;
+}
+
+void BatchTest::SetUp() {
+    ProjectTest::SetUp();
+    Data("x.kset", kBatchKeysets);
+    Data("x.track", kBatchTrack);
+}
+
+RunResult BatchTest::Run(std::vector<std::string> args, std::vector<EnvChange> env) {
+    env.insert(env.begin(), {"TESSEL_PROJECT", dir.path()});
+    env.insert(env.begin(), {"DISPLAY", std::nullopt});  // the window cannot open here
+    return RunChirrup(args, dir / "work", env);
+}
+
+RunResult BatchTest::Batch(const std::string& dag, const std::string& apply,
+                           const std::string& offset, std::vector<EnvChange> env) {
+    return Run({"-B", "x.track", apply, dag, offset, "out.gltf", "x.kset"}, std::move(env));
 }
 
 std::string FaceSceneJson() {
