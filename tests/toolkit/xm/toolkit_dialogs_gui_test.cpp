@@ -152,11 +152,21 @@ class FileManagerTest : public ToolkitTest {
         Widget w = XtNameToWidget(form, "*Attention");
         return w && XtIsManaged(w) ? w : nullptr;
     }
-    static std::string MessageOf(Widget box) { return guitest::XmText(box, XmNmessageString); }
+    // Presses `button` of the browser's own alert once it is up, noting its message.
+    static bool Answer(unsigned char button, std::string* told = nullptr) {
+        Widget notice = Notice();
+        if (!notice || !Viewable(XmMessageBoxGetChild(notice, button)))
+            return false;
+        if (told)
+            *told = guitest::XmText(notice, XmNmessageString);
+        return PressWhenShown(XmMessageBoxGetChild(notice, button));
+    }
     std::string dir;
 };
 
-TEST_F(FileManagerTest, RetrieveRemembersTheFolderAndRefusesFolders) {
+// Retrieving remembers the folder and refuses folders; storing over a file asks first
+// ("Cancel" goes back to the browser, cancelling it stores nothing), a new name does not.
+TEST_F(FileManagerTest, RetrieveAndStoreAs) {
     RecordingManager m(form, dir);
     EXPECT_EQ(KLFileManager::FilterMask(m.Pattern(), m.Extension()), "*.tst");
     Poll choose([&] { return Choose(m, dir + "/a.tst"); });
@@ -164,18 +174,12 @@ TEST_F(FileManagerTest, RetrieveRemembersTheFolderAndRefusesFolders) {
     EXPECT_EQ(m.retrieved, dir + "/a.tst");
     EXPECT_EQ(m.LastDirectory(), dir);
     EXPECT_EQ(m.LastName(), "a.tst");
-    // A folder chosen as a file: told, and nothing opened.
     m.retrieved.clear();
     std::string told;
     int step = 0;
     Poll folder([&] {
-        if (step == 0)
-            return Choose(m, dir + "/sub") && (++step, false);
-        Widget notice = Notice();
-        if (!notice || !Viewable(XmMessageBoxGetChild(notice, XmDIALOG_OK_BUTTON)))
-            return false;
-        told = MessageOf(notice);
-        return PressWhenShown(XmMessageBoxGetChild(notice, XmDIALOG_OK_BUTTON));
+        return step == 0 ? Choose(m, dir + "/sub") && (++step, false)
+                         : Answer(XmDIALOG_OK_BUTTON, &told);
     });
     EXPECT_EQ(m.Retrieve(), -1);
     EXPECT_TRUE(folder.Done());
@@ -183,42 +187,26 @@ TEST_F(FileManagerTest, RetrieveRemembersTheFolderAndRefusesFolders) {
     EXPECT_EQ(told, dir + "/sub is a folder; choose a Testfile file.");
     m.ResetDirectory();
     EXPECT_EQ(m.LastDirectory(), "");
-}
 
-TEST_F(FileManagerTest, StoringOverAFileAsksFirstAndCancelIsMinusOne) {
-    RecordingManager m(form, dir);
-    // Over a.tst: "Cancel" at the question goes back to the browser; cancelling it stores nothing.
-    int step = 0;
-    std::string asked;
+    step = 0;
     Poll refuse([&] {
         if (step == 0)
             return Choose(m, dir + "/a.tst") && (++step, false);
-        if (step == 1) {
-            Widget q = Notice();
-            if (!q || !Viewable(XmMessageBoxGetChild(q, XmDIALOG_CANCEL_BUTTON)))
-                return false;
-            asked = MessageOf(q);
-            return PressWhenShown(XmMessageBoxGetChild(q, XmDIALOG_CANCEL_BUTTON)) &&
-                   (++step, false);
-        }
-        if (!m.Waiting())
-            return false;
-        return PressWhenShown(XmFileSelectionBoxGetChild(m.Browser(), XmDIALOG_CANCEL_BUTTON));
+        if (step == 1)
+            return Answer(XmDIALOG_CANCEL_BUTTON, &told) && (++step, false);
+        return m.Waiting() &&
+               PressWhenShown(XmFileSelectionBoxGetChild(m.Browser(), XmDIALOG_CANCEL_BUTTON));
     });
     EXPECT_EQ(m.StoreAs(1), -1);
-    EXPECT_EQ(asked, dir + "/a.tst already exists. Replace it?");
+    EXPECT_EQ(told, dir + "/a.tst already exists. Replace it?");
     EXPECT_TRUE(m.stored.empty());
-    // "Replace" stores.
     step = 0;
     Poll replace([&] {
-        if (step == 0)
-            return Choose(m, dir + "/a.tst") && (++step, false);
-        Widget q = Notice();
-        return q && PressWhenShown(XmMessageBoxGetChild(q, XmDIALOG_OK_BUTTON));
+        return step == 0 ? Choose(m, dir + "/a.tst") && (++step, false)
+                         : Answer(XmDIALOG_OK_BUTTON);
     });
     EXPECT_EQ(m.StoreAs(1), 1);
     EXPECT_EQ(m.stored, dir + "/a.tst");
-    // A new name is stored without a question.
     Poll fresh([&] { return Choose(m, dir + "/new.tst"); });
     EXPECT_EQ(m.StoreAs(1), 1);
     EXPECT_EQ(m.stored, dir + "/new.tst");
@@ -322,8 +310,6 @@ TEST_F(ToolkitTest, ImageButtonPressAndDoubleClick) {
     EXPECT_EQ(doubles, 1);
     button->Pressed(100060);  // a third press starts a new pair
     EXPECT_EQ(doubles, 1);
-    button->SetState(1);
-    EXPECT_EQ(button->GetState(), 1);
     XtDestroyWidget(button->GetWidget());
 }
 
