@@ -26,12 +26,8 @@ class KLSyncChartTestAccess {
   public:
     static void Feedback(KLSyncChart* c) { c->feedback_meter_movement(); }
     static void SetActiveKey(KLSyncChart* c, KLKeyEvent* e) { c->set_active_key(e); }
-    static void Keyboard(KLSyncChart* c, unsigned long keysym, const char* text) {
-        char buffer[20] = {0};
-        int count = 0;
-        for (; text && text[count] && count < 19; count++)
-            buffer[count] = text[count];
-        c->handle_keyboard_input(keysym, count, buffer);
+    static void Keyboard(KLSyncChart* c, unsigned long keysym, std::string text) {
+        c->handle_keyboard_input(keysym, int(text.size()), text.data());
     }
 };
 

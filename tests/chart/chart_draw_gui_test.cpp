@@ -95,7 +95,7 @@ TEST_F(ChartDraw, EaseAndSmoothCurvesRunThroughTheEaseFunction) {
     }
 }
 
-TEST_F(ChartDraw, RegionIndicatorAndZoom) {
+TEST_F(ChartDraw, RegionIndicatorZoomAndWaveform) {
     // 1.25 seconds is fraction 0.125, column 75 exactly (grid lines are every 10 columns).
     chart->SetRegionRange(Seconds(0.5), Seconds(1.25));
     EXPECT_EQ(Pixel(75, 5), chart->regionColor);
@@ -145,9 +145,8 @@ TEST_F(ChartDraw, RegionIndicatorAndZoom) {
     guitest::Click(out);
     ASSERT_TRUE(guitest::WaitFor(
         [this] { return chart->geometry.zoomStart == 0.0f && chart->geometry.zoomEnd == 1.0f; }));
-}
 
-TEST_F(ChartDraw, WaveformOfSilenceOfALoudSoundAndOfNone) {
+    // The waveform of silence, of a loud sound and of none.
     auto silent = charttest::Sound(std::vector<float>(48000, 0.0f), 48000);
     chart->SetSound(silent.get());
     EXPECT_EQ(chart->peak, 0.0f);

@@ -58,13 +58,21 @@ TEST_F(KeyDrawing, HeldShapesAreFlatAndCurvesRiseIntoTheirKey) {
     EXPECT_EQ(d.smooth.size(), 40u);
 }
 
-TEST_F(KeyDrawing, KeysInOneColumnShareTheirStick) {
+TEST_F(KeyDrawing, KeysInOneColumnShareTheirStickAndNamelessKeysHaveNoLetter) {
     for (int i = 0; i < 6; i++)
         Key(i % 3, 1.0 + i * 0.001, 1, i < 3 ? 1.0f : 2.0f);
     d.Build(g, track);
     // One stick and two distinct ticks for the column, six letters.
     EXPECT_EQ(d.sticks.size(), 3u);
     EXPECT_EQ(d.letters.size(), 6u);
+    // Keys whose shape has an empty name, or none, draw no letter.
+    track.Clear();
+    keyset.keyShapes.push_back(std::make_unique<KLKey>(3.0f, "", nullptr));
+    track.InsertKey(3, CueTime::FromSeconds(1), keyset.keyShapes.back().get(), 1, 1.0f);
+    track.InsertKey(1, CueTime::FromSeconds(2), nullptr, 1, 1.0f);
+    d.Build(g, track);
+    EXPECT_TRUE(d.letters.empty());
+    EXPECT_EQ(d.sticks.size(), 4u);
 }
 
 TEST_F(KeyDrawing, FarZoomsStayWithinTheDrawableRange) {
@@ -83,15 +91,6 @@ TEST_F(KeyDrawing, FarZoomsStayWithinTheDrawableRange) {
         }
     }
     EXPECT_TRUE(d.sticks.empty());  // no key lies in view
-}
-
-TEST_F(KeyDrawing, EmptyNamesDrawNoLetter) {
-    keyset.keyShapes.push_back(std::make_unique<KLKey>(3.0f, "", nullptr));
-    track.InsertKey(3, CueTime::FromSeconds(1), keyset.keyShapes.back().get(), 1, 1.0f);
-    track.InsertKey(1, CueTime::FromSeconds(2), nullptr, 1, 1.0f);
-    d.Build(g, track);
-    EXPECT_TRUE(d.letters.empty());
-    EXPECT_EQ(d.sticks.size(), 4u);
 }
 
 }  // namespace

@@ -252,7 +252,7 @@ TEST_F(FileManagerTest, PostFilterDropsNamesFromTheList) {
     EXPECT_EQ(listed[0], dir + "/a.tst");
 }
 
-TEST_F(ToolkitTest, ImageViewMixesByFadeAndShowsBackgroundWithoutImage) {
+TEST_F(ToolkitTest, ImageViewFadesAndImageButtonDoubleClicks) {
     KLImageView* view = dynamic_cast<KLImageView*>(
         KLFiend::FromWidget(KLImageView::Create(form, const_cast<char*>("view"), nullptr, 0)));
     ASSERT_NE(view, nullptr);
@@ -285,9 +285,8 @@ TEST_F(ToolkitTest, ImageViewMixesByFadeAndShowsBackgroundWithoutImage) {
     guitest::Settle();
     EXPECT_EQ(guitest::PixelAt(w, 100, 50), background);
     XtDestroyWidget(w);
-}
 
-TEST_F(ToolkitTest, ImageButtonPressAndDoubleClick) {
+    // An image button: a click presses it; two presses close together are a double click.
     auto* button = dynamic_cast<KLImageButton*>(
         KLFiend::FromWidget(KLImageButton::Create(form, const_cast<char*>("tile"), nullptr, 0)));
     ASSERT_NE(button, nullptr);
