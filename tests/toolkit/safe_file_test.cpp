@@ -10,7 +10,6 @@
 
 #include <cstdio>
 #include <fstream>
-#include <sstream>
 
 #include "toolkit/SafeFile.h"
 #include "toolkit_test_util.h"
@@ -20,13 +19,6 @@ namespace fs = std::filesystem;
 namespace {
 
 using Stage = SafeFile::Stage;
-
-std::string Slurp(const std::string& path) {
-    std::ifstream in(path, std::ios::binary);
-    std::ostringstream text;
-    text << in.rdbuf();
-    return text.str();
-}
 
 // The names in `dir`, sorted.
 std::vector<std::string> Listing(const fs::path& dir) {

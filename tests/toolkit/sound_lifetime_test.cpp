@@ -6,8 +6,6 @@
 // are use-after-free and double free, which the sanitizer build and valgrind report; a plain
 // build catches the ones that corrupt the heap badly enough to abort.
 
-#include <stdlib.h>
-
 #include <chrono>
 #include <cmath>
 #include <cstdlib>
@@ -33,12 +31,6 @@ std::unique_ptr<CueSound> tone(double rate, long frames, int channels = 1) {
     return CueSound::FromSamples(std::move(data), rate);
 }
 
-void use_driver(const std::string& driver) {
-    setenv("SDL_AUDIODRIVER", driver.c_str(), 1);
-    setenv("SDL_DISKAUDIOFILE", "/dev/null", 1);
-    setenv("SDL_DISKAUDIODELAY", "0", 1);
-}
-
 // Waits until the device has asked for `count` more buffers (two seconds at most).
 bool wait_buffers(long count) {
     const long until = KLSoundControl::LastHanded().buffers + count;
@@ -54,7 +46,7 @@ bool wait_buffers(long count) {
 class SoundLifetimeTest : public ::testing::TestWithParam<const char*> {
   protected:
     void SetUp() override {
-        use_driver(GetParam());
+        UseSoundDriver(GetParam());
         ASSERT_TRUE(KLSoundControl::Open());
         ASSERT_STREQ(KLSoundControl::DriverName(), GetParam());
         KLSoundControl::PlaySpeed(1.0f);
@@ -142,7 +134,7 @@ std::unique_ptr<CueSound> theSoundAtExit;
 std::unique_ptr<KLTimer> theTimerAtExit;
 
 [[noreturn]] void exit_while_playing(const char* driver) {
-    use_driver(driver);
+    UseSoundDriver(driver);
     theSoundAtExit = tone(48000, 48000 * 5);
     theTimerAtExit = std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(5));
     theTimerAtExit->start();

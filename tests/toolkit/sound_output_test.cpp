@@ -4,7 +4,6 @@
 
 #include <SDL2/SDL.h>
 #include <samplerate.h>
-#include <stdlib.h>
 
 #include <chrono>
 #include <cmath>
@@ -106,9 +105,7 @@ class SoundOutputTest : public TempDirTest {
     void SetUp() override {
         TempDirTest::SetUp();
         file_ = Path("device.raw");
-        setenv("SDL_AUDIODRIVER", "disk", 1);
-        setenv("SDL_DISKAUDIOFILE", file_.c_str(), 1);
-        setenv("SDL_DISKAUDIODELAY", "0", 1);
+        UseSoundDriver("disk", file_.c_str());
         ASSERT_TRUE(KLSoundControl::Open());
         ASSERT_STREQ(KLSoundControl::DriverName(), "disk");
         rate_ = KLSoundControl::DeviceRate();
