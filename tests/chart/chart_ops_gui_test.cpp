@@ -1,4 +1,4 @@
-// The chart's key and region operations, as tables of cases.
+// The chart's key and region operations, a table of cases on one window.
 #include "chart/ChartTestUtil.h"
 
 #include <cmath>
@@ -15,11 +15,19 @@ class ChartOps : public charttest::ChartTest {
     ChartOps() : ChartTest(20) {}
     void SetUp() override {
         ChartTest::SetUp();
+        Reset();
+    }
+    // The starting keys on a fresh track, everything visible, no region, keyset kind 1.
+    void Reset() {
+        chart->SetKeyTrack(nullptr);
+        track = std::make_unique<KLKeyTrack>(keyset.get());
         const double times[] = {0, 2, 5, 10};
         const float values[] = {1, 1, 0.5f, 1};
         for (int i = 0; i < 4; i++)
             Key(i, times[i], i % 3, values[i]);
+        keyset->kind = 1;
         chart->SetKeyTrack(track.get());
+        chart->ZoomReset();
         chart->SetIndicatorTime(Seconds(3));
         KLSyncChartTestAccess::Feedback(chart);
     }
@@ -65,54 +73,51 @@ int smooth(KLSyncChart* c, KLKeySet*) {
     return c->SetRegionSmoothing(1), 0;
 }
 
-class Operation : public ChartOps, public testing::WithParamInterface<OpCase> {};
+const OpCase kOperations[] = {
+    // Add Key by the keyset's kind, at the indicator or replacing the active key; the
+    // new key is active until the repaint's feedback finds no key at the indicator.
+    OpCase{"AddKindOne", add, 1, 0, 1, 3, -1, 0, 0, 1,
+           "0@0/0/1 1@60/1/1 2@90/1/1 2@150/2/0.5 3@300/0/1 ", 90},
+    OpCase{"AddKindTwoTakesTheShapesFrame", add, 2, 0, 1, 3, -1, 0, 0, 1,
+           "0@0/0/1 1@60/1/1 2@90/1/2 2@150/2/0.5 3@300/0/1 ", 90},
+    OpCase{"AddOtherKindOnlyPicksTheKeyAtTheIndicator", add, 3, 0, 1, 3, -1, 0, 0, 0, kStart, 60},
+    OpCase{"AddReplacesTheActiveKey", add, 1, 0, 1, 3, 5, 0, 0, 1,
+           "0@0/0/1 1@60/1/1 2@150/1/1 3@300/0/1 ", -1},
+    // Delete Region: the region or the visible span, ends included.
+    OpCase{"DeleteVisibleSpanWithItsEnds", delete_region, 1, 0.1f, 0.25f, 3, -1, 0, 0, 0,
+           "0@0/0/1 3@300/0/1 ", -2},
+    OpCase{"DeleteEverything", delete_region, 1, 0, 1, 3, -1, 0, 0, 0, "", -2},
+    OpCase{"DeleteRegion", delete_region, 1, 0, 1, 3, -1, 1, 3, 0, "0@0/0/1 2@150/2/0.5 3@300/0/1 ",
+           -2},
+    OpCase{"DeleteRegionReversedIsNoRegion", delete_region, 1, 0.5f, 1, 3, -1, 3, 1, 0,
+           "0@0/0/1 1@60/1/1 2@150/2/0.5 ", -2},
+    // Smoothing: the active key, the region with its ends or the next key to the right.
+    OpCase{"SmoothNextKeyRightOfTheIndicator", smooth, 1, 0, 1, 3, -1, 0, 0, 0,
+           "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/0/1 ", -2},
+    OpCase{"SmoothActiveKey", smooth, 1, 0, 1, 3, 0, 0, 0, 0,
+           "0@0/1/1 1@60/1/1 2@150/2/0.5 3@300/0/1 ", -2},
+    OpCase{"SmoothNoKeyToTheRight", smooth, 1, 0, 1, 12, -1, 0, 0, 0, kStart, -2},
+    OpCase{"SmoothRegionWithItsEnds", smooth, 1, 0, 1, 3, -1, 5, 10, 0,
+           "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/1/1 ", -2}};
 
-TEST_P(Operation, ActsOnTheActiveKeyTheIndicatorTheRegionOrTheVisibleSpan) {
-    const auto& c = GetParam();
-    keyset->kind = c.kind;
-    chart->SetZoomPan(c.zoomStart, c.zoomEnd);
-    chart->SetIndicatorTime(Seconds(c.indicator));
-    if (c.active >= 0)
-        KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(c.active)));
-    if (c.regionStart != c.regionEnd)
-        chart->SetRegionRange(Seconds(c.regionStart), Seconds(c.regionEnd));
-    EXPECT_EQ(c.op(chart, keyset.get()), c.result);
-    EXPECT_EQ(Keys(), c.keys);
-    if (c.activeFrame != -2) {
-        EXPECT_EQ(ActiveFrame(), c.activeFrame);
+TEST_F(ChartOps, OperationsActOnTheActiveKeyTheIndicatorTheRegionOrTheVisibleSpan) {
+    for (const OpCase& c : kOperations) {
+        SCOPED_TRACE(c.name);
+        Reset();
+        keyset->kind = c.kind;
+        chart->SetZoomPan(c.zoomStart, c.zoomEnd);
+        chart->SetIndicatorTime(Seconds(c.indicator));
+        if (c.active >= 0)
+            KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(c.active)));
+        if (c.regionStart != c.regionEnd)
+            chart->SetRegionRange(Seconds(c.regionStart), Seconds(c.regionEnd));
+        EXPECT_EQ(c.op(chart, keyset.get()), c.result);
+        EXPECT_EQ(Keys(), c.keys);
+        if (c.activeFrame != -2) {
+            EXPECT_EQ(ActiveFrame(), c.activeFrame);
+        }
     }
 }
-
-INSTANTIATE_TEST_SUITE_P(
-    Cases, Operation,
-    testing::Values(
-        // Add Key by the keyset's kind, at the indicator or replacing the active key; the
-        // new key is active until the repaint's feedback finds no key at the indicator.
-        OpCase{"AddKindOne", add, 1, 0, 1, 3, -1, 0, 0, 1,
-               "0@0/0/1 1@60/1/1 2@90/1/1 2@150/2/0.5 3@300/0/1 ", 90},
-        OpCase{"AddKindTwoTakesTheShapesFrame", add, 2, 0, 1, 3, -1, 0, 0, 1,
-               "0@0/0/1 1@60/1/1 2@90/1/2 2@150/2/0.5 3@300/0/1 ", 90},
-        OpCase{"AddOtherKindOnlyPicksTheKeyAtTheIndicator", add, 3, 0, 1, 3, -1, 0, 0, 0, kStart,
-               60},
-        OpCase{"AddReplacesTheActiveKey", add, 1, 0, 1, 3, 5, 0, 0, 1,
-               "0@0/0/1 1@60/1/1 2@150/1/1 3@300/0/1 ", -1},
-        // Delete Region: the region or the visible span, ends included.
-        OpCase{"DeleteVisibleSpanWithItsEnds", delete_region, 1, 0.1f, 0.25f, 3, -1, 0, 0, 0,
-               "0@0/0/1 3@300/0/1 ", -2},
-        OpCase{"DeleteEverything", delete_region, 1, 0, 1, 3, -1, 0, 0, 0, "", -2},
-        OpCase{"DeleteRegion", delete_region, 1, 0, 1, 3, -1, 1, 3, 0,
-               "0@0/0/1 2@150/2/0.5 3@300/0/1 ", -2},
-        OpCase{"DeleteRegionReversedIsNoRegion", delete_region, 1, 0.5f, 1, 3, -1, 3, 1, 0,
-               "0@0/0/1 1@60/1/1 2@150/2/0.5 ", -2},
-        // Smoothing: the active key, the region with its ends or the next key to the right.
-        OpCase{"SmoothNextKeyRightOfTheIndicator", smooth, 1, 0, 1, 3, -1, 0, 0, 0,
-               "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/0/1 ", -2},
-        OpCase{"SmoothActiveKey", smooth, 1, 0, 1, 3, 0, 0, 0, 0,
-               "0@0/1/1 1@60/1/1 2@150/2/0.5 3@300/0/1 ", -2},
-        OpCase{"SmoothNoKeyToTheRight", smooth, 1, 0, 1, 12, -1, 0, 0, 0, kStart, -2},
-        OpCase{"SmoothRegionWithItsEnds", smooth, 1, 0, 1, 3, -1, 5, 10, 0,
-               "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/1/1 ", -2}),
-    [](const auto& info) { return std::string(info.param.name); });
 
 // A hidden indicator (as on a fresh chart or after opening a track) sits one pixel left of
 // the chart, next to the key at time 0: that key must not become active, or Delete Key
@@ -134,18 +139,29 @@ TEST_F(ChartOps, AHiddenIndicatorMakesNoKeyActiveAndAddsAtTimeZero) {
     EXPECT_EQ(ActiveFrame(), 0);
 }
 
-TEST_F(ChartOps, AddTimeKeyframeIgnoresTheKindAndRefusesAnOccupiedTime) {
-    keyset->kind = 2;
+// Keys added and deleted at a time or as the active key; without a key track nothing
+// changes.
+TEST_F(ChartOps, KeysByTimeAndTheActiveKey) {
+    keyset->kind = 2;  // AddTimeKeyframe ignores the kind
     EXPECT_EQ(chart->AddTimeKeyframe(3, Seconds(4), keyset->GetKeyShape(3), 1), 1);
     EXPECT_EQ(Keys(), "0@0/0/1 1@60/1/1 3@120/1/1 2@150/2/0.5 3@300/0/1 ");
-    // The active key stays where it is: AddTimeKeyframe does not replace it.
+    // An occupied time is refused, and the active key is not replaced.
     KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(0)));
     EXPECT_EQ(chart->AddTimeKeyframe(1, Seconds(5), keyset->GetKeyShape(1), 0), 0);
     EXPECT_EQ(ActiveFrame(), 150);
     EXPECT_EQ(track->events.Count(), 5);
-}
 
-TEST_F(ChartOps, NothingWithoutAKeyTrack) {
+    Reset();
+    chart->DeleteActiveKeyframe();  // none active: nothing
+    EXPECT_EQ(Keys(), kStart);
+    KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(2)));
+    chart->DeleteActiveKeyframe();
+    EXPECT_EQ(chart->activeKey, nullptr);
+    chart->DeleteTimeKeyframe(Seconds(5));
+    chart->DeleteTimeKeyframe(Seconds(7));
+    EXPECT_EQ(Keys(), "0@0/0/1 3@300/0/1 ");
+
+    Reset();
     chart->SetKeyTrack(nullptr);
     EXPECT_EQ(chart->AddKeyframe(1, keyset->GetKeyShape(1), 1), 0);
     EXPECT_EQ(chart->AddTimeKeyframe(1, Seconds(1), keyset->GetKeyShape(1), 1), 0);
@@ -155,18 +171,10 @@ TEST_F(ChartOps, NothingWithoutAKeyTrack) {
     EXPECT_EQ(Keys(), kStart);
 }
 
-TEST_F(ChartOps, DeletingTheActiveKeyOrAKeyByTime) {
-    chart->DeleteActiveKeyframe();  // none active: nothing
-    EXPECT_EQ(Keys(), kStart);
-    KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(2)));
-    chart->DeleteActiveKeyframe();
-    EXPECT_EQ(chart->activeKey, nullptr);
-    chart->DeleteTimeKeyframe(Seconds(5));
-    chart->DeleteTimeKeyframe(Seconds(7));
-    EXPECT_EQ(Keys(), "0@0/0/1 3@300/0/1 ");
-}
-
-TEST_F(ChartOps, RegionRangeDefaultsToTheVisibleSpan) {
+// The region range defaults to the visible span; the duration follows the user's, the
+// sound's and the track's; odd sounds still show, and one longer than the time line holds
+// (2^31 ticks is about 99 hours) saturates the duration.
+TEST_F(ChartOps, RangesDurationAndOddSounds) {
     CueTime a, b;
     chart->SetZoomPan(0.25f, 0.5f);
     chart->GetRegionRange(a, b);
@@ -176,9 +184,7 @@ TEST_F(ChartOps, RegionRangeDefaultsToTheVisibleSpan) {
     chart->GetZoomRange(a, b);
     EXPECT_EQ(std::make_pair(a, b), std::make_pair(Seconds(4), Seconds(6)));
     EXPECT_FALSE(chart->geometry.RegionSelected());
-}
 
-TEST_F(ChartOps, DurationFollowsUserSoundAndTrack) {
     chart->SetUserDuration(CueTime());
     EXPECT_EQ(chart->geometry.duration, Seconds(10));  // the track's last key
     chart->SetKeyTrack(nullptr);
@@ -192,19 +198,15 @@ TEST_F(ChartOps, DurationFollowsUserSoundAndTrack) {
     chart->SetSound(nullptr);
     EXPECT_EQ(chart->geometry.duration, Seconds(3));
     EXPECT_EQ(chart->sampleCount, 48000 * 3);
-}
 
-TEST_F(ChartOps, SoundsThatAreOddStillShow) {
-    const std::vector<std::vector<float>> odd = {
-        {0.5f}, {NAN, 0.25f, NAN, -0.5f}, std::vector<float>(1000, 0.0f)};
-    for (const auto& samples : odd) {
-        auto sound = charttest::Sound(samples, 48000);
-        chart->SetSound(sound.get());
+    for (const std::vector<float>& samples :
+         {std::vector<float>{0.5f}, {NAN, 0.25f, NAN, -0.5f}, std::vector<float>(1000, 0.0f)}) {
+        auto odd = charttest::Sound(samples, 48000);
+        chart->SetSound(odd.get());
         guitest::Settle();
         EXPECT_TRUE(std::isfinite(chart->peak));
     }
     EXPECT_EQ(chart->waveSegmentCount, 0);
-    // Longer than the time line holds (2^31 ticks is about 99 hours): the duration saturates.
     auto endless = charttest::Sound(std::vector<float>(400000, 0.5f), 1.0);
     chart->SetSound(endless.get());
     EXPECT_EQ(chart->geometry.duration, CueTime::FromTicks(INT32_MAX));
