@@ -37,26 +37,19 @@ const char chartTranslations[] =
     "<Btn2Up>\t: DrawingAreaInput() ManagerGadgetActivate()\n"
     "<BtnMotion> : DrawingAreaInput()";
 
-// The colour and callback resources, read as sub-resources of the chart's form.
-struct ChartResources {
-    Pixel soundColor, gridColor, regionColor, keylineColor, keyColor, keyActiveColor,
-        keyMovingColor, easeColor, linearColor, smoothColor;
-    KLFiendCallback showKeyframeCallback, showKeyframeImageCallback, showReferenceImageCallback;
-};
-
 const KLFiendCallback noCallback{};
 const Pixel noPixel = 0;
 
-#define CHART_PIXEL(name, cls, field)                                                    \
-    {                                                                                    \
-        const_cast<char*>(name), const_cast<char*>(cls), const_cast<char*>(XtRPixel),    \
-            sizeof(Pixel), offsetof(ChartResources, field), const_cast<char*>(XtRPixel), \
-            const_cast<Pixel*>(&noPixel)                                                 \
+#define CHART_PIXEL(name, cls, field)                                                      \
+    {                                                                                      \
+        const_cast<char*>(name), const_cast<char*>(cls), const_cast<char*>(XtRPixel),      \
+            sizeof(Pixel), offsetof(KLChartResources, field), const_cast<char*>(XtRPixel), \
+            const_cast<Pixel*>(&noPixel)                                                   \
     }
 #define CHART_CALLBACK(name, cls, field)                                                      \
     {                                                                                         \
         const_cast<char*>(name), const_cast<char*>(cls), const_cast<char*>(KLRFiendCallback), \
-            sizeof(KLFiendCallback), offsetof(ChartResources, field),                         \
+            sizeof(KLFiendCallback), offsetof(KLChartResources, field),                       \
             const_cast<char*>(KLRFiendCallback), const_cast<KLFiendCallback*>(&noCallback)    \
     }
 
@@ -170,22 +163,10 @@ KLSyncChart::~KLSyncChart() {
 }
 
 void KLSyncChart::read_resources(Widget form) {
-    ChartResources r{};
-    XtGetSubresources(form, &r, const_cast<char*>(Name().c_str()), const_cast<char*>("SyncChart"),
-                      chartResources, XtNumber(chartResources), nullptr, 0);
-    soundColor = r.soundColor;
-    gridColor = r.gridColor;
-    regionColor = r.regionColor;
-    keylineColor = r.keylineColor;
-    keyColor = r.keyColor;
-    keyActiveColor = r.keyActiveColor;
-    keyMovingColor = r.keyMovingColor;
-    easeColor = r.easeColor;
-    linearColor = r.linearColor;
-    smoothColor = r.smoothColor;
-    showKeyframeCallback = r.showKeyframeCallback;
-    showKeyframeImageCallback = r.showKeyframeImageCallback;
-    showReferenceImageCallback = r.showReferenceImageCallback;
+    // The colour and callback resources, read as sub-resources of the chart's form.
+    XtGetSubresources(form, static_cast<KLChartResources*>(this), const_cast<char*>(Name().c_str()),
+                      const_cast<char*>("SyncChart"), chartResources, XtNumber(chartResources),
+                      nullptr, 0);
 }
 
 void KLSyncChart::build(Widget form) {

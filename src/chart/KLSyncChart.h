@@ -7,6 +7,7 @@
 #include <X11/Xlib.h>
 
 #include "chart/KLChartGeometry.h"
+#include "chart/KLChartResources.h"
 #include "chart/KLKeyDrawing.h"
 #include "chart/KLWaveSummary.h"
 #include "toolkit/CueTime.h"
@@ -28,7 +29,7 @@ class KLTimer;
 // The time/pixel geometry lives in `geometry` (no X there); everything is drawn into two
 // pixmaps (normal and region colours) and copied to the window. The chart borrows the tracks
 // and the sound and never deletes them. Its top widget (a Form named after the chart) owns it.
-class KLSyncChart : public KLFiend {
+class KLSyncChart : public KLFiend, public KLChartResources {
   public:
     // The widget-table creation function: a new chart under `parent`, returning its top
     // widget (the arguments are not applied).
@@ -104,17 +105,14 @@ class KLSyncChart : public KLFiend {
     GC gc = nullptr;
     GC maskGc = nullptr;
     Pixel background = 0, foreground = 0;
-    Pixel regionColor = 0, soundColor = 0, gridColor = 0, keylineColor = 0, keyColor = 0,
-          keyActiveColor = 0, keyMovingColor = 0, easeColor = 0, linearColor = 0, smoothColor = 0;
     std::vector<KLWaveSegment> waveSegments;  // one per column
     int waveSegmentCount = 0;                 // segments sketched (0: no waveform)
     CueSound* sound = nullptr;                // borrowed
     std::vector<float> samples;               // the sound as one channel
     long sampleCount = 0;
     float peak = 0.0f;
-    KLWaveSummary waveSummary;  // min/max summaries of `samples`
-    KLKeyDrawing keyDrawing;    // the key layer of the last redraw
-    KLFiendCallback showKeyframeCallback, showKeyframeImageCallback, showReferenceImageCallback;
+    KLWaveSummary waveSummary;          // min/max summaries of `samples`
+    KLKeyDrawing keyDrawing;            // the key layer of the last redraw
     std::unique_ptr<KLChartText> font;  // the chart's text font
 
     int dragMode = 0;  // 0 none, 1 indicator, 2 key, 3 mark, 4 scrub, 5 key stick
@@ -151,6 +149,8 @@ class KLSyncChart : public KLFiend {
 
     // Pointer and keyboard (KLSyncChartInput.cpp).
     void input(XEvent* event);
+    // Starts (phase 0), moves (1) or ends (2) the button-1 drag that `dragMode` names.
+    void button1_drag(int x, int y, int phase);
     void scrub(int x, int phase);
     void stop_scrub();
     void drag_1(int x, int phase);
@@ -158,6 +158,13 @@ class KLSyncChart : public KLFiend {
     void drag_keystick(int y, int phase);
     void drag_mark(int x, int phase);
     void drag_region(int x, int phase);
+    // Draws a dragged key or mark at the pointer's column (kept inside the chart) until the
+    // release (phase 2), erasing it where it was drawn before; the column it lands on at the
+    // release, -1 until then.
+    int follow_drag(int x, int phase, void (KLSyncChart::*erase)(int),
+                    void (KLSyncChart::*draw)(int));
+    // Ends a drag that changed a track: the chart redrawn and the views told.
+    void end_drag();
     int handle_keyframe_hit(XEvent* event);
     int handle_keystick_hit(XEvent* event);
     int handle_mark_hit(XEvent* event);

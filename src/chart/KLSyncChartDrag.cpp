@@ -112,19 +112,33 @@ int landing_column(int x, uint32_t width) {
 }
 }  // namespace
 
-void KLSyncChart::drag_key(int x, int phase) {
-    if (!keyTrack || !hitKey)
-        return;
+int KLSyncChart::follow_drag(int x, int phase, void (KLSyncChart::*erase)(int),
+                             void (KLSyncChart::*draw)(int)) {
     if (dragX_ >= 0)
-        erase_key_strip(dragX_);
+        (this->*erase)(dragX_);
     x = landing_column(x, geometry.width);
     if (phase != 2) {
         dragX_ = x;
-        draw_dragged_key(x);
+        (this->*draw)(x);
         XFlush(display);
-        return;
+        return -1;
     }
     dragX_ = -1;
+    return x;
+}
+
+void KLSyncChart::end_drag() {
+    needRedraw = true;
+    full_expose();
+    feedback_meter_movement();
+}
+
+void KLSyncChart::drag_key(int x, int phase) {
+    if (!keyTrack || !hitKey)
+        return;
+    x = follow_drag(x, phase, &KLSyncChart::erase_key_strip, &KLSyncChart::draw_dragged_key);
+    if (x < 0)
+        return;
     const KLKeyEvent moved = *hitKey;
     const CueTime to = geometry.TimeFromColumn(x);
     const bool wasActive = activeKey == hitKey;
@@ -142,9 +156,7 @@ void KLSyncChart::drag_key(int x, int phase) {
     }
     hitKey = nullptr;
     keyTrack->PrepareKeyFrames(nullptr);
-    needRedraw = true;
-    full_expose();
-    feedback_meter_movement();
+    end_drag();
 }
 
 void KLSyncChart::drag_keystick(int y, int phase) {
@@ -160,24 +172,15 @@ void KLSyncChart::drag_keystick(int y, int phase) {
     }
     hitKey = nullptr;
     keyTrack->PrepareKeyFrames(nullptr);
-    needRedraw = true;
-    full_expose();
-    feedback_meter_movement();
+    end_drag();
 }
 
 void KLSyncChart::drag_mark(int x, int phase) {
     if (!markTrack || !hitMark)
         return;
-    if (dragX_ >= 0)
-        erase_mark_strip(dragX_);
-    x = landing_column(x, geometry.width);
-    if (phase != 2) {
-        dragX_ = x;
-        draw_dragged_mark(x);
-        XFlush(display);
+    x = follow_drag(x, phase, &KLSyncChart::erase_mark_strip, &KLSyncChart::draw_dragged_mark);
+    if (x < 0)
         return;
-    }
-    dragX_ = -1;
     const KLMarkEvent moved = *hitMark;
     const CueTime to = geometry.TimeFromColumn(x);
     if (to != moved.time && markTrack->RemoveMark(moved.time)) {
@@ -187,9 +190,7 @@ void KLSyncChart::drag_mark(int x, int phase) {
             markTrack->InsertMark(moved.time, moved.label);
     }
     hitMark = nullptr;
-    needRedraw = true;
-    full_expose();
-    feedback_meter_movement();
+    end_drag();
 }
 
 void KLSyncChart::scrub(int x, int phase) {

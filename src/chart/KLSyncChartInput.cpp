@@ -28,6 +28,29 @@ std::unique_ptr<KLTimer> KLSyncChart::scrubTimer;
 
 namespace {
 const CueTime kOneFrame(1.0, 0);
+
+// The first of the keys or marks either side of a time whose column is within reach of `x`
+// and that `accepts` takes; null when neither is.
+template <typename Event, typename Accepts>
+Event* within_reach(const KLChartGeometry& g, int x, Event* before, Event* after, Accepts accepts) {
+    for (Event* e : {before, after})
+        if (e && KLChartGeometry::Hits(g.ColumnFromTime(e->time), x) && accepts(*e))
+            return e;
+    return nullptr;
+}
+
+template <typename Event>
+Event* within_reach(const KLChartGeometry& g, int x, Event* before, Event* after) {
+    return within_reach(g, x, before, after, [](const Event&) { return true; });
+}
+
+// The key either side of column `x` within reach of it that `accepts` takes, or null.
+template <typename Accepts>
+KLKeyEvent* key_within_reach(KLKeyTrack& track, const KLChartGeometry& g, int x, Accepts accepts) {
+    KLKeyEvent *before = nullptr, *after = nullptr;
+    track.bracket_keys_from_time(g.TimeFromColumn(x), &before, &after);
+    return within_reach(g, x, before, after, accepts);
+}
 }  // namespace
 
 void KLSyncChart::input(XEvent* event) {
@@ -37,22 +60,14 @@ void KLSyncChart::input(XEvent* event) {
         case ButtonPress: {
             const int x = event->xbutton.x;
             if (event->xbutton.button == Button1) {
-                if (sound && (event->xbutton.state & ShiftMask)) {
-                    dragMode = 4;
-                    scrub(x, 0);
-                } else if (handle_keyframe_hit(event)) {
-                    dragMode = 2;
-                    drag_key(x, 0);
-                } else if (handle_mark_hit(event)) {
-                    dragMode = 3;
-                    drag_mark(x, 0);
-                } else if (handle_keystick_hit(event)) {
-                    dragMode = 5;
-                    drag_keystick(event->xbutton.y, 0);
-                } else {
-                    dragMode = 1;
-                    drag_1(x, 0);
-                }
+                // Shift scrubs a sound; otherwise the first thing hit under the pointer is
+                // dragged, and the indicator when nothing is.
+                dragMode = sound && (event->xbutton.state & ShiftMask) ? 4
+                           : handle_keyframe_hit(event)                ? 2
+                           : handle_mark_hit(event)                    ? 3
+                           : handle_keystick_hit(event)                ? 5
+                                                                       : 1;
+                button1_drag(x, event->xbutton.y, 0);
             } else if (event->xbutton.button == Button2) {
                 drag_region(x, 0);
             }
@@ -61,25 +76,7 @@ void KLSyncChart::input(XEvent* event) {
         case MotionNotify: {
             const int x = event->xmotion.x;
             if (event->xmotion.state & Button1Mask) {
-                switch (dragMode) {
-                    case 1:
-                        drag_1(x, 1);
-                        break;
-                    case 2:
-                        drag_key(x, 1);
-                        break;
-                    case 3:
-                        drag_mark(x, 1);
-                        break;
-                    case 4:
-                        scrub(x, 1);
-                        break;
-                    case 5:
-                        drag_keystick(event->xmotion.y, 1);
-                        break;
-                    default:
-                        break;
-                }
+                button1_drag(x, event->xmotion.y, 1);
             } else if (event->xmotion.state & Button2Mask) {
                 drag_region(x, 1);
             }
@@ -88,25 +85,7 @@ void KLSyncChart::input(XEvent* event) {
         case ButtonRelease: {
             const int x = event->xbutton.x;
             if (event->xbutton.button == Button1) {
-                switch (dragMode) {
-                    case 1:
-                        drag_1(x, 2);
-                        break;
-                    case 2:
-                        drag_key(x, 2);
-                        break;
-                    case 3:
-                        drag_mark(x, 2);
-                        break;
-                    case 4:
-                        scrub(x, 2);
-                        break;
-                    case 5:
-                        drag_keystick(event->xbutton.y, 2);
-                        break;
-                    default:
-                        break;
-                }
+                button1_drag(x, event->xbutton.y, 2);
                 dragMode = 0;
             } else if (event->xbutton.button == Button2) {
                 drag_region(x, 2);
@@ -125,37 +104,51 @@ void KLSyncChart::input(XEvent* event) {
     }
 }
 
+void KLSyncChart::button1_drag(int x, int y, int phase) {
+    switch (dragMode) {
+        case 1:
+            drag_1(x, phase);
+            break;
+        case 2:
+            drag_key(x, phase);
+            break;
+        case 3:
+            drag_mark(x, phase);
+            break;
+        case 4:
+            scrub(x, phase);
+            break;
+        case 5:
+            drag_keystick(y, phase);
+            break;
+        default:
+            break;
+    }
+}
+
 // --- Hit tests --------------------------------------------------------------------------
 
 int KLSyncChart::handle_keyframe_hit(XEvent* event) {
     const int x = event->xbutton.x, y = event->xbutton.y;
     if (!keyTrack || !geometry.InKeyLetterStrip(y))
         return 0;
-    KLKeyEvent *before = nullptr, *after = nullptr;
-    keyTrack->bracket_keys_from_time(geometry.TimeFromColumn(x), &before, &after);
-    for (KLKeyEvent* k : {before, after}) {
-        if (k && KLChartGeometry::Hits(geometry.ColumnFromTime(k->time), x)) {
-            hitKey = k;
-            return 1;
-        }
-    }
-    return 0;
+    KLKeyEvent* k =
+        key_within_reach(*keyTrack, geometry, x, [](const KLKeyEvent&) { return true; });
+    if (k)
+        hitKey = k;
+    return k != nullptr;
 }
 
 int KLSyncChart::handle_keystick_hit(XEvent* event) {
     const int x = event->xbutton.x, y = event->xbutton.y;
     if (!keyTrack || !geometry.InStickBand(y))
         return 0;
-    KLKeyEvent *before = nullptr, *after = nullptr;
-    keyTrack->bracket_keys_from_time(geometry.TimeFromColumn(x), &before, &after);
-    for (KLKeyEvent* k : {before, after}) {
-        if (k && KLChartGeometry::Hits(geometry.ColumnFromTime(k->time), x) &&
-            std::abs(y - geometry.TickRow(k->value)) < 5) {
-            hitKey = k;
-            return 1;
-        }
-    }
-    return 0;
+    KLKeyEvent* k = key_within_reach(*keyTrack, geometry, x, [&](const KLKeyEvent& e) {
+        return std::abs(y - geometry.TickRow(e.value)) < 5;
+    });
+    if (k)
+        hitKey = k;
+    return k != nullptr;
 }
 
 int KLSyncChart::handle_mark_hit(XEvent* event) {
@@ -164,14 +157,10 @@ int KLSyncChart::handle_mark_hit(XEvent* event) {
         return 0;
     KLMarkEvent *before = nullptr, *after = nullptr;
     markTrack->BracketMarks(geometry.TimeFromColumn(x), &before, &after);
-    for (KLMarkEvent* m : {before, after}) {
-        const int column = m ? geometry.ColumnFromTime(m->time) : -100;
-        if (m && KLChartGeometry::Hits(column, x)) {
-            hitMark = m;
-            return 1;
-        }
-    }
-    return 0;
+    KLMarkEvent* m = within_reach(geometry, x, before, after);
+    if (m)
+        hitMark = m;
+    return m != nullptr;
 }
 
 // --- Active key and mark, feedback --------------------------------------------------------
@@ -214,16 +203,9 @@ void KLSyncChart::feedback_meter_movement() {
     if (keyTrack) {
         KLKeyEvent *before = nullptr, *after = nullptr;
         feedbackBlend = keyTrack->bracket_keys_from_time(t, &before, &after);
-        KLKeyEvent* active = nullptr;
         // A hidden indicator (column -1) picks no key: the key at the chart's start would
         // otherwise become active, and Delete Key remove it, without the user seeing why.
-        if (!shown) {
-        } else if (before && std::abs(geometry.ColumnFromTime(before->time) - ix) <= 4) {
-            active = before;
-        } else if (after && KLChartGeometry::Hits(geometry.ColumnFromTime(after->time), ix)) {
-            active = after;
-        }
-        set_active_key(active);
+        set_active_key(shown ? within_reach(geometry, ix, before, after) : nullptr);
         feedbackKeyBefore = before ? before->shapeIndex : -1;
         feedbackKeyAfter = after ? after->shapeIndex : -1;
         showKeyframeImageCallback.Call(this);
@@ -231,14 +213,7 @@ void KLSyncChart::feedback_meter_movement() {
     if (markTrack) {
         KLMarkEvent *before = nullptr, *after = nullptr;
         markTrack->BracketMarks(t, &before, &after);
-        KLMarkEvent* active = nullptr;
-        if (!shown) {
-        } else if (before && KLChartGeometry::Hits(geometry.ColumnFromTime(before->time), ix)) {
-            active = before;
-        } else if (after && KLChartGeometry::Hits(geometry.ColumnFromTime(after->time), ix)) {
-            active = after;
-        }
-        set_active_mark(active);
+        set_active_mark(shown ? within_reach(geometry, ix, before, after) : nullptr);
     }
     showReferenceImageCallback.Call(this);
 }

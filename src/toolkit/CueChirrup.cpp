@@ -2,39 +2,51 @@
 
 namespace {
 CueChirrupHost* theHost = nullptr;
+
+// Hands a control's operation to the host when there is one and the control has a name;
+// 0 otherwise.
+template <typename Call>
+int to_host(const char* name, Call call) {
+    return theHost && name ? call(*theHost) : 0;
 }
+}  // namespace
 
 int CueChirrup::CreateFloatSlider(CueRecognizer* recognizer, const char* name, float minimum,
                                   float maximum, float value, FloatCallback callback) {
-    return theHost && name
-               ? theHost->CreateFloatSlider(recognizer, name, minimum, maximum, value, callback)
-               : 0;
+    return to_host(name, [&](CueChirrupHost& host) {
+        return host.CreateFloatSlider(recognizer, name, minimum, maximum, value, callback);
+    });
 }
 
 int CueChirrup::SetFloatSlider(CueRecognizer* recognizer, const char* name, float value) {
-    return theHost && name ? theHost->SetFloatSlider(recognizer, name, value) : 0;
+    return to_host(
+        name, [&](CueChirrupHost& host) { return host.SetFloatSlider(recognizer, name, value); });
 }
 
 int CueChirrup::CreateIntSlider(CueRecognizer* recognizer, const char* name, int minimum,
                                 int maximum, int value, IntCallback callback) {
-    return theHost && name
-               ? theHost->CreateIntSlider(recognizer, name, minimum, maximum, value, callback)
-               : 0;
+    return to_host(name, [&](CueChirrupHost& host) {
+        return host.CreateIntSlider(recognizer, name, minimum, maximum, value, callback);
+    });
 }
 
 int CueChirrup::SetIntSlider(CueRecognizer* recognizer, const char* name, int value) {
-    return theHost && name ? theHost->SetIntSlider(recognizer, name, value) : 0;
+    return to_host(
+        name, [&](CueChirrupHost& host) { return host.SetIntSlider(recognizer, name, value); });
 }
 
 int CueChirrup::CreateOption(CueRecognizer* recognizer, const char* name, int count,
                              const char* const* labels, int value, OptionCallback callback) {
-    if (!theHost || !name || count < 0 || (count > 0 && !labels))
+    if (count < 0 || (count > 0 && !labels))
         return 0;
-    return theHost->CreateOption(recognizer, name, count, labels, value, callback);
+    return to_host(name, [&](CueChirrupHost& host) {
+        return host.CreateOption(recognizer, name, count, labels, value, callback);
+    });
 }
 
 int CueChirrup::SetOption(CueRecognizer* recognizer, const char* name, int index) {
-    return theHost && name ? theHost->SetOption(recognizer, name, index) : 0;
+    return to_host(name,
+                   [&](CueChirrupHost& host) { return host.SetOption(recognizer, name, index); });
 }
 
 void CueChirrup::Progress(CueRecognizer* recognizer, float done) {

@@ -26,14 +26,8 @@ class KLSyncChartTestAccess {
   public:
     static void Feedback(KLSyncChart* c) { c->feedback_meter_movement(); }
     static void SetActiveKey(KLSyncChart* c, KLKeyEvent* e) { c->set_active_key(e); }
-    static void SetActiveMark(KLSyncChart* c, KLMarkEvent* m) { c->set_active_mark(m); }
-    static void FullExpose(KLSyncChart* c) { c->expose(nullptr); }
-    static void Keyboard(KLSyncChart* c, unsigned long keysym, const char* text) {
-        char buffer[20] = {0};
-        int count = 0;
-        for (; text && text[count] && count < 19; count++)
-            buffer[count] = text[count];
-        c->handle_keyboard_input(keysym, count, buffer);
+    static void Keyboard(KLSyncChart* c, unsigned long keysym, std::string text) {
+        c->handle_keyboard_input(keysym, int(text.size()), text.data());
     }
 };
 
@@ -112,5 +106,31 @@ inline CueTime Seconds(double seconds) {
 inline std::unique_ptr<CueSound> Sound(std::vector<float> samples, double rate) {
     return CueSound::FromSamples({std::move(samples)}, rate);
 }
+
+// A 600 x 260 chart of `seconds` seconds on its own window, with a key track of keyset
+// "rest AI E O" that the test fills (Key) and shows.
+class ChartTest : public ::testing::Test {
+  protected:
+    explicit ChartTest(double seconds = 10) : seconds_(seconds) {}
+    void SetUp() override {
+        window = std::make_unique<ChartWindow>("syncChart", 600, 260);
+        chart = window->chart;
+        chart->SetUserDuration(Seconds(seconds_));
+        keyset = Keyset("rest AI E O");
+        track = std::make_unique<KLKeyTrack>(keyset.get());
+    }
+    void TearDown() override { window.reset(); }
+    void Key(int shape, double seconds, int smoothing, float value) {
+        track->InsertKey(shape, Seconds(seconds), keyset->GetKeyShape(shape), smoothing, value);
+    }
+
+    std::unique_ptr<ChartWindow> window;
+    KLSyncChart* chart = nullptr;
+    std::unique_ptr<KLKeySet> keyset;
+    std::unique_ptr<KLKeyTrack> track;
+
+  private:
+    double seconds_;
+};
 
 }  // namespace charttest

@@ -1,9 +1,11 @@
-// What the chart paints, read back from its window.
+// What the chart paints, read back from its window; the demo's dialogue, marks and mouth keys
+// are saved as screenshots for people to look at (build/test-screens/chart-demo*.png).
 #include "chart/ChartTestUtil.h"
 
 #include <X11/Xresource.h>
 
 #include <cmath>
+#include <fstream>
 
 #include "chart/KLKeyDrawing.h"
 #include "model/InterpEase.h"
@@ -15,35 +17,28 @@ namespace {
 
 // A 600 x 260 chart showing ten seconds: 60 pixels a second, a grid line every 10 columns,
 // wave band from row 15, lower band from 160 down to the base line at 240.
-class ChartDraw : public testing::Test {
+class ChartDraw : public charttest::ChartTest {
   protected:
-    void SetUp() override {
-        window = std::make_unique<ChartWindow>("syncChart", 600, 260);
-        chart = window->chart;
-        chart->SetUserDuration(Seconds(10));
-        keyset = charttest::Keyset("rest AI E O");
-        track = std::make_unique<KLKeyTrack>(keyset.get());
-    }
-    void TearDown() override { window.reset(); }
-
     unsigned long Pixel(int x, int y) { return window->Pixel(x, y); }
-
-    std::unique_ptr<ChartWindow> window;
-    KLSyncChart* chart = nullptr;
-    std::unique_ptr<KLKeySet> keyset;
-    std::unique_ptr<KLKeyTrack> track;
+    // Pixels of a rectangle that are neither background nor grid (text is antialiased).
+    int Inked(int x, int y, int w, int h) {
+        int count = 0;
+        for (unsigned long p : window->Pixels(x, y, w, h))
+            count += p != chart->background && p != chart->gridColor;
+        return count;
+    }
 };
 
-TEST_F(ChartDraw, BandsFollowTheWindowSize) {
+TEST_F(ChartDraw, SticksLettersAndTheActiveKeyAndMark) {
     EXPECT_EQ(chart->geometry.lowerBandTop, 160);
     EXPECT_EQ(chart->geometry.textBaseline, 240);
     EXPECT_EQ(chart->waveSegments.size(), 600u);
-}
-
-TEST_F(ChartDraw, KeySticksStandAtTheirColumnsInTheKeyColour) {
-    track->InsertKey(1, Seconds(2), keyset->GetKeyShape(1), 1, 1.0f);
-    track->InsertKey(2, Seconds(7), keyset->GetKeyShape(2), 0, 2.0f);
+    Key(1, 2, 1, 1.0f);
+    Key(2, 7, 0, 2.0f);
+    KLMarkTrack marks;
+    marks.InsertMark(Seconds(4), 'W');
     chart->SetKeyTrack(track.get());
+    chart->SetMarkTrack(&marks);
     for (int x : {120, 420}) {
         EXPECT_EQ(Pixel(x, 170), chart->keyColor) << x;
         EXPECT_EQ(Pixel(x - 1, 230), chart->keyColor) << x;  // three pixels wide
@@ -55,36 +50,32 @@ TEST_F(ChartDraw, KeySticksStandAtTheirColumnsInTheKeyColour) {
     EXPECT_EQ(Pixel(120 + 4, chart->geometry.TickRow(1.0f)), chart->keyColor);
     EXPECT_EQ(Pixel(420 + 4, 161), chart->keyColor);
     EXPECT_NE(Pixel(420 + 4, 159), chart->keyColor);
-}
+    EXPECT_GT(Inked(112, 242, 17, 17), 5);  // "A" under the stick, baseline 255
+    EXPECT_GT(Inked(232, 0, 17, 15), 5);    // "W" above the waveform, baseline 12
+    EXPECT_EQ(Inked(200, 242, 17, 17), 0);
 
-TEST_F(ChartDraw, RegionIncludesItsLastColumn) {
-    // 1.25 seconds is fraction 0.125, column 75 exactly (grid lines are every 10 columns).
-    chart->SetRegionRange(Seconds(0.5), Seconds(1.25));
-    EXPECT_EQ(Pixel(75, 5), chart->regionColor);
-    EXPECT_EQ(Pixel(76, 5), chart->background);
-    EXPECT_EQ(Pixel(31, 5), chart->regionColor);
-    EXPECT_EQ(Pixel(29, 5), chart->background);
-    EXPECT_EQ(Pixel(50, 5), chart->gridColor);  // the grid shows through the region
-    // Start after end selects nothing.
-    chart->SetRegionRange(Seconds(1.25), Seconds(0.5));
-    EXPECT_EQ(Pixel(45, 5), chart->background);
-}
-
-TEST_F(ChartDraw, HeldShapeIsFlatAtTheBaseLine) {
-    track->InsertKey(1, Seconds(6), keyset->GetKeyShape(1), 1, 0.5f);
-    track->InsertKey(1, Seconds(8), keyset->GetKeyShape(1), 2, 2.0f);
-    chart->SetKeyTrack(track.get());
-    for (int x : {375, 420, 465}) {
-        EXPECT_EQ(Pixel(x, 240), chart->linearColor) << x;
-        EXPECT_NE(Pixel(x, 239), chart->linearColor) << x;
-    }
+    chart->SetIndicatorTime(Seconds(2) + CueTime::FromFrames(1));  // 2 pixels right of the key
+    chart->UpdateDisplay();
+    ASSERT_NE(chart->activeKey, nullptr);
+    EXPECT_EQ(Pixel(120, 170), chart->keyActiveColor);
+    EXPECT_EQ(chart->activeMark, nullptr);
+    // Moving on to the mark: the key's highlight goes, the mark's letter sits on the colour.
+    chart->SetIndicatorTime(Seconds(4));
+    chart->UpdateDisplay();
+    EXPECT_EQ(chart->activeKey, nullptr);
+    EXPECT_EQ(Pixel(120, 170), chart->keyColor);
+    ASSERT_NE(chart->activeMark, nullptr);
+    int highlighted = 0;
+    for (unsigned long p : window->Pixels(232, 0, 16, 14))
+        highlighted += p == chart->keyActiveColor;
+    EXPECT_GT(highlighted, 20);
 }
 
 TEST_F(ChartDraw, EaseAndSmoothCurvesRunThroughTheEaseFunction) {
-    track->InsertKey(0, Seconds(0), keyset->GetKeyShape(0), 1, 1.0f);
-    track->InsertKey(1, Seconds(4), keyset->GetKeyShape(1), 1, 2.0f);  // Ease, 0 .. 240
-    track->InsertKey(2, Seconds(8), keyset->GetKeyShape(2), 2, 1.0f);  // Smooth, 240 .. 480
-    track->InsertKey(3, Seconds(9), keyset->GetKeyShape(3), 0, 2.0f);  // Linear, 480 .. 540
+    Key(0, 0, 1, 1.0f);
+    Key(1, 4, 1, 2.0f);  // Ease, 0 .. 240
+    Key(2, 8, 2, 1.0f);  // Smooth, 240 .. 480
+    Key(3, 9, 0, 2.0f);  // Linear, 480 .. 540
     chart->SetKeyTrack(track.get());
     const float base = 240, top2 = 160, top1 = 200;
     for (int i : {33, 77, 121, 163, 207}) {
@@ -94,27 +85,68 @@ TEST_F(ChartDraw, EaseAndSmoothCurvesRunThroughTheEaseFunction) {
         EXPECT_EQ(Pixel(240 + i, ys), chart->smoothColor) << i;
     }
     EXPECT_EQ(Pixel(510, 200), chart->linearColor);  // halfway up the straight line
+    // Shrinking and growing the window repaints at the new size.
+    for (int width : {500, 700}) {
+        XtVaSetValues(window->shell, XmNwidth, width, nullptr);
+        ASSERT_TRUE(guitest::WaitFor(
+            [&] { return chart->geometry.width == unsigned(width) && !chart->needRedraw; }));
+        EXPECT_EQ(chart->waveSegments.size(), size_t(width));
+        EXPECT_EQ(Pixel(width * 4 / 10, 170), chart->keyColor) << width;  // the key at 4 s
+    }
 }
 
-TEST_F(ChartDraw, LettersOfKeysAndMarksAreDrawn) {
-    track->InsertKey(1, Seconds(2), keyset->GetKeyShape(1), 1, 1.0f);
-    KLMarkTrack marks;
-    marks.InsertMark(Seconds(5), 'W');
-    chart->SetKeyTrack(track.get());
-    chart->SetMarkTrack(&marks);
-    // Text is antialiased: count the pixels that are neither background nor grid.
-    auto inked = [this](int x, int y, int w, int h) {
-        int count = 0;
-        for (unsigned long p : window->Pixels(x, y, w, h))
-            count += p != chart->background && p != chart->gridColor;
-        return count;
-    };
-    EXPECT_GT(inked(112, 242, 17, 17), 5);  // "A" under the stick, baseline 255
-    EXPECT_GT(inked(292, 0, 17, 15), 5);    // "W" above the waveform, baseline 12
-    EXPECT_EQ(inked(200, 242, 17, 17), 0);
-}
+TEST_F(ChartDraw, RegionIndicatorZoomAndWaveform) {
+    // 1.25 seconds is fraction 0.125, column 75 exactly (grid lines are every 10 columns).
+    chart->SetRegionRange(Seconds(0.5), Seconds(1.25));
+    EXPECT_EQ(Pixel(75, 5), chart->regionColor);
+    EXPECT_EQ(Pixel(76, 5), chart->background);
+    EXPECT_EQ(Pixel(31, 5), chart->regionColor);
+    EXPECT_EQ(Pixel(29, 5), chart->background);
+    EXPECT_EQ(Pixel(50, 5), chart->gridColor);           // the grid shows through the region
+    chart->SetRegionRange(Seconds(1.25), Seconds(0.5));  // start after end selects nothing
+    EXPECT_EQ(Pixel(45, 5), chart->background);
 
-TEST_F(ChartDraw, AllZeroSoundDrawsNoWaveform) {
+    chart->SetIndicatorTime(Seconds(2.5));
+    EXPECT_EQ(chart->geometry.indicatorX, 150);
+    EXPECT_EQ(Pixel(150, 0), chart->foreground);
+    EXPECT_EQ(Pixel(150, 259), chart->foreground);
+    // A time outside the visible part changes nothing.
+    chart->SetZoomPan(0.0f, 0.5f);
+    EXPECT_EQ(chart->geometry.indicatorX, 300);
+    chart->SetIndicatorTime(Seconds(7));
+    EXPECT_EQ(chart->geometry.indicatorX, 300);
+    // The visible part's end maps to column 600: the old line goes, the column stays.
+    chart->SetIndicatorPos(0.5f);
+    EXPECT_EQ(chart->geometry.indicatorX, 300);
+    EXPECT_NE(Pixel(300, 5), chart->foreground);
+    chart->SetZoomPan(0.6f, 1.0f);  // zooming away from it hides it
+    EXPECT_EQ(chart->geometry.indicatorX, -1);
+
+    chart->ZoomReset();
+    Widget in = KLXmGnome::FindWidget("syncChartZoomIn", window->shell);
+    Widget out = KLXmGnome::FindWidget("syncChartZoomOut", window->shell);
+    ASSERT_TRUE(in && out && chart->panScroll);
+    guitest::Click(in);
+    ASSERT_TRUE(guitest::WaitFor([this] { return chart->geometry.zoomEnd == 0.75f; }));
+    EXPECT_FLOAT_EQ(chart->geometry.zoomStart, 0.25f);
+    int value = 0, slider = 0;
+    XtVaGetValues(chart->panScroll, XmNvalue, &value, XmNsliderSize, &slider, nullptr);
+    EXPECT_EQ(std::make_pair(value, slider), std::make_pair(2500, 5000));
+    // Dragging the slider pans.
+    Dimension w = 0;
+    XtVaGetValues(chart->panScroll, XmNwidth, &w, nullptr);
+    guitest::MoveTo(chart->panScroll, w / 2, -1);
+    guitest::Press(1);
+    guitest::MoveTo(chart->panScroll, w / 2 + w / 8, -1);
+    guitest::Release(1);
+    ASSERT_TRUE(guitest::WaitFor([this] { return chart->geometry.zoomStart > 0.3f; }));
+    EXPECT_NEAR(chart->geometry.zoomEnd - chart->geometry.zoomStart, 0.5f, 0.01f);
+    guitest::Click(out);
+    guitest::Click(out);
+    ASSERT_TRUE(guitest::WaitFor(
+        [this] { return chart->geometry.zoomStart == 0.0f && chart->geometry.zoomEnd == 1.0f; }));
+
+    // The waveform of silence, of a loud sound and of none.
     auto silent = charttest::Sound(std::vector<float>(48000, 0.0f), 48000);
     chart->SetSound(silent.get());
     EXPECT_EQ(chart->peak, 0.0f);
@@ -134,86 +166,6 @@ TEST_F(ChartDraw, AllZeroSoundDrawsNoWaveform) {
     chart->SetSound(nullptr);
     EXPECT_EQ(chart->geometry.duration, before);
     EXPECT_EQ(Pixel(25, 20), chart->background);
-}
-
-TEST_F(ChartDraw, IndicatorIsALineInTheForeground) {
-    chart->SetIndicatorTime(Seconds(2.5));
-    EXPECT_EQ(chart->geometry.indicatorX, 150);
-    EXPECT_EQ(Pixel(150, 0), chart->foreground);
-    EXPECT_EQ(Pixel(150, 259), chart->foreground);
-    // A time outside the visible part changes nothing.
-    chart->SetZoomPan(0.0f, 0.5f);
-    EXPECT_EQ(chart->geometry.indicatorX, 300);
-    chart->SetIndicatorTime(Seconds(7));
-    EXPECT_EQ(chart->geometry.indicatorX, 300);
-    // The visible part's end maps to column 600: the old line goes, the column stays.
-    chart->SetIndicatorPos(0.5f);
-    EXPECT_EQ(chart->geometry.indicatorX, 300);
-    EXPECT_NE(Pixel(300, 5), chart->foreground);
-    // Zooming away from it hides it.
-    chart->SetZoomPan(0.6f, 1.0f);
-    EXPECT_EQ(chart->geometry.indicatorX, -1);
-}
-
-TEST_F(ChartDraw, ZoomButtonsAndPanBarMoveTheVisiblePart) {
-    Widget in = KLXmGnome::FindWidget("syncChartZoomIn", window->shell);
-    Widget out = KLXmGnome::FindWidget("syncChartZoomOut", window->shell);
-    ASSERT_TRUE(in && out && chart->panScroll);
-    guitest::Click(in);
-    ASSERT_TRUE(guitest::WaitFor([this] { return chart->geometry.zoomEnd == 0.75f; }));
-    EXPECT_FLOAT_EQ(chart->geometry.zoomStart, 0.25f);
-    int value = 0, slider = 0;
-    XtVaGetValues(chart->panScroll, XmNvalue, &value, XmNsliderSize, &slider, nullptr);
-    EXPECT_EQ(value, 2500);
-    EXPECT_EQ(slider, 5000);
-    // Dragging the slider pans.
-    Dimension w = 0;
-    XtVaGetValues(chart->panScroll, XmNwidth, &w, nullptr);
-    guitest::MoveTo(chart->panScroll, w / 2, -1);
-    guitest::Press(1);
-    guitest::MoveTo(chart->panScroll, w / 2 + w / 8, -1);
-    guitest::Release(1);
-    ASSERT_TRUE(guitest::WaitFor([this] { return chart->geometry.zoomStart > 0.3f; }));
-    EXPECT_NEAR(chart->geometry.zoomEnd - chart->geometry.zoomStart, 0.5f, 0.01f);
-    guitest::Click(out);
-    guitest::Click(out);
-    ASSERT_TRUE(guitest::WaitFor(
-        [this] { return chart->geometry.zoomStart == 0.0f && chart->geometry.zoomEnd == 1.0f; }));
-}
-
-TEST_F(ChartDraw, ActiveKeyAndMarkAreHighlightedAtTheIndicator) {
-    track->InsertKey(1, Seconds(2), keyset->GetKeyShape(1), 1, 1.0f);
-    KLMarkTrack marks;
-    marks.InsertMark(Seconds(4), 'M');
-    chart->SetKeyTrack(track.get());
-    chart->SetMarkTrack(&marks);
-    chart->SetIndicatorTime(Seconds(2) + CueTime::FromFrames(1));  // 2 pixels right of the key
-    chart->UpdateDisplay();
-    ASSERT_NE(chart->activeKey, nullptr);
-    EXPECT_EQ(Pixel(120, 170), chart->keyActiveColor);
-    EXPECT_EQ(chart->activeMark, nullptr);
-    // Moving on to the mark: the key's highlight goes, the mark's letter sits on the colour.
-    chart->SetIndicatorTime(Seconds(4));
-    chart->UpdateDisplay();
-    EXPECT_EQ(chart->activeKey, nullptr);
-    EXPECT_EQ(Pixel(120, 170), chart->keyColor);
-    ASSERT_NE(chart->activeMark, nullptr);
-    int highlighted = 0;
-    for (unsigned long p : window->Pixels(232, 0, 16, 14))
-        highlighted += p == chart->keyActiveColor;
-    EXPECT_GT(highlighted, 20);
-}
-
-TEST_F(ChartDraw, ShrinkingAndGrowingRepaintAtTheNewSize) {
-    track->InsertKey(1, Seconds(5), keyset->GetKeyShape(1), 1, 1.0f);
-    chart->SetKeyTrack(track.get());
-    for (int width : {500, 700}) {
-        XtVaSetValues(window->shell, XmNwidth, width, nullptr);
-        ASSERT_TRUE(guitest::WaitFor(
-            [&] { return chart->geometry.width == unsigned(width) && !chart->needRedraw; }));
-        EXPECT_EQ(chart->waveSegments.size(), size_t(width));
-        EXPECT_EQ(Pixel(width / 2, 170), chart->keyColor) << width;
-    }
 }
 
 // The sticks and ticks are filled as rectangles: they must cover exactly the pixels of the
@@ -285,6 +237,60 @@ TEST(ChartSmall, TinyChartsAndFarKeysDrawWithoutTrouble) {
     window.chart->ZoomReset();
     guitest::Settle();
     EXPECT_EQ(window.chart->geometry.textBaseline, -19);
+}
+
+// Positions `in` just after the line that starts with `header`; false when there is none.
+bool seek_block(std::istream& in, const std::string& header) {
+    std::string line;
+    while (std::getline(in, line))
+        if (line.compare(0, header.size(), header) == 0)
+            return true;
+    return false;
+}
+
+TEST(ChartDemo, DialogueMarksAndMouthKeys) {
+    const std::string demo = std::string(CHIRRUP_SOURCE_DIR) + "/resources/demo/";
+    auto keyset = std::make_unique<KLKeySet>("mouth", "face.glb");
+    std::ifstream kset(demo + "demo.kset"), in(demo + "demo.track");
+    ASSERT_TRUE(seek_block(kset, "begin keyset mouth"));
+    keyset->Read(kset);
+    KLKeyTrack track(keyset.get());
+    KLMarkTrack marks;
+    ASSERT_TRUE(seek_block(in, "begin marktrack"));
+    marks.Read(in);
+    ASSERT_TRUE(seek_block(in, "begin keytrack\tmouth"));
+    track.Read(in, keyset.get());
+    ASSERT_EQ(std::make_tuple(keyset->keyShapeCount, marks.marks.Count(), track.events.Count()),
+              std::make_tuple(11, 9, 29));
+    CueSound sound((demo + "dialogue.aiff").c_str());
+    ASSERT_TRUE(sound.Valid()) << sound.ErrorText();
+
+    ChartWindow window("syncChart", 1200, 300);
+    KLSyncChart* chart = window.chart;
+    chart->SetUserDuration(CueTime::FromSeconds(1));
+    chart->SetSound(&sound);
+    chart->SetKeyTrack(&track);
+    chart->SetMarkTrack(&marks);
+    chart->SetIndicatorTime(CueTime::FromFrames(40));
+    chart->UpdateDisplay();
+    // The waveform, the key sticks and the grid are all on screen.
+    int wave = 0, keys = 0, grid = 0;
+    for (unsigned long p :
+         window.Pixels(0, 0, int(chart->geometry.width), int(chart->geometry.height))) {
+        wave += p == chart->soundColor;
+        keys += p == chart->keyColor;
+        grid += p == chart->gridColor;
+    }
+    EXPECT_GT(wave, 5000);
+    EXPECT_GT(keys, 29 * 3 * 40);
+    EXPECT_GT(grid, 1000);
+    guitest::Screenshot("chart-demo");
+    // Zoomed in on the first two seconds, with a region swept over the "w" mark.
+    chart->SetZoomRange(CueTime(), CueTime::FromSeconds(2));
+    chart->SetRegionRange(CueTime::FromFrames(35), CueTime::FromFrames(45));
+    chart->UpdateDisplay();
+    guitest::Settle();
+    guitest::Screenshot("chart-demo-zoomed");
 }
 
 }  // namespace

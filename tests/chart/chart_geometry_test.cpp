@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <tuple>
 
 #include "chart/KLChartGeometry.h"
 
@@ -14,83 +15,59 @@ KLChartGeometry chart(uint32_t width, uint32_t height = 200, double seconds = 10
     return g;
 }
 
+// Zooming out doubles the visible part clamping each end separately; an asked-for span is
+// clamped and ordered. Both clear the region.
 struct ZoomCase {
     const char* name;
-    float start, end;  // visible part before
+    bool zoomOut;      // ZoomOut from (start, end), else SetZoomPan(start, end)
+    float start, end;  // visible part before, or the span asked for
     float wantStart, wantEnd;
 };
 
-class ZoomOut : public testing::TestWithParam<ZoomCase> {};
+class ZoomSpan : public testing::TestWithParam<ZoomCase> {};
 
-TEST_P(ZoomOut, ClampsEachEndSeparately) {
+TEST_P(ZoomSpan, ClampsEachEndAndClearsTheRegion) {
+    const ZoomCase& c = GetParam();
     auto g = chart(400);
-    g.zoomStart = GetParam().start;
-    g.zoomEnd = GetParam().end;
     g.regionStart = 0.2f;
     g.regionEnd = 0.25f;
-    g.ZoomOut();
-    EXPECT_FLOAT_EQ(g.zoomStart, GetParam().wantStart);
-    EXPECT_FLOAT_EQ(g.zoomEnd, GetParam().wantEnd);
+    if (c.zoomOut) {
+        g.zoomStart = c.start, g.zoomEnd = c.end;
+        g.ZoomOut();
+    } else {
+        g.SetZoomPan(c.start, c.end);
+    }
+    EXPECT_FLOAT_EQ(g.zoomStart, c.wantStart);
+    EXPECT_FLOAT_EQ(g.zoomEnd, c.wantEnd);
     EXPECT_FALSE(g.RegionSelected());
 }
 
-INSTANTIATE_TEST_SUITE_P(Spans, ZoomOut,
-                         testing::Values(ZoomCase{"LeftEdge", 0.1f, 0.3f, 0.0f, 0.4f},
-                                         ZoomCase{"FromStart", 0.0f, 0.5f, 0.0f, 0.75f},
-                                         ZoomCase{"Middle", 0.4f, 0.6f, 0.3f, 0.7f},
-                                         ZoomCase{"RightEdge", 0.8f, 0.9f, 0.75f, 0.95f},
-                                         ZoomCase{"Everything", 0.0f, 1.0f, 0.0f, 1.0f}),
+INSTANTIATE_TEST_SUITE_P(Spans, ZoomSpan,
+                         testing::Values(ZoomCase{"OutLeftEdge", true, 0.1f, 0.3f, 0.0f, 0.4f},
+                                         ZoomCase{"OutFromStart", true, 0.0f, 0.5f, 0.0f, 0.75f},
+                                         ZoomCase{"OutMiddle", true, 0.4f, 0.6f, 0.3f, 0.7f},
+                                         ZoomCase{"OutRightEdge", true, 0.8f, 0.9f, 0.75f, 0.95f},
+                                         ZoomCase{"OutEverything", true, 0.0f, 1.0f, 0.0f, 1.0f},
+                                         ZoomCase{"PanBeyondBothEnds", false, -0.5f, 2, 0, 1},
+                                         ZoomCase{"PanReversed", false, 0.6f, 0.4f, 0.6f, 0.6f},
+                                         ZoomCase{"PanInside", false, 0.25f, 0.5f, 0.25f, 0.5f},
+                                         ZoomCase{"PanNotANumber", false, NAN, NAN, 0.0f, 1.0f}),
                          [](const auto& info) { return std::string(info.param.name); });
 
-class SetZoomPan : public testing::TestWithParam<ZoomCase> {};
-
-TEST_P(SetZoomPan, ClampsAndOrders) {
-    auto g = chart(400);
-    g.regionStart = 0.1f;
-    g.regionEnd = 0.2f;
-    g.SetZoomPan(GetParam().start, GetParam().end);
-    EXPECT_FLOAT_EQ(g.zoomStart, GetParam().wantStart);
-    EXPECT_FLOAT_EQ(g.zoomEnd, GetParam().wantEnd);
-    EXPECT_FALSE(g.RegionSelected());
-}
-
-INSTANTIATE_TEST_SUITE_P(Asked, SetZoomPan,
-                         testing::Values(ZoomCase{"BeyondBothEnds", -0.5f, 2.0f, 0.0f, 1.0f},
-                                         ZoomCase{"Reversed", 0.6f, 0.4f, 0.6f, 0.6f},
-                                         ZoomCase{"Inside", 0.25f, 0.5f, 0.25f, 0.5f},
-                                         ZoomCase{"NotANumber", NAN, NAN, 0.0f, 1.0f}),
-                         [](const auto& info) { return std::string(info.param.name); });
-
-TEST(ChartZoom, InOnRegionTakesItThenHalvesAboutTheCentre) {
+// Zooming in takes the region, then halves about the centre; the indicator keeps its
+// fraction or hides; a hundred zooms stay ordered and map finitely.
+TEST(ChartZoom, InOnRegionThenAboutTheCentreKeepingTheIndicator) {
     auto g = chart(400);
     g.regionStart = 0.2f;
     g.regionEnd = 0.6f;
     g.ZoomIn();
-    EXPECT_FLOAT_EQ(g.zoomStart, 0.2f);
-    EXPECT_FLOAT_EQ(g.zoomEnd, 0.6f);
+    EXPECT_EQ(std::make_pair(g.zoomStart, g.zoomEnd), std::make_pair(0.2f, 0.6f));
     EXPECT_FALSE(g.RegionSelected());
     g.ZoomIn();
     EXPECT_FLOAT_EQ(g.zoomStart, 0.3f);
     EXPECT_FLOAT_EQ(g.zoomEnd, 0.5f);
-}
 
-TEST(ChartZoom, AHundredZoomsInStayOrderedAndMapFinitely) {
-    auto g = chart(1600);
-    g.indicatorX = 800;
-    for (int i = 0; i < 100; i++)
-        g.ZoomIn();
-    EXPECT_LE(g.zoomStart, g.zoomEnd);
-    // Far outside columns saturate rather than overflow.
-    const int far = g.ColumnFromFraction(1.0);
-    EXPECT_GT(far, 0);
-    EXPECT_EQ(g.ColumnFromFraction(g.zoomStart), 0);
     g.ZoomReset();
-    EXPECT_FLOAT_EQ(g.zoomStart, 0.0f);
-    EXPECT_FLOAT_EQ(g.zoomEnd, 1.0f);
-}
-
-TEST(ChartIndicator, KeepsItsFractionOrHidesAcrossZooms) {
-    auto g = chart(400);
     g.indicatorX = 100;  // fraction 0.25
     g.SetZoomPan(0.0f, 0.5f);
     EXPECT_EQ(g.indicatorX, 200);
@@ -98,40 +75,41 @@ TEST(ChartIndicator, KeepsItsFractionOrHidesAcrossZooms) {
     EXPECT_EQ(g.indicatorX, -1);
     // Hidden, it reports the point one pixel left of the visible part.
     EXPECT_NEAR(g.IndicatorFraction(), 0.5 - 0.5 / 400, 1e-9);
+
+    g = chart(1600);
+    g.indicatorX = 800;
+    for (int i = 0; i < 100; i++)
+        g.ZoomIn();
+    EXPECT_LE(g.zoomStart, g.zoomEnd);
+    EXPECT_GT(g.ColumnFromFraction(1.0), 0) << "far outside columns saturate, never overflow";
+    EXPECT_EQ(g.ColumnFromFraction(g.zoomStart), 0);
 }
 
-TEST(ChartMapping, ZeroWidthMapsEveryColumnToZero) {
-    auto g = chart(0);
-    g.zoomStart = 0.3f;
-    g.zoomEnd = 0.6f;
-    EXPECT_EQ(g.FractionFromColumn(0), 0.0);
-    EXPECT_EQ(g.FractionFromColumn(17), 0.0);
-    EXPECT_EQ(g.IndicatorFraction(), 0.0);
-    EXPECT_EQ(g.ColumnFromFraction(0.5), 0);
-    EXPECT_FALSE(g.ValidColumn(0));
-    EXPECT_TRUE(g.GridColumns().empty());
-}
-
-TEST(ChartMapping, TimesFractionsAndColumnsAgree) {
+TEST(ChartMapping, TimesFractionsColumnsAndSamplesAgree) {
     auto g = chart(300, 200, 10.0);  // 300 frames over 300 columns
     EXPECT_DOUBLE_EQ(g.FractionFromTime(CueTime::FromSeconds(2.5)), 0.25);
     EXPECT_EQ(g.ColumnFromTime(CueTime::FromSeconds(2.5)), 75);
     EXPECT_EQ(g.TimeFromColumn(75), CueTime::FromSeconds(2.5));
     EXPECT_EQ(g.ColumnFromFraction(1.0), 300);  // zoomEnd: just outside
     EXPECT_FALSE(g.ValidColumn(300));
+    // A 5-second sound of 1000 samples on the 10-second chart; the last sample from its end.
+    const CueTime half = CueTime::FromSeconds(5.0);
+    using Index = std::tuple<double, long, CueTime, long>;
+    for (auto [f, count, length, want] :
+         {Index{0.0, 1000, half, 0}, Index{0.25, 1000, half, 500}, Index{0.5, 1000, half, 999},
+          Index{0.9, 1000, half, 999}, Index{0.25, 0, half, 0}, Index{0.25, 1000, CueTime(), 0}})
+        EXPECT_EQ(g.IndexFromPos(f, count, length), want) << f << " " << count;
     g.duration = CueTime();
     EXPECT_EQ(g.FractionFromTime(CueTime::FromSeconds(3)), 0.0);
-}
 
-TEST(ChartMapping, SampleIndexFollowsTheSoundsShareOfTheChart) {
-    auto g = chart(100, 200, 10.0);
-    const CueTime half = CueTime::FromSeconds(5.0);  // a 5-second sound of 1000 samples
-    EXPECT_EQ(g.IndexFromPos(0.0, 1000, half), 0);
-    EXPECT_EQ(g.IndexFromPos(0.25, 1000, half), 500);
-    EXPECT_EQ(g.IndexFromPos(0.5, 1000, half), 999);
-    EXPECT_EQ(g.IndexFromPos(0.9, 1000, half), 999);
-    EXPECT_EQ(g.IndexFromPos(0.25, 0, half), 0);
-    EXPECT_EQ(g.IndexFromPos(0.25, 1000, CueTime()), 0);
+    g = chart(0);  // zero width maps every column to 0
+    g.zoomStart = 0.3f;
+    g.zoomEnd = 0.6f;
+    EXPECT_EQ(g.FractionFromColumn(17), 0.0);
+    EXPECT_EQ(g.IndicatorFraction(), 0.0);
+    EXPECT_EQ(g.ColumnFromFraction(0.5), 0);
+    EXPECT_FALSE(g.ValidColumn(0));
+    EXPECT_TRUE(g.GridColumns().empty());
 }
 
 TEST(ChartDuration, IsTheLargestOfWhatIsShownAndAtLeastASecond) {
@@ -148,34 +126,18 @@ TEST(ChartDuration, IsTheLargestOfWhatIsShownAndAtLeastASecond) {
     EXPECT_EQ(g.duration, CueTime::FromTicks(INT32_MAX));
 }
 
-struct GridCase {
-    uint32_t width;
-    double frames;  // chart duration in frames
-    float start, end;
-    double step;
-};
-
-class GridStep : public testing::TestWithParam<GridCase> {};
-
-TEST_P(GridStep, IsTheFirstOfOneTwoFiveThatFits) {
-    const auto& c = GetParam();
-    KLChartGeometry g;
-    g.SetSize(c.width, 200);
-    g.duration = CueTime::FromFrames(c.frames);
-    g.zoomStart = c.start;
-    g.zoomEnd = c.end;
-    EXPECT_DOUBLE_EQ(g.GridStepFrames(), c.step);
-}
-
-INSTANTIATE_TEST_SUITE_P(Charts, GridStep,
-                         testing::Values(GridCase{500, 1000, 0, 1, 20},
-                                         GridCase{500, 500, 0, 1, 10}, GridCase{500, 501, 0, 1, 20},
-                                         GridCase{1600, 30, 0, 1, 1},
-                                         GridCase{1600, 108000, 0, 1, 1000},
-                                         GridCase{100, 1000, 0.5, 0.75, 50},
-                                         GridCase{9, 30, 0, 1, 1e12}));
-
-TEST(ChartGrid, LinesLieStrictlyInsideTheVisiblePart) {
+// The grid step is the first of 1, 2, 5, 10, 20, 50, ... frames that fits; its lines lie
+// strictly inside the visible part.
+TEST(ChartGrid, StepAndLines) {
+    using Grid = std::tuple<uint32_t, double, float, float, double>;  // width, frames, zoom, step
+    for (auto [width, frames, start, end, step] :
+         {Grid{500, 1000, 0, 1, 20}, Grid{500, 500, 0, 1, 10}, Grid{500, 501, 0, 1, 20},
+          Grid{1600, 30, 0, 1, 1}, Grid{1600, 108000, 0, 1, 1000}, Grid{100, 1000, 0.5, 0.75, 50},
+          Grid{9, 30, 0, 1, 1e12}}) {
+        auto g = chart(width, 200, frames / 30);
+        g.zoomStart = start, g.zoomEnd = end;
+        EXPECT_DOUBLE_EQ(g.GridStepFrames(), step) << width << " " << frames;
+    }
     auto g = chart(500, 200, 1000.0 / 30);  // 1000 frames: step 20, lines every 10 columns
     auto columns = g.GridColumns();
     ASSERT_EQ(columns.size(), 49u);
@@ -191,64 +153,43 @@ TEST(ChartGrid, LinesLieStrictlyInsideTheVisiblePart) {
     EXPECT_LT(columns.back(), 500);
 }
 
-TEST(ChartBands, FollowTheHeight) {
-    auto g = chart(400, 300);
-    EXPECT_EQ(g.waveHeight, 185);
-    EXPECT_EQ(g.lowerBandTop, 200);
-    EXPECT_EQ(g.textBaseline, 280);
-    EXPECT_FALSE(g.SetSize(400, 300));
-    EXPECT_TRUE(g.SetSize(400, 1));  // a 1-pixel chart: negative bands, no trouble
-    EXPECT_EQ(g.textBaseline, -19);
-    EXPECT_EQ(g.ValueFromRow(0), 0.0f);
-}
-
-TEST(ChartBands, StickTicksAndValuesFromRows) {
+TEST(ChartBands, FollowTheHeightAndMapValuesToRows) {
     auto g = chart(400, 300);  // lower band 200 .. base 280
-    EXPECT_EQ(g.TickRow(0.0f), 280);
-    EXPECT_EQ(g.TickRow(2.0f), 201);  // the tick's extra pixel
-    EXPECT_EQ(g.TickRow(5.0f), 201);
-    EXPECT_EQ(g.TickRow(1.0f), 240);
+    EXPECT_EQ(std::make_tuple(g.waveHeight, g.lowerBandTop, g.textBaseline),
+              std::make_tuple(185, 200, 280));
+    using Tick = std::pair<float, int>;  // the tick's extra pixel at the top
+    for (auto [value, row] : {Tick{0.0f, 280}, Tick{1.0f, 240}, Tick{2.0f, 201}, Tick{5.0f, 201}})
+        EXPECT_EQ(g.TickRow(value), row) << value;
     EXPECT_DOUBLE_EQ(g.ValueRow(1.0f), 240.0);
     EXPECT_DOUBLE_EQ(g.ValueRow(-3.0f), 280.0);
     EXPECT_FLOAT_EQ(g.ValueFromRow(240), 1.0f);
     EXPECT_FLOAT_EQ(g.ValueFromRow(150), 2.0f);
     EXPECT_FLOAT_EQ(g.ValueFromRow(400), 0.0f);
-}
-
-TEST(ChartHits, FourPixelsHitFiveDoNot) {
-    EXPECT_TRUE(KLChartGeometry::Hits(100, 104));
-    EXPECT_TRUE(KLChartGeometry::Hits(100, 96));
-    EXPECT_FALSE(KLChartGeometry::Hits(100, 105));
-    EXPECT_FALSE(KLChartGeometry::Hits(100, 95));
-    EXPECT_FALSE(KLChartGeometry::Hits(-100, 0));
+    EXPECT_FALSE(g.SetSize(400, 300));
+    EXPECT_TRUE(g.SetSize(400, 1));  // a 1-pixel chart: negative bands, no trouble
+    EXPECT_EQ(g.textBaseline, -19);
+    EXPECT_EQ(g.ValueFromRow(0), 0.0f);
+    EXPECT_FALSE(KLChartGeometry::Hits(-100, 0) || KLChartGeometry::Hits(INT32_MIN, INT32_MAX));
 }
 
 TEST(ChartReveal, RegionColumnsIncludeItsLastColumn) {
+    auto spans = [](const KLChartGeometry& g, int x, int w) {
+        std::vector<std::tuple<int, int, bool>> out;
+        for (const auto& s : g.RevealSpans(x, w))
+            out.emplace_back(s.first, s.last, s.inRegion);
+        return out;
+    };
+    using Spans = std::vector<std::tuple<int, int, bool>>;
     auto g = chart(100);
-    EXPECT_EQ(g.RevealSpans(0, 100).size(), 1u);
-    EXPECT_TRUE(g.RevealSpans(0, 0).empty());
+    EXPECT_EQ(spans(g, 0, 100), (Spans{{0, 99, false}}));
+    EXPECT_TRUE(spans(g, 0, 0).empty());
     g.regionStart = 0.2f;
     g.regionEnd = 0.5f;  // columns 20 .. 50
-    auto spans = g.RevealSpans(0, 100);
-    ASSERT_EQ(spans.size(), 3u);
-    EXPECT_EQ(spans[0].first, 0);
-    EXPECT_EQ(spans[0].last, 19);
-    EXPECT_FALSE(spans[0].inRegion);
-    EXPECT_EQ(spans[1].first, 20);
-    EXPECT_EQ(spans[1].last, 50);
-    EXPECT_TRUE(spans[1].inRegion);
-    EXPECT_EQ(spans[2].first, 51);
-    EXPECT_EQ(spans[2].last, 99);
-    // A one-column reveal inside the region comes from the region image only.
-    spans = g.RevealSpans(50, 1);
-    ASSERT_EQ(spans.size(), 1u);
-    EXPECT_TRUE(spans[0].inRegion);
-    // Start after end: no region at all.
+    EXPECT_EQ(spans(g, 0, 100), (Spans{{0, 19, false}, {20, 50, true}, {51, 99, false}}));
+    EXPECT_EQ(spans(g, 50, 1), (Spans{{50, 50, true}})) << "from the region image only";
     g.regionStart = 0.5f;
-    g.regionEnd = 0.2f;
-    spans = g.RevealSpans(0, 100);
-    ASSERT_EQ(spans.size(), 1u);
-    EXPECT_FALSE(spans[0].inRegion);
+    g.regionEnd = 0.2f;  // start after end: no region at all
+    EXPECT_EQ(spans(g, 0, 100), (Spans{{0, 99, false}}));
 }
 
 TEST(ChartScroll, ValuesAndPanRoundTrip) {
@@ -257,18 +198,15 @@ TEST(ChartScroll, ValuesAndPanRoundTrip) {
     g.zoomEnd = 0.5f;
     int value = 0, slider = 0;
     g.ScrollValues(0, 10000, &value, &slider);
-    EXPECT_EQ(value, 2500);
-    EXPECT_EQ(slider, 2500);
+    EXPECT_EQ(std::make_pair(value, slider), std::make_pair(2500, 2500));
     g.ScrollValues(100, 200, &value, &slider);
-    EXPECT_EQ(value, 125);
-    EXPECT_EQ(slider, 25);
+    EXPECT_EQ(std::make_pair(value, slider), std::make_pair(125, 25));
     float start, end;
     KLChartGeometry::PanFromScroll(5000, 2500, 0, 10000, &start, &end);
     EXPECT_FLOAT_EQ(start, 0.5f);
     EXPECT_FLOAT_EQ(end, 0.75f);
-    // The minimum is not subtracted from the value.
     KLChartGeometry::PanFromScroll(150, 25, 100, 200, &start, &end);
-    EXPECT_FLOAT_EQ(start, 1.5f);
+    EXPECT_FLOAT_EQ(start, 1.5f) << "the minimum is not subtracted from the value";
 }
 
 }  // namespace

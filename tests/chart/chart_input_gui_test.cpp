@@ -3,30 +3,24 @@
 
 #include <X11/keysym.h>
 
-using charttest::ChartWindow;
 using charttest::Seconds;
 
 namespace {
 
 // A 600 x 260 chart of ten seconds (60 pixels a second) with a key track and a mark track:
 // keys at 2 s (column 120) and 5 s (column 300), marks at 1 s (column 60) and 3 s (180).
-class ChartInput : public testing::Test {
+class ChartInput : public charttest::ChartTest {
   protected:
     void SetUp() override {
-        window = std::make_unique<ChartWindow>("syncChart", 600, 260);
-        chart = window->chart;
+        ChartTest::SetUp();
         area = chart->drawingArea;
-        chart->SetUserDuration(Seconds(10));
-        keyset = charttest::Keyset("rest AI E O");
-        track = std::make_unique<KLKeyTrack>(keyset.get());
-        track->InsertKey(1, Seconds(2), keyset->GetKeyShape(1), 1, 1.0f);
-        track->InsertKey(2, Seconds(5), keyset->GetKeyShape(2), 0, 1.0f);
+        Key(1, 2, 1, 1.0f);
+        Key(2, 5, 0, 1.0f);
         marks.InsertMark(Seconds(1), 'a');
         marks.InsertMark(Seconds(3), 'b');
         chart->SetKeyTrack(track.get());
         chart->SetMarkTrack(&marks);
     }
-    void TearDown() override { window.reset(); }
 
     // Presses button 1 at (x0, y), moves to x1 (and y1) and releases there.
     void Drag(int x0, int y, int x1, int y1 = -1, int button = 1) {
@@ -48,62 +42,37 @@ class ChartInput : public testing::Test {
         return text;
     }
 
-    std::unique_ptr<ChartWindow> window;
-    KLSyncChart* chart = nullptr;
     Widget area = nullptr;
-    std::unique_ptr<KLKeySet> keyset;
-    std::unique_ptr<KLKeyTrack> track;
     KLMarkTrack marks;
 };
 
-struct PickCase {
-    int offset;  // pointer column minus the key's column
-    bool picks;
-};
-
-class ChartPick : public ChartInput, public testing::WithParamInterface<PickCase> {};
-
-// Pressing and releasing on the key's letter strip moves the key to the pointer's column
-// when it picked the key; otherwise the indicator goes there and the key stays.
-TEST_P(ChartPick, KeyIsPickedWithinFourPixels) {
-    const int x = 120 + GetParam().offset;
-    guitest::Click(area, 1, x, 250);
-    const CueTime there = chart->geometry.TimeFromColumn(x);
-    if (GetParam().picks) {
-        EXPECT_TRUE(guitest::WaitFor([&] { return KeyAt(there.Seconds()); }));
-        EXPECT_FALSE(KeyAt(2.0));
-    } else {
-        EXPECT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == x; }));
-        EXPECT_TRUE(KeyAt(2.0));
+// Pressing and releasing on a key's letter strip moves the key to the pointer's column when
+// it picked the key (within four pixels either side); otherwise the indicator goes there.
+// Then the drags: the indicator picks the active key, a stick sets its key's value, a key
+// moves with its shape and value, a mark with its letter.
+TEST_F(ChartInput, PicksAndDrags) {
+    int column = 120;  // the key at 2 s
+    for (int offset : {4, -4, 5, -5}) {
+        const int x = column + offset;
+        guitest::Click(area, 1, x, 250);
+        if (std::abs(offset) < 5) {
+            const double there = chart->geometry.TimeFromColumn(x).Seconds();
+            EXPECT_TRUE(guitest::WaitFor([&] { return KeyAt(there); })) << offset;
+            column = x;
+        } else {
+            EXPECT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == x; }));
+            EXPECT_TRUE(KeyAt(2.0)) << offset;
+        }
+        EXPECT_EQ(KeyCount(), 2);
     }
-    EXPECT_EQ(KeyCount(), 2);
-}
+    ASSERT_EQ(column, 120);
 
-INSTANTIATE_TEST_SUITE_P(Offsets, ChartPick,
-                         testing::Values(PickCase{4, true}, PickCase{-4, true}, PickCase{5, false},
-                                         PickCase{-5, false}));
+    Drag(200, 100, 302);
+    EXPECT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 302; }));
+    EXPECT_EQ(chart->activeKey, track->key_from_time(Seconds(5)));
+    EXPECT_EQ(chart->feedbackKeyBefore, 2);
+    EXPECT_EQ(chart->feedbackKeyAfter, -1);
 
-TEST_F(ChartInput, DraggingAKeyMovesItWithItsShapeAndValue) {
-    track->key_from_time(Seconds(2))->value = 1.5f;
-    Drag(120, 250, 240);
-    ASSERT_TRUE(guitest::WaitFor([&] { return KeyAt(4.0); }));
-    const KLKeyEvent* moved = track->key_from_time(Seconds(4));
-    EXPECT_EQ(moved->shapeIndex, 1);
-    EXPECT_EQ(moved->value, 1.5f);
-    EXPECT_FALSE(KeyAt(2.0));
-    // Onto another key's time: refused, the key goes back.
-    Drag(240, 250, 300);
-    guitest::Settle();
-    EXPECT_TRUE(KeyAt(4.0));
-    EXPECT_TRUE(KeyAt(5.0));
-    EXPECT_EQ(KeyCount(), 2);
-    // Far out of the window: it lands on the chart's last column.
-    Drag(240, 250, 900);
-    EXPECT_TRUE(guitest::WaitFor([&] { return KeyCount() == 2 && !KeyAt(4.0); }));
-    EXPECT_EQ(track->events.Tail()->time, chart->geometry.TimeFromColumn(599));
-}
-
-TEST_F(ChartInput, DraggingAStickSetsTheKeysValue) {
     const int tick = chart->geometry.TickRow(1.0f);  // 200
     Drag(121, tick + 2, 121, 180);
     const KLKeyEvent* key = track->key_from_time(Seconds(2));
@@ -114,25 +83,30 @@ TEST_F(ChartInput, DraggingAStickSetsTheKeysValue) {
     guitest::Click(area, 1, 120, chart->geometry.TickRow(1.5f) + 5);
     EXPECT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 120; }));
     EXPECT_FLOAT_EQ(key->value, 1.5f);
-}
 
-TEST_F(ChartInput, DraggingAMarkMovesItWithItsLetter) {
+    Drag(120, 250, 240);
+    ASSERT_TRUE(guitest::WaitFor([&] { return KeyAt(4.0); }));
+    const KLKeyEvent* moved = track->key_from_time(Seconds(4));
+    EXPECT_EQ(moved->shapeIndex, 1);
+    EXPECT_EQ(moved->value, 1.5f);
+    EXPECT_FALSE(KeyAt(2.0));
+    // Onto another key's time: refused, the key goes back.
+    Drag(240, 250, 300);
+    guitest::Settle();
+    EXPECT_TRUE(KeyAt(4.0) && KeyAt(5.0));
+    EXPECT_EQ(KeyCount(), 2);
+    // Far out of the window: it lands on the chart's last column.
+    Drag(240, 250, 900);
+    EXPECT_TRUE(guitest::WaitFor([&] { return KeyCount() == 2 && !KeyAt(4.0); }));
+    EXPECT_EQ(track->events.Tail()->time, chart->geometry.TimeFromColumn(599));
+
     Drag(62, 8, 150);
     EXPECT_TRUE(guitest::WaitFor([&] { return MarkText() == "a@75 b@90 "; })) << MarkText();
-    // Below the mark strip the press is no mark's.
-    Drag(150, 30, 200);
+    Drag(150, 30, 200);  // below the mark strip the press is no mark's
     EXPECT_EQ(MarkText(), "a@75 b@90 ");
 }
 
-TEST_F(ChartInput, IndicatorFollowsTheDragAndPicksTheActiveKey) {
-    Drag(200, 100, 302);
-    EXPECT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 302; }));
-    EXPECT_EQ(chart->activeKey, track->key_from_time(Seconds(5)));
-    EXPECT_EQ(chart->feedbackKeyBefore, 2);
-    EXPECT_EQ(chart->feedbackKeyAfter, -1);
-}
-
-TEST_F(ChartInput, SweepingWithButtonTwoSelectsARegionAndAClickClearsIt) {
+TEST_F(ChartInput, ButtonTwoSweepsARegionAndShiftScrubs) {
     Drag(100, 100, 220, -1, 2);
     ASSERT_TRUE(guitest::WaitFor([&] { return chart->geometry.RegionSelected(); }));
     EXPECT_FLOAT_EQ(chart->geometry.regionStart, float(chart->geometry.FractionFromColumn(100)));
@@ -146,61 +120,8 @@ TEST_F(ChartInput, SweepingWithButtonTwoSelectsARegionAndAClickClearsIt) {
     Drag(500, 100, 900, -1, 2);
     ASSERT_TRUE(guitest::WaitFor([&] { return chart->geometry.RegionSelected(); }));
     EXPECT_LE(chart->geometry.regionEnd, 1.0f);
-}
 
-TEST_F(ChartInput, TypedLettersGoOnConsecutiveFrames) {
-    // 100 seconds over 600 columns: a frame is a fifth of a pixel.
-    chart->SetUserDuration(Seconds(100));
-    marks.Clear();
-    guitest::Click(area, 1, 300, 100);
-    ASSERT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 300; }));
-    const int start = chart->GetIndicatorTime().Frame();
-    guitest::TypeText("abc");
-    ASSERT_TRUE(guitest::WaitFor([&] { return marks.marks.Count() == 3; })) << MarkText();
-    const std::string f = std::to_string(start);
-    EXPECT_EQ(MarkText(), "a@" + f + " b@" + std::to_string(start + 1) + " c@" +
-                              std::to_string(start + 2) + " ");
-    // Keys that are not one printable character add nothing.
-    guitest::TypeKey(XK_Return);
-    guitest::TypeKey(XK_F3);
-    KLSyncChartTestAccess::Keyboard(chart, XK_eacute, "\xe9");  // no key for it on the test display
-    guitest::TypeKey(XK_Left);
-    guitest::Settle();
-    EXPECT_EQ(marks.marks.Count(), 3);
-}
-
-TEST_F(ChartInput, BackSpaceSelectsThenRemovesMarksBackwards) {
-    guitest::Click(area, 1, 240, 100);  // 4 s
-    ASSERT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 240; }));
-    guitest::TypeKey(XK_BackSpace);  // the mark at or before: b at 3 s
-    ASSERT_TRUE(guitest::WaitFor([&] { return chart->activeMark != nullptr; }));
-    EXPECT_EQ(chart->activeMark->label, 'b');
-    EXPECT_EQ(chart->geometry.indicatorX, 180);
-    guitest::TypeKey(XK_BackSpace);  // b goes, a becomes active
-    ASSERT_TRUE(guitest::WaitFor([&] { return marks.marks.Count() == 1; }));
-    ASSERT_TRUE(chart->activeMark);
-    EXPECT_EQ(chart->activeMark->label, 'a');
-    EXPECT_EQ(chart->geometry.indicatorX, 60);
-    // Typing over the active mark replaces it.
-    guitest::TypeText("z");
-    ASSERT_TRUE(guitest::WaitFor([&] { return MarkText() == "z@30 "; })) << MarkText();
-}
-
-TEST_F(ChartInput, WithoutAMarkTrackKeysDoNothing) {
-    chart->SetMarkTrack(nullptr);
-    guitest::Click(area, 1, 240, 100);
-    ASSERT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 240; }));
-    guitest::TypeKey(XK_BackSpace);
-    guitest::TypeText("q");
-    guitest::Settle();
-    EXPECT_EQ(chart->geometry.indicatorX, 240);
-    EXPECT_EQ(marks.marks.Count(), 2);
-    // Space still steps the indicator a frame (two columns here).
-    guitest::TypeKey(XK_space);
-    EXPECT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 242; }));
-}
-
-TEST_F(ChartInput, ShiftClickScrubsOnlyWithASound) {
+    // Shift-click scrubs only with a sound.
     guitest::Click(area, 1, 121, 250, ShiftMask);  // no sound: the key is picked and moved
     EXPECT_TRUE(
         guitest::WaitFor([&] { return KeyAt(chart->geometry.TimeFromColumn(121).Seconds()); }));
@@ -214,6 +135,55 @@ TEST_F(ChartInput, ShiftClickScrubsOnlyWithASound) {
     EXPECT_TRUE(guitest::WaitFor([&] { return chart->dragMode == 0; }));
     EXPECT_EQ(chart->geometry.indicatorX, 90);
     EXPECT_EQ(KeyCount(), 2);
+}
+
+// BackSpace selects the mark at or before the indicator, then removes marks backwards; a
+// typed letter replaces the active mark or goes on the next frame; without a mark track
+// keys do nothing but Space, which steps the indicator a frame.
+TEST_F(ChartInput, TypedMarksAndBackSpace) {
+    guitest::Click(area, 1, 240, 100);  // 4 s
+    ASSERT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 240; }));
+    guitest::TypeKey(XK_BackSpace);  // b at 3 s
+    ASSERT_TRUE(guitest::WaitFor([&] { return chart->activeMark != nullptr; }));
+    EXPECT_EQ(chart->activeMark->label, 'b');
+    EXPECT_EQ(chart->geometry.indicatorX, 180);
+    guitest::TypeKey(XK_BackSpace);  // b goes, a becomes active
+    ASSERT_TRUE(guitest::WaitFor([&] { return marks.marks.Count() == 1; }));
+    ASSERT_TRUE(chart->activeMark);
+    EXPECT_EQ(chart->activeMark->label, 'a');
+    EXPECT_EQ(chart->geometry.indicatorX, 60);
+    guitest::TypeText("z");
+    ASSERT_TRUE(guitest::WaitFor([&] { return MarkText() == "z@30 "; })) << MarkText();
+
+    chart->SetMarkTrack(nullptr);
+    guitest::Click(area, 1, 240, 100);
+    ASSERT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 240; }));
+    guitest::TypeKey(XK_BackSpace);
+    guitest::TypeText("q");
+    guitest::Settle();
+    EXPECT_EQ(chart->geometry.indicatorX, 240);
+    EXPECT_EQ(MarkText(), "z@30 ");
+    guitest::TypeKey(XK_space);  // two columns here
+    EXPECT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 242; }));
+
+    // 100 seconds over 600 columns: a frame is a fifth of a pixel.
+    chart->SetMarkTrack(&marks);
+    chart->SetUserDuration(Seconds(100));
+    marks.Clear();
+    guitest::Click(area, 1, 300, 100);
+    ASSERT_TRUE(guitest::WaitFor([&] { return chart->geometry.indicatorX == 300; }));
+    const int start = chart->GetIndicatorTime().Frame();
+    guitest::TypeText("abc");
+    ASSERT_TRUE(guitest::WaitFor([&] { return marks.marks.Count() == 3; })) << MarkText();
+    EXPECT_EQ(MarkText(), "a@" + std::to_string(start) + " b@" + std::to_string(start + 1) + " c@" +
+                              std::to_string(start + 2) + " ");
+    // Keys that are not one printable character add nothing.
+    guitest::TypeKey(XK_Return);
+    guitest::TypeKey(XK_F3);
+    KLSyncChartTestAccess::Keyboard(chart, XK_eacute, "\xe9");  // no key for it on the display
+    guitest::TypeKey(XK_Left);
+    guitest::Settle();
+    EXPECT_EQ(marks.marks.Count(), 3);
 }
 
 }  // namespace

@@ -1,38 +1,36 @@
-// The chart's key and region operations, as tables of cases.
+// The chart's key and region operations, a table of cases on one window.
 #include "chart/ChartTestUtil.h"
 
 #include <cmath>
 
-using charttest::ChartWindow;
 using charttest::Seconds;
 
 namespace {
 
-// One shared 600 x 260 chart of twenty seconds (30 pixels a second); every case gives it a
-// fresh key track with keys at 0, 2, 5 and 10 seconds (shapes 0, 1, 2, 3; values 1, 1, 0.5,
-// 1; Linear, Ease, Smooth, Linear) and the indicator at 3 seconds with no key active.
-class ChartOps : public testing::Test {
+// A chart of twenty seconds (30 pixels a second) with keys at 0, 2, 5 and 10 seconds (shapes
+// 0, 1, 2, 3; values 1, 1, 0.5, 1; Linear, Ease, Smooth, Linear) and the indicator at 3
+// seconds with no key active.
+class ChartOps : public charttest::ChartTest {
   protected:
-    static void SetUpTestSuite() { window = new ChartWindow("syncChart", 600, 260); }
-    static void TearDownTestSuite() {
-        delete window;
-        window = nullptr;
-    }
+    ChartOps() : ChartTest(20) {}
     void SetUp() override {
-        chart = window->chart;
-        keyset = charttest::Keyset("rest AI E O");
+        ChartTest::SetUp();
+        Reset();
+    }
+    // The starting keys on a fresh track, everything visible, no region, keyset kind 1.
+    void Reset() {
+        chart->SetKeyTrack(nullptr);
         track = std::make_unique<KLKeyTrack>(keyset.get());
         const double times[] = {0, 2, 5, 10};
         const float values[] = {1, 1, 0.5f, 1};
         for (int i = 0; i < 4; i++)
-            track->InsertKey(i, Seconds(times[i]), keyset->GetKeyShape(i), i % 3, values[i]);
-        chart->SetUserDuration(Seconds(20));
+            Key(i, times[i], i % 3, values[i]);
+        keyset->kind = 1;
         chart->SetKeyTrack(track.get());
         chart->ZoomReset();
         chart->SetIndicatorTime(Seconds(3));
         KLSyncChartTestAccess::Feedback(chart);
     }
-    void TearDown() override { chart->SetKeyTrack(nullptr); }
 
     // "shape@frame/smoothing/value" for every key, in time order.
     std::string Keys() {
@@ -46,86 +44,124 @@ class ChartOps : public testing::Test {
         return text;
     }
     int ActiveFrame() { return chart->activeKey ? chart->activeKey->time.Frame() : -1; }
-
-    static ChartWindow* window;
-    KLSyncChart* chart = nullptr;
-    std::unique_ptr<KLKeySet> keyset;
-    std::unique_ptr<KLKeyTrack> track;
 };
-ChartWindow* ChartOps::window = nullptr;
 
 const char kStart[] = "0@0/0/1 1@60/1/1 2@150/2/0.5 3@300/0/1 ";
 
-struct AddCase {
+// One operation on the starting keys after the keyset's kind, the visible part, the
+// indicator, the active key and the region are set: what it returns, the keys afterwards
+// and the active key's frame (-2: not looked at).
+struct OpCase {
     const char* name;
-    int kind;       // the keyset's kind
-    double active;  // time of the active key, or -1 for none
+    int (*op)(KLSyncChart*, KLKeySet*);
+    int kind;
+    float zoomStart, zoomEnd;
+    double indicator, active;       // seconds; active -1: none
+    double regionStart, regionEnd;  // seconds; equal for no region
     int result;
     const char* keys;
-    int activeFrame;  // the active key's frame afterwards
+    int activeFrame;
 };
 
-class AddKeyframe : public ChartOps, public testing::WithParamInterface<AddCase> {};
-
-TEST_P(AddKeyframe, InsertsByKindAtTheActiveKeyOrTheIndicator) {
-    const auto& c = GetParam();
-    keyset->kind = c.kind;
-    if (c.active >= 0)
-        KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(c.active)));
-    EXPECT_EQ(chart->AddKeyframe(2, keyset->GetKeyShape(2), 1), c.result);
-    EXPECT_EQ(Keys(), c.keys);
-    EXPECT_EQ(ActiveFrame(), c.activeFrame);
+int add(KLSyncChart* c, KLKeySet* k) {
+    return c->AddKeyframe(2, k->GetKeyShape(2), 1);
+}
+int delete_region(KLSyncChart* c, KLKeySet*) {
+    return c->DeleteActiveKeyframeRegion(), 0;
+}
+int smooth(KLSyncChart* c, KLKeySet*) {
+    return c->SetRegionSmoothing(1), 0;
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Cases, AddKeyframe,
-    testing::Values(
-        AddCase{"KindOneAtIndicator", 1, -1, 1, "0@0/0/1 1@60/1/1 2@90/1/1 2@150/2/0.5 3@300/0/1 ",
-                90},
-        AddCase{"KindTwoTakesTheShapesFrame", 2, -1, 1,
-                "0@0/0/1 1@60/1/1 2@90/1/2 2@150/2/0.5 3@300/0/1 ", 90},
-        AddCase{"OtherKindInsertsNothingButPicksTheKeyAtTheIndicator", 3, -1, 0, kStart, 60},
-        // The new key is active until the repaint's feedback finds no key at the indicator.
-        AddCase{"ReplacesTheActiveKey", 1, 5, 1, "0@0/0/1 1@60/1/1 2@150/1/1 3@300/0/1 ", -1}),
-    [](const auto& info) { return std::string(info.param.name); });
+const OpCase kOperations[] = {
+    // Add Key by the keyset's kind, at the indicator or replacing the active key; the
+    // new key is active until the repaint's feedback finds no key at the indicator.
+    OpCase{"AddKindOne", add, 1, 0, 1, 3, -1, 0, 0, 1,
+           "0@0/0/1 1@60/1/1 2@90/1/1 2@150/2/0.5 3@300/0/1 ", 90},
+    OpCase{"AddKindTwoTakesTheShapesFrame", add, 2, 0, 1, 3, -1, 0, 0, 1,
+           "0@0/0/1 1@60/1/1 2@90/1/2 2@150/2/0.5 3@300/0/1 ", 90},
+    OpCase{"AddOtherKindOnlyPicksTheKeyAtTheIndicator", add, 3, 0, 1, 3, -1, 0, 0, 0, kStart, 60},
+    OpCase{"AddReplacesTheActiveKey", add, 1, 0, 1, 3, 5, 0, 0, 1,
+           "0@0/0/1 1@60/1/1 2@150/1/1 3@300/0/1 ", -1},
+    // Delete Region: the region or the visible span, ends included.
+    OpCase{"DeleteVisibleSpanWithItsEnds", delete_region, 1, 0.1f, 0.25f, 3, -1, 0, 0, 0,
+           "0@0/0/1 3@300/0/1 ", -2},
+    OpCase{"DeleteEverything", delete_region, 1, 0, 1, 3, -1, 0, 0, 0, "", -2},
+    OpCase{"DeleteRegion", delete_region, 1, 0, 1, 3, -1, 1, 3, 0, "0@0/0/1 2@150/2/0.5 3@300/0/1 ",
+           -2},
+    OpCase{"DeleteRegionReversedIsNoRegion", delete_region, 1, 0.5f, 1, 3, -1, 3, 1, 0,
+           "0@0/0/1 1@60/1/1 2@150/2/0.5 ", -2},
+    // Smoothing: the active key, the region with its ends or the next key to the right.
+    OpCase{"SmoothNextKeyRightOfTheIndicator", smooth, 1, 0, 1, 3, -1, 0, 0, 0,
+           "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/0/1 ", -2},
+    OpCase{"SmoothActiveKey", smooth, 1, 0, 1, 3, 0, 0, 0, 0,
+           "0@0/1/1 1@60/1/1 2@150/2/0.5 3@300/0/1 ", -2},
+    OpCase{"SmoothNoKeyToTheRight", smooth, 1, 0, 1, 12, -1, 0, 0, 0, kStart, -2},
+    OpCase{"SmoothRegionWithItsEnds", smooth, 1, 0, 1, 3, -1, 5, 10, 0,
+           "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/1/1 ", -2}};
 
-// With the indicator hidden (as on a fresh chart) it reports one pixel before the chart's
-// start; the new key goes to time 0 instead, never before it.
-TEST_F(ChartOps, AddKeyframeWithTheIndicatorHiddenNeverGoesBeforeTimeZero) {
-    keyset->kind = 1;
-    track->RemoveKey(Seconds(0));
-    chart->geometry.indicatorX = -1;
-    ASSERT_LT(chart->GetIndicatorTime(), CueTime());
-    EXPECT_EQ(chart->AddKeyframe(2, keyset->GetKeyShape(2), 1), 1);
-    EXPECT_EQ(Keys(), "2@0/1/1 1@60/1/1 2@150/2/0.5 3@300/0/1 ");
+TEST_F(ChartOps, OperationsActOnTheActiveKeyTheIndicatorTheRegionOrTheVisibleSpan) {
+    for (const OpCase& c : kOperations) {
+        SCOPED_TRACE(c.name);
+        Reset();
+        keyset->kind = c.kind;
+        chart->SetZoomPan(c.zoomStart, c.zoomEnd);
+        chart->SetIndicatorTime(Seconds(c.indicator));
+        if (c.active >= 0)
+            KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(c.active)));
+        if (c.regionStart != c.regionEnd)
+            chart->SetRegionRange(Seconds(c.regionStart), Seconds(c.regionEnd));
+        EXPECT_EQ(c.op(chart, keyset.get()), c.result);
+        EXPECT_EQ(Keys(), c.keys);
+        if (c.activeFrame != -2) {
+            EXPECT_EQ(ActiveFrame(), c.activeFrame);
+        }
+    }
 }
 
-// A hidden indicator (as after opening a track) sits one pixel left of the chart, next to the
-// key at time 0; that key must not become active, or Delete Key removes a key nobody chose.
-TEST_F(ChartOps, AHiddenIndicatorMakesNoKeyActive) {
+// A hidden indicator (as on a fresh chart or after opening a track) sits one pixel left of
+// the chart, next to the key at time 0: that key must not become active, or Delete Key
+// removes a key nobody chose; and Add Key puts its key at time 0, never before it.
+TEST_F(ChartOps, AHiddenIndicatorMakesNoKeyActiveAndAddsAtTimeZero) {
     chart->geometry.indicatorX = -1;
     KLSyncChartTestAccess::Feedback(chart);
     EXPECT_EQ(chart->activeKey, nullptr);
     chart->DeleteActiveKeyframe();
     EXPECT_EQ(Keys(), kStart);
+    keyset->kind = 1;
+    track->RemoveKey(Seconds(0));
+    ASSERT_LT(chart->GetIndicatorTime(), CueTime());
+    EXPECT_EQ(chart->AddKeyframe(2, keyset->GetKeyShape(2), 1), 1);
+    EXPECT_EQ(Keys(), "2@0/1/1 1@60/1/1 2@150/2/0.5 3@300/0/1 ");
     // Shown at the start again, the key there is picked as before.
     chart->SetIndicatorTime(CueTime());
     KLSyncChartTestAccess::Feedback(chart);
     EXPECT_EQ(ActiveFrame(), 0);
 }
 
-TEST_F(ChartOps, AddTimeKeyframeIgnoresTheKindAndRefusesAnOccupiedTime) {
-    keyset->kind = 2;
+// Keys added and deleted at a time or as the active key; without a key track nothing
+// changes.
+TEST_F(ChartOps, KeysByTimeAndTheActiveKey) {
+    keyset->kind = 2;  // AddTimeKeyframe ignores the kind
     EXPECT_EQ(chart->AddTimeKeyframe(3, Seconds(4), keyset->GetKeyShape(3), 1), 1);
     EXPECT_EQ(Keys(), "0@0/0/1 1@60/1/1 3@120/1/1 2@150/2/0.5 3@300/0/1 ");
-    // The active key stays where it is: AddTimeKeyframe does not replace it.
+    // An occupied time is refused, and the active key is not replaced.
     KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(0)));
     EXPECT_EQ(chart->AddTimeKeyframe(1, Seconds(5), keyset->GetKeyShape(1), 0), 0);
     EXPECT_EQ(ActiveFrame(), 150);
     EXPECT_EQ(track->events.Count(), 5);
-}
 
-TEST_F(ChartOps, NothingWithoutAKeyTrack) {
+    Reset();
+    chart->DeleteActiveKeyframe();  // none active: nothing
+    EXPECT_EQ(Keys(), kStart);
+    KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(2)));
+    chart->DeleteActiveKeyframe();
+    EXPECT_EQ(chart->activeKey, nullptr);
+    chart->DeleteTimeKeyframe(Seconds(5));
+    chart->DeleteTimeKeyframe(Seconds(7));
+    EXPECT_EQ(Keys(), "0@0/0/1 3@300/0/1 ");
+
+    Reset();
     chart->SetKeyTrack(nullptr);
     EXPECT_EQ(chart->AddKeyframe(1, keyset->GetKeyShape(1), 1), 0);
     EXPECT_EQ(chart->AddTimeKeyframe(1, Seconds(1), keyset->GetKeyShape(1), 1), 0);
@@ -135,93 +171,20 @@ TEST_F(ChartOps, NothingWithoutAKeyTrack) {
     EXPECT_EQ(Keys(), kStart);
 }
 
-struct RegionCase {
-    const char* name;
-    float zoomStart, zoomEnd;
-    double regionStart, regionEnd;  // seconds; equal for no region
-    const char* keys;
-};
-
-class DeleteRegion : public ChartOps, public testing::WithParamInterface<RegionCase> {};
-
-TEST_P(DeleteRegion, RemovesKeysInTheRegionOrTheVisibleSpanEndsIncluded) {
-    const auto& c = GetParam();
-    chart->SetZoomPan(c.zoomStart, c.zoomEnd);
-    if (c.regionStart != c.regionEnd)
-        chart->SetRegionRange(Seconds(c.regionStart), Seconds(c.regionEnd));
-    chart->DeleteActiveKeyframeRegion();
-    EXPECT_EQ(Keys(), c.keys);
-}
-
-INSTANTIATE_TEST_SUITE_P(
-    Cases, DeleteRegion,
-    testing::Values(RegionCase{"VisibleSpanWithItsEnds", 0.1f, 0.25f, 0, 0, "0@0/0/1 3@300/0/1 "},
-                    RegionCase{"Everything", 0.0f, 1.0f, 0, 0, ""},
-                    RegionCase{"Region", 0.0f, 1.0f, 1, 3, "0@0/0/1 2@150/2/0.5 3@300/0/1 "},
-                    RegionCase{"RegionReversedIsNoRegion", 0.5f, 1.0f, 3, 1,
-                               "0@0/0/1 1@60/1/1 2@150/2/0.5 "}),
-    [](const auto& info) { return std::string(info.param.name); });
-
-struct SmoothCase {
-    const char* name;
-    double active;                  // seconds, -1 none
-    double regionStart, regionEnd;  // seconds; equal for none
-    double indicator;               // seconds
-    const char* keys;
-};
-
-class RegionSmoothing : public ChartOps, public testing::WithParamInterface<SmoothCase> {};
-
-TEST_P(RegionSmoothing, SetsTheActiveKeyTheNextKeyOrTheRegion) {
-    const auto& c = GetParam();
-    chart->SetIndicatorTime(Seconds(c.indicator));
-    if (c.active >= 0)
-        KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(c.active)));
-    if (c.regionStart != c.regionEnd)
-        chart->SetRegionRange(Seconds(c.regionStart), Seconds(c.regionEnd));
-    chart->SetRegionSmoothing(1);
-    EXPECT_EQ(Keys(), c.keys);
-}
-
-INSTANTIATE_TEST_SUITE_P(Cases, RegionSmoothing,
-                         testing::Values(SmoothCase{"NextKeyRightOfTheIndicator", -1, 0, 0, 3,
-                                                    "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/0/1 "},
-                                         SmoothCase{"ActiveKey", 0, 0, 0, 3,
-                                                    "0@0/1/1 1@60/1/1 2@150/2/0.5 3@300/0/1 "},
-                                         SmoothCase{"NoKeyToTheRight", -1, 0, 0, 12, kStart},
-                                         SmoothCase{"RegionWithItsEnds", -1, 5, 10, 3,
-                                                    "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/1/1 "}),
-                         [](const auto& info) { return std::string(info.param.name); });
-
-TEST_F(ChartOps, DeletingTheActiveKeyOrAKeyByTime) {
-    chart->DeleteActiveKeyframe();  // none active: nothing
-    EXPECT_EQ(Keys(), kStart);
-    KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(2)));
-    chart->DeleteActiveKeyframe();
-    EXPECT_EQ(chart->activeKey, nullptr);
-    chart->DeleteTimeKeyframe(Seconds(5));
-    chart->DeleteTimeKeyframe(Seconds(7));
-    EXPECT_EQ(Keys(), "0@0/0/1 3@300/0/1 ");
-}
-
-TEST_F(ChartOps, RegionRangeReadsBackAndDefaultsToTheVisibleSpan) {
+// The region range defaults to the visible span; the duration follows the user's, the
+// sound's and the track's; odd sounds still show, and one longer than the time line holds
+// (2^31 ticks is about 99 hours) saturates the duration.
+TEST_F(ChartOps, RangesDurationAndOddSounds) {
     CueTime a, b;
     chart->SetZoomPan(0.25f, 0.5f);
     chart->GetRegionRange(a, b);
-    EXPECT_EQ(a, Seconds(5));
-    EXPECT_EQ(b, Seconds(10));
+    EXPECT_EQ(std::make_pair(a, b), std::make_pair(Seconds(5), Seconds(10)));
     chart->SetRegionRange(Seconds(1), Seconds(2));
-    chart->GetRegionRange(a, b);
-    EXPECT_EQ(a, Seconds(1));
-    EXPECT_EQ(b, Seconds(2));
-    chart->SetZoomRange(Seconds(4), Seconds(6));
+    chart->SetZoomRange(Seconds(4), Seconds(6));  // clears the region
     chart->GetZoomRange(a, b);
-    EXPECT_EQ(a, Seconds(4));
-    EXPECT_EQ(b, Seconds(6));
+    EXPECT_EQ(std::make_pair(a, b), std::make_pair(Seconds(4), Seconds(6)));
     EXPECT_FALSE(chart->geometry.RegionSelected());
-}
 
-TEST_F(ChartOps, DurationFollowsUserSoundAndTrack) {
     chart->SetUserDuration(CueTime());
     EXPECT_EQ(chart->geometry.duration, Seconds(10));  // the track's last key
     chart->SetKeyTrack(nullptr);
@@ -235,19 +198,15 @@ TEST_F(ChartOps, DurationFollowsUserSoundAndTrack) {
     chart->SetSound(nullptr);
     EXPECT_EQ(chart->geometry.duration, Seconds(3));
     EXPECT_EQ(chart->sampleCount, 48000 * 3);
-}
 
-TEST_F(ChartOps, SoundsThatAreOddStillShow) {
-    const std::vector<std::vector<float>> odd = {
-        {0.5f}, {NAN, 0.25f, NAN, -0.5f}, std::vector<float>(1000, 0.0f)};
-    for (const auto& samples : odd) {
-        auto sound = charttest::Sound(samples, 48000);
-        chart->SetSound(sound.get());
+    for (const std::vector<float>& samples :
+         {std::vector<float>{0.5f}, {NAN, 0.25f, NAN, -0.5f}, std::vector<float>(1000, 0.0f)}) {
+        auto odd = charttest::Sound(samples, 48000);
+        chart->SetSound(odd.get());
         guitest::Settle();
         EXPECT_TRUE(std::isfinite(chart->peak));
     }
     EXPECT_EQ(chart->waveSegmentCount, 0);
-    // Longer than the time line holds (2^31 ticks is about 99 hours): the duration saturates.
     auto endless = charttest::Sound(std::vector<float>(400000, 0.5f), 1.0);
     chart->SetSound(endless.get());
     EXPECT_EQ(chart->geometry.duration, CueTime::FromTicks(INT32_MAX));
@@ -255,40 +214,29 @@ TEST_F(ChartOps, SoundsThatAreOddStillShow) {
     chart->SetSound(nullptr);
 }
 
-namespace {
-int calls[3];
-void count0(Widget, XtPointer, KLFiend*) {
-    calls[0]++;
+void count(Widget, XtPointer calls, KLFiend*) {
+    ++*static_cast<int*>(calls);
 }
-void count1(Widget, XtPointer, KLFiend*) {
-    calls[1]++;
-}
-void count2(Widget, XtPointer, KLFiend*) {
-    calls[2]++;
-}
-}  // namespace
 
 TEST_F(ChartOps, FeedbackCallsTheCallbacksAndPicksTheKeysAround) {
-    EXPECT_TRUE(chart->SetFiendCallback("showKeyframeCallback", count0, nullptr));
-    EXPECT_TRUE(chart->SetFiendCallback("showKeyframeImageCallback", count1, nullptr));
-    EXPECT_TRUE(chart->SetFiendCallback("showReferenceImageCallback", count2, nullptr));
-    EXPECT_FALSE(chart->SetFiendCallback("noSuchCallback", count0, nullptr));
-    calls[0] = calls[1] = calls[2] = 0;
+    const char* names[] = {"showKeyframeCallback", "showKeyframeImageCallback",
+                           "showReferenceImageCallback"};
+    int calls[3] = {0, 0, 0};
+    for (int i = 0; i < 3; i++)
+        EXPECT_TRUE(chart->SetFiendCallback(names[i], count, &calls[i]));
+    EXPECT_FALSE(chart->SetFiendCallback("noSuchCallback", count, nullptr));
     chart->SetIndicatorTime(Seconds(3.5));  // halfway from 2 s to 5 s
     chart->UpdateDisplay();
     EXPECT_EQ(chart->feedbackKeyBefore, 1);
     EXPECT_EQ(chart->feedbackKeyAfter, 2);
     EXPECT_NEAR(chart->feedbackBlend, 0.5f, 0.02f);  // to the pixel
     EXPECT_EQ(chart->activeKey, nullptr);
-    EXPECT_EQ(calls[0], 0);
-    EXPECT_EQ(calls[1], 1);
-    EXPECT_EQ(calls[2], 1);
+    EXPECT_EQ(std::vector<int>(calls, calls + 3), (std::vector<int>{0, 1, 1}));
     chart->SetIndicatorTime(Seconds(5));
     chart->UpdateDisplay();
     EXPECT_EQ(ActiveFrame(), 150);
     EXPECT_EQ(calls[0], 1);
-    for (const char* name :
-         {"showKeyframeCallback", "showKeyframeImageCallback", "showReferenceImageCallback"})
+    for (const char* name : names)
         chart->SetFiendCallback(name, nullptr, nullptr);
 }
 

@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <array>
 #include <sstream>
 
 #include "chart/KLChartGeometry.h"
@@ -23,52 +24,55 @@ class KeyDrawing : public testing::Test {
         track.InsertKey(shape, CueTime::FromSeconds(seconds), keyset.GetKeyShape(shape), smoothing,
                         value);
     }
+    static std::array<int, 4> Ends(const KLWaveSegment& s) { return {s.x1, s.y1, s.x2, s.y2}; }
     KLKeySet keyset{"mouth", "face.glb"};
     KLKeyTrack track{&keyset};
     KLChartGeometry g;
     KLKeyDrawing d;
 };
 
-TEST_F(KeyDrawing, HeldShapeIsOneFlatSegmentWhateverTheValues) {
+// A held shape is one flat segment on the base line whatever its values; curves rise into
+// the key they lead to, in that key's shape (Ease and Smooth one segment per column).
+TEST_F(KeyDrawing, HeldShapesAreFlatAndCurvesRiseIntoTheirKey) {
     Key(1, 1, 1, 0.2f);
     Key(1, 3, 2, 2.0f);
     d.Build(g, track);
     ASSERT_EQ(d.linear.size(), 1u);
-    EXPECT_EQ(d.linear[0].x1, 40);
-    EXPECT_EQ(d.linear[0].x2, 120);
-    EXPECT_EQ(d.linear[0].y1, 280);
-    EXPECT_EQ(d.linear[0].y2, 280);
-    EXPECT_TRUE(d.ease.empty());
-    EXPECT_TRUE(d.smooth.empty());
+    EXPECT_EQ(Ends(d.linear[0]), (std::array<int, 4>{40, 280, 120, 280}));
+    EXPECT_TRUE(d.ease.empty() && d.smooth.empty());
     ASSERT_EQ(d.letters.size(), 2u);
     EXPECT_EQ(d.letters[0].letter, 'A');
     EXPECT_EQ(d.letters[0].baseline, 295);
-}
 
-TEST_F(KeyDrawing, CurvesRiseIntoTheKeyTheyLeadToInItsShape) {
+    track.Clear();
     Key(0, 0, 0);
     Key(1, 1, 0, 2.0f);  // Linear to the top of the band
-    Key(2, 2, 1);        // Ease: one segment per column
+    Key(2, 2, 1);        // Ease
     Key(0, 3, 2);        // Smooth
     d.Build(g, track);
     ASSERT_EQ(d.linear.size(), 1u);
-    EXPECT_EQ(d.linear[0].x1, 0);
-    EXPECT_EQ(d.linear[0].y1, 280);
-    EXPECT_EQ(d.linear[0].x2, 40);
-    EXPECT_EQ(d.linear[0].y2, 200);
-    EXPECT_EQ(d.ease.size(), 40u);
+    EXPECT_EQ(Ends(d.linear[0]), (std::array<int, 4>{0, 280, 40, 200}));
+    ASSERT_EQ(d.ease.size(), 40u);
     EXPECT_EQ(d.ease.front().y1, 280);
     EXPECT_EQ(d.ease.back().y2, 240);
     EXPECT_EQ(d.smooth.size(), 40u);
 }
 
-TEST_F(KeyDrawing, KeysInOneColumnShareTheirStick) {
+TEST_F(KeyDrawing, KeysInOneColumnShareTheirStickAndNamelessKeysHaveNoLetter) {
     for (int i = 0; i < 6; i++)
         Key(i % 3, 1.0 + i * 0.001, 1, i < 3 ? 1.0f : 2.0f);
     d.Build(g, track);
     // One stick and two distinct ticks for the column, six letters.
     EXPECT_EQ(d.sticks.size(), 3u);
     EXPECT_EQ(d.letters.size(), 6u);
+    // Keys whose shape has an empty name, or none, draw no letter.
+    track.Clear();
+    keyset.keyShapes.push_back(std::make_unique<KLKey>(3.0f, "", nullptr));
+    track.InsertKey(3, CueTime::FromSeconds(1), keyset.keyShapes.back().get(), 1, 1.0f);
+    track.InsertKey(1, CueTime::FromSeconds(2), nullptr, 1, 1.0f);
+    d.Build(g, track);
+    EXPECT_TRUE(d.letters.empty());
+    EXPECT_EQ(d.sticks.size(), 4u);
 }
 
 TEST_F(KeyDrawing, FarZoomsStayWithinTheDrawableRange) {
@@ -87,15 +91,6 @@ TEST_F(KeyDrawing, FarZoomsStayWithinTheDrawableRange) {
         }
     }
     EXPECT_TRUE(d.sticks.empty());  // no key lies in view
-}
-
-TEST_F(KeyDrawing, EmptyNamesDrawNoLetter) {
-    keyset.keyShapes.push_back(std::make_unique<KLKey>(3.0f, "", nullptr));
-    track.InsertKey(3, CueTime::FromSeconds(1), keyset.keyShapes.back().get(), 1, 1.0f);
-    track.InsertKey(1, CueTime::FromSeconds(2), nullptr, 1, 1.0f);
-    d.Build(g, track);
-    EXPECT_TRUE(d.letters.empty());
-    EXPECT_EQ(d.sticks.size(), 4u);
 }
 
 }  // namespace

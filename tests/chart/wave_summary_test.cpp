@@ -39,19 +39,14 @@ TEST(WaveSummary, ExtentsEqualTheScanOverRandomRanges) {
         ASSERT_EQ(hi, scanHi) << a << ".." << b;
         ASSERT_EQ(lo, scanLo) << a << ".." << b;
     }
-}
-
-TEST(WaveSummary, EmptyAndAllPositiveRangesReachTheCentre) {
+    // An empty range, and one of positive samples only, reach the centre line.
     std::vector<float> ones(1000, 0.5f);
-    KLWaveSummary summary;
     summary.Build(ones.data(), 1000);
     float hi, lo;
     summary.Extent(10, 10, &hi, &lo);
-    EXPECT_EQ(hi, 0.0f);
-    EXPECT_EQ(lo, 0.0f);
+    EXPECT_EQ(std::make_pair(hi, lo), std::make_pair(0.0f, 0.0f));
     summary.Extent(0, 1000, &hi, &lo);
-    EXPECT_EQ(hi, 0.5f);
-    EXPECT_EQ(lo, 0.0f);
+    EXPECT_EQ(std::make_pair(hi, lo), std::make_pair(0.5f, 0.0f));
 }
 
 // The sketch from the summaries against the column-by-column scan, at random chart sizes,
@@ -92,20 +87,9 @@ TEST(WaveSketch, SummaryGivesTheScansSegmentsAtRandomZooms) {
     }
 }
 
-TEST(WaveSketch, DrawsNothingWithoutAPeakOrWithOneSample) {
-    KLChartGeometry g;
-    g.SetSize(100, 200);
-    std::vector<float> zeros(1000, 0.0f);
-    KLWaveSummary summary;
-    summary.Build(zeros.data(), 1000);
-    std::vector<KLWaveSegment> segments;
-    EXPECT_EQ(SketchWave(g, zeros.data(), summary, 1000, CueTime::FromSeconds(1), 0.0f, segments),
-              0);
-    EXPECT_EQ(SketchWave(g, zeros.data(), summary, 1, CueTime::FromSeconds(1), 1.0f, segments), 0);
-    EXPECT_EQ(segments.size(), 100u);
-}
-
-TEST(WaveSketch, PositiveSamplesGoDownward) {
+// Positive samples go downward from the centre line; without a peak, or with one sample,
+// nothing is sketched.
+TEST(WaveSketch, PositiveSamplesGoDownwardAndSilenceDrawsNothing) {
     KLChartGeometry g;
     g.SetSize(10, 215);  // wave band 15 .. 114, B = 99
     g.duration = CueTime::FromSeconds(1);
@@ -113,10 +97,13 @@ TEST(WaveSketch, PositiveSamplesGoDownward) {
     KLWaveSummary summary;
     summary.Build(samples.data(), 1000);
     std::vector<KLWaveSegment> segments;
-    ASSERT_EQ(SketchWave(g, samples.data(), summary, 1000, CueTime::FromSeconds(1), 1.0f, segments),
-              10);
+    const CueTime second = CueTime::FromSeconds(1);
+    ASSERT_EQ(SketchWave(g, samples.data(), summary, 1000, second, 1.0f, segments), 10);
     EXPECT_EQ(segments[3].y1, 15 + 99);  // hi = peak: the bottom
     EXPECT_EQ(segments[3].y2, 15 + 49);  // lo = 0: the centre line
+    EXPECT_EQ(SketchWave(g, samples.data(), summary, 1000, second, 0.0f, segments), 0);
+    EXPECT_EQ(SketchWave(g, samples.data(), summary, 1, second, 1.0f, segments), 0);
+    EXPECT_EQ(segments.size(), 10u);
 }
 
 }  // namespace

@@ -4,7 +4,6 @@
 #include <OpenImageIO/imageio.h>
 #include <fstream>
 #include <optional>
-#include <sstream>
 
 #include "toolkit/KLImageSGI.h"
 #include "toolkit_test_util.h"
@@ -28,11 +27,6 @@ class ImageTest : public TempDirTest {
         EXPECT_TRUE(out && out->open(path, layout) &&
                     out->write_image(OIIO::TypeDesc::UINT8, pixels.data()) && out->close());
         return path;
-    }
-    static std::string Slurp(const std::string& path) {
-        std::ostringstream bytes;
-        bytes << std::ifstream(path, std::ios::binary).rdbuf();
-        return bytes.str();
     }
     static Bytes Rgba(const KLImageSGI& image) {
         return Bytes(image.Pixels(), image.Pixels() + size_t(image.Width() * image.Height()) * 4);

@@ -55,60 +55,6 @@ struct Deferral {
     const char* events;  // what the child reported, in order
 };
 
-// The loop asks for the noted signal's handler once woken.
-void noted_then_run_by_the_loop() {
-    ::raise(SIGTERM);
-    report(DeferredSignal() == SIGTERM ? "noted;" : "not noted;");
-    report(loop_woken() ? "woken;" : "not woken;");
-    RunDeferredSignal();
-}
-
-// USR1 and USR2 are deferred as well; a second asynchronous signal while one waits is ignored.
-void second_while_waiting_is_ignored() {
-    ::raise(SIGUSR1);
-    ::raise(SIGUSR2);
-    ::raise(SIGTERM);
-    report(DeferredSignal() == SIGUSR1 ? "noted;" : "not noted;");
-    RunDeferredSignal();
-}
-
-// The loop never comes back: the alarm runs the handler inside the signal handler.
-void loop_never_comes_back() {
-    ::raise(SIGTERM);
-    report("noted;");
-    for (;;)
-        ::pause();
-}
-
-// A fault while a signal waits saves at once, for the fault.
-void fault_while_waiting() {
-    ::raise(SIGTERM);
-    report("noted;");
-    ::raise(SIGSEGV);
-    report("survived;");
-}
-
-// A fault is never deferred.
-void fault_is_not_deferred() {
-    ::raise(SIGBUS);
-    report("survived;");
-}
-
-// A second signal while the loop runs the handler ends the program at once, by that signal.
-void second_signal_during_the_handler() {
-    raiseInside = SIGTERM;
-    ::raise(SIGUSR1);
-    RunDeferredSignal();
-}
-
-// With nothing waiting, the loop's call does nothing.
-void nothing_waiting() {
-    RunDeferredSignal();
-    report("nothing;");
-    ::raise(SIGTERM);
-    RunDeferredSignal();
-}
-
 class DeferredSignals : public ::testing::TestWithParam<Deferral> {};
 
 TEST_P(DeferredSignals, RunAsTheLoopAsksAndEndTheProgramAsBefore) {
@@ -146,18 +92,67 @@ TEST_P(DeferredSignals, RunAsTheLoopAsksAndEndTheProgramAsBefore) {
 INSTANTIATE_TEST_SUITE_P(
     Cases, DeferredSignals,
     ::testing::Values(
-        Deferral{"NotedThenRunByTheLoop", noted_then_run_by_the_loop, SIGTERM,
-                 "noted;woken;handler 15;handler done;"},
-        Deferral{"SecondWhileWaitingIsIgnored", second_while_waiting_is_ignored, SIGUSR1,
-                 "noted;handler 10;handler done;"},
-        Deferral{"LoopNeverComesBack", loop_never_comes_back, SIGTERM,
-                 "noted;handler 15;handler done;"},
-        Deferral{"FaultWhileWaiting", fault_while_waiting, SIGSEGV,
-                 "noted;handler 11;handler done;"},
-        Deferral{"FaultIsNotDeferred", fault_is_not_deferred, SIGBUS, "handler 7;handler done;"},
-        Deferral{"SecondSignalDuringTheHandler", second_signal_during_the_handler, SIGTERM,
-                 "handler 10;"},
-        Deferral{"NothingWaiting", nothing_waiting, SIGTERM, "nothing;handler 15;handler done;"}),
+        // The loop asks for the noted signal's handler once woken.
+        Deferral{"NotedThenRunByTheLoop",
+                 [] {
+                     ::raise(SIGTERM);
+                     report(DeferredSignal() == SIGTERM ? "noted;" : "not noted;");
+                     report(loop_woken() ? "woken;" : "not woken;");
+                     RunDeferredSignal();
+                 },
+                 SIGTERM, "noted;woken;handler 15;handler done;"},
+        // USR1 and USR2 are deferred as well; a second asynchronous signal while one waits is
+        // ignored.
+        Deferral{"SecondWhileWaitingIsIgnored",
+                 [] {
+                     ::raise(SIGUSR1);
+                     ::raise(SIGUSR2);
+                     ::raise(SIGTERM);
+                     report(DeferredSignal() == SIGUSR1 ? "noted;" : "not noted;");
+                     RunDeferredSignal();
+                 },
+                 SIGUSR1, "noted;handler 10;handler done;"},
+        // The loop never comes back: the alarm runs the handler inside the signal handler.
+        Deferral{"LoopNeverComesBack",
+                 [] {
+                     ::raise(SIGTERM);
+                     report("noted;");
+                     for (;;)
+                         ::pause();
+                 },
+                 SIGTERM, "noted;handler 15;handler done;"},
+        // A fault while a signal waits saves at once, for the fault; a fault is never deferred.
+        Deferral{"FaultWhileWaiting",
+                 [] {
+                     ::raise(SIGTERM);
+                     report("noted;");
+                     ::raise(SIGSEGV);
+                     report("survived;");
+                 },
+                 SIGSEGV, "noted;handler 11;handler done;"},
+        Deferral{"FaultIsNotDeferred",
+                 [] {
+                     ::raise(SIGBUS);
+                     report("survived;");
+                 },
+                 SIGBUS, "handler 7;handler done;"},
+        // A second signal while the loop runs the handler ends the program at once, by it.
+        Deferral{"SecondSignalDuringTheHandler",
+                 [] {
+                     raiseInside = SIGTERM;
+                     ::raise(SIGUSR1);
+                     RunDeferredSignal();
+                 },
+                 SIGTERM, "handler 10;"},
+        // With nothing waiting, the loop's call does nothing.
+        Deferral{"NothingWaiting",
+                 [] {
+                     RunDeferredSignal();
+                     report("nothing;");
+                     ::raise(SIGTERM);
+                     RunDeferredSignal();
+                 },
+                 SIGTERM, "nothing;handler 15;handler done;"}),
     [](const auto& info) { return std::string(info.param.name); });
 
 }  // namespace

@@ -218,8 +218,10 @@ TEST(SoundOps, ReadsTheDemoDialogue) {
     EXPECT_GT(sound.Max() - sound.Min(), 0.1f);
 }
 
-TEST(SoundOps, MixMinMaxAndTrimEnds) {
-    // 1000 frames per second: channel 0 counts frames (i / 1000), channel 1 is -0.5.
+// 1000 frames per second: channel 0 counts frames (i / 1000), channel 1 is -0.5. Trim keeps
+// [start, end) clamped to the sound, from the next whole frame on; Excerpt gives what Trim
+// keeps, with its range, and holds only that.
+TEST(SoundOps, MixMinMaxTrimAndExcerpt) {
     std::vector<float> a(2000), b(2000, -0.5f);
     for (size_t i = 0; i < a.size(); ++i)
         a[i] = float(i) / 1000.0f;
@@ -230,48 +232,34 @@ TEST(SoundOps, MixMinMaxAndTrimEnds) {
     sound->ComputeMinMax();
     EXPECT_FLOAT_EQ(sound->Min(), -0.5f);
     EXPECT_FLOAT_EQ(sound->Max(), 1.999f);
-    auto copy = sound->Copy();
-    copy->Trim(0.25, 0.5);  // [0.25, 0.5)
-    ASSERT_EQ(copy->FrameCount(), 250);
-    EXPECT_FLOAT_EQ(copy->Channel(0).front(), 0.25f);
-    EXPECT_FLOAT_EQ(copy->Channel(0).back(), 0.499f);
-    copy = sound->Copy();
-    copy->Trim(-3.0, 99.0);  // clamped to the whole sound
-    EXPECT_EQ(copy->FrameCount(), 2000);
-    copy->Trim(1.9995, 5.0);  // starts between frames: the next whole frame
-    EXPECT_EQ(copy->FrameCount(), 0);
-    copy = sound->Copy();
-    copy->Trim(1.0, 0.5);  // end before start keeps nothing
-    EXPECT_EQ(copy->FrameCount(), 0);
+    using Range = std::tuple<double, double, long, float>;  // start, end, frames kept, first
+    for (auto [start, end, frames, first] :
+         {Range{0.25, 0.5, 250, 0.25f}, Range{-3.0, 99.0, 2000, 0.0f}, Range{1.9995, 5.0, 0, 0},
+          Range{1.0, 0.5, 0, 0}, Range{0.1, 0.1, 0, 0}, Range{0.0, 0.001, 1, 0.0f}}) {
+        SCOPED_TRACE(std::to_string(start) + " .. " + std::to_string(end));
+        auto trimmed = sound->Copy();
+        trimmed->Trim(start, end);
+        ASSERT_EQ(trimmed->FrameCount(), frames);
+        if (frames > 0) {
+            EXPECT_FLOAT_EQ(trimmed->Channel(0).front(), first);
+            EXPECT_FLOAT_EQ(trimmed->Channel(0).back(), first + float(frames - 1) / 1000.0f);
+        }
+        const auto excerpt = sound->Excerpt(start, end);
+        ASSERT_EQ(excerpt->ChannelCount(), 2);
+        EXPECT_EQ(excerpt->Rate(), 1000.0);
+        EXPECT_EQ(excerpt->Channel(0), trimmed->Channel(0));
+        EXPECT_EQ(excerpt->Channel(1), trimmed->Channel(1));
+        EXPECT_LE(excerpt->Channel(0).capacity(), excerpt->Channel(0).size() + 16);
+        EXPECT_EQ(excerpt->Min(), trimmed->Min());
+        EXPECT_EQ(excerpt->Max(), trimmed->Max());
+    }
+    EXPECT_FALSE(CueSound().Excerpt(0.0, 1.0)->Valid());
 
     CaptureErrors quiet;  // inconsistent channels and rates are refused
     EXPECT_FALSE(CueSound::FromSamples({}, 8000)->Valid());
     EXPECT_FALSE(CueSound::FromSamples({{1, 2}, {1}}, 8000)->Valid());
     EXPECT_FALSE(CueSound::FromSamples({{1, 2}}, 0)->Valid());
     EXPECT_FALSE(CueSound::FromSamples({{1, 2}}, std::nan(""))->Valid());
-}
-
-TEST(SoundOps, ExcerptIsWhatTrimKeepsAndHoldsOnlyThat) {
-    std::vector<float> a(2000), b(2000, -0.5f);
-    for (size_t i = 0; i < a.size(); ++i)
-        a[i] = float(i) / 1000.0f;
-    auto sound = CueSound::FromSamples({a, b}, 1000.0);
-    sound->ComputeMinMax();
-    const std::pair<double, double> ranges[] = {{0.25, 0.5}, {-3.0, 99.0}, {1.9995, 5.0},
-                                                {1.0, 0.5},  {0.1, 0.1},   {0.0, 0.001}};
-    for (const auto& [start, end] : ranges) {
-        auto trimmed = sound->Copy();
-        trimmed->Trim(start, end);
-        const auto excerpt = sound->Excerpt(start, end);
-        ASSERT_EQ(excerpt->ChannelCount(), 2) << start << " " << end;
-        EXPECT_EQ(excerpt->Rate(), 1000.0);
-        EXPECT_EQ(excerpt->Channel(0), trimmed->Channel(0)) << start << " " << end;
-        EXPECT_EQ(excerpt->Channel(1), trimmed->Channel(1)) << start << " " << end;
-        EXPECT_LE(excerpt->Channel(0).capacity(), excerpt->Channel(0).size() + 16);
-        EXPECT_EQ(excerpt->Min(), trimmed->Min());
-        EXPECT_EQ(excerpt->Max(), trimmed->Max());
-    }
-    EXPECT_FALSE(CueSound().Excerpt(0.0, 1.0)->Valid());
 }
 
 TEST(SoundOps, MixResampledTo16kKeepsPitchAndLevel) {

@@ -2,7 +2,11 @@
 
 #include <gtest/gtest.h>
 
+#include <stdlib.h>
+
 #include <filesystem>
+#include <fstream>
+#include <sstream>
 #include <string>
 #include <utility>
 #include <vector>
@@ -16,6 +20,21 @@ class CaptureErrors : public KLErrHandler {
     void Handle(KLErr* e) override { reports.push_back({e->Level(), e->Message()}); }
     std::vector<std::pair<int, std::string>> reports;
 };
+
+// The whole content of a file (empty when it cannot be read).
+inline std::string Slurp(const std::string& path) {
+    std::ostringstream bytes;
+    bytes << std::ifstream(path, std::ios::binary).rdbuf();
+    return bytes.str();
+}
+
+// Sound output through one of SDL's device-less drivers: "dummy", or "disk" writing every
+// buffer to `file` as fast as the device asks for it.
+inline void UseSoundDriver(const char* driver, const char* file = "/dev/null") {
+    setenv("SDL_AUDIODRIVER", driver, 1);
+    setenv("SDL_DISKAUDIOFILE", file, 1);
+    setenv("SDL_DISKAUDIODELAY", "0", 1);
+}
 
 // Gives each test a fresh directory, removed afterwards, and keeps the reports made meanwhile.
 class TempDirTest : public ::testing::Test {

@@ -106,7 +106,8 @@ TEST_F(ToolkitTest, Confirm3AnswersByButtonAndCloseIsTheLast) {
     EXPECT_FALSE(XtIsManaged(alert.GetDialog())) << "answered alerts leave the screen";
 }
 
-// A browser that records what it was asked to open and store.
+// A browser that records what it was asked to open and store, and lists only the names
+// without "skip" in them (after Motif's own search).
 class RecordingManager : public KLFileManager {
   public:
     RecordingManager(Widget parent, std::string dir)
@@ -120,6 +121,14 @@ class RecordingManager : public KLFileManager {
     const char* DefaultDirectory() override { return dir_.c_str(); }
     const char* FileTypeName() override { return "Testfile"; }
     const char* Extension() override { return "tst"; }
+    int DoPostFilter() override { return 1; }
+    int FilterFileList(int count, char** names) override {
+        int kept = 0;
+        for (int i = 0; i < count; i++)
+            if (!std::strstr(names[i], "skip"))
+                names[kept++] = names[i];
+        return kept;
+    }
     std::string retrieved, stored;
 
   private:
@@ -132,6 +141,7 @@ class FileManagerTest : public ToolkitTest {
         dir = fs::temp_directory_path() / ("chirrup-fm-" + std::to_string(getpid()));
         fs::create_directories(dir + "/sub");
         std::ofstream(dir + "/a.tst") << "a\n";
+        std::ofstream(dir + "/skip.tst") << "s\n";
     }
     void TearDown() override { fs::remove_all(dir); }
     // Types `path` into the browser and presses OK, once it is up.
@@ -147,35 +157,61 @@ class FileManagerTest : public ToolkitTest {
         guitest::Click(ok);
         return true;
     }
+    // The names in the browser's file list.
+    static std::vector<std::string> Listed(KLFileManager& m) {
+        XmStringTable items = nullptr;
+        int count = 0;
+        XtVaGetValues(m.Browser(), XmNfileListItems, &items, XmNfileListItemCount, &count, nullptr);
+        std::vector<std::string> listed;
+        for (int i = 0; i < count; i++) {
+            char* text = nullptr;
+            XmStringGetLtoR(items[i], const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
+            listed.push_back(text ? text : "");
+            XtFree(text);
+        }
+        return listed;
+    }
     // The browser's own alert (made under the same parent), or null.
     static Widget Notice() {
         Widget w = XtNameToWidget(form, "*Attention");
         return w && XtIsManaged(w) ? w : nullptr;
     }
-    static std::string MessageOf(Widget box) { return guitest::XmText(box, XmNmessageString); }
+    // Presses `button` of the browser's own alert once it is up, noting its message.
+    static bool Answer(unsigned char button, std::string* told = nullptr) {
+        Widget notice = Notice();
+        if (!notice || !Viewable(XmMessageBoxGetChild(notice, button)))
+            return false;
+        if (told)
+            *told = guitest::XmText(notice, XmNmessageString);
+        return PressWhenShown(XmMessageBoxGetChild(notice, button));
+    }
     std::string dir;
 };
 
-TEST_F(FileManagerTest, RetrieveRemembersTheFolderAndRefusesFolders) {
+// The list leaves out what the post-filter drops; retrieving remembers the folder and
+// refuses folders; storing over a file asks first ("Cancel" goes back to the browser,
+// cancelling it stores nothing), a new name does not.
+TEST_F(FileManagerTest, RetrieveAndStoreAs) {
     RecordingManager m(form, dir);
     EXPECT_EQ(KLFileManager::FilterMask(m.Pattern(), m.Extension()), "*.tst");
-    Poll choose([&] { return Choose(m, dir + "/a.tst"); });
+    std::vector<std::string> listed;
+    Poll choose([&] {
+        if (listed.empty() && m.Waiting() &&
+            Viewable(XmFileSelectionBoxGetChild(m.Browser(), XmDIALOG_OK_BUTTON)))
+            listed = Listed(m);
+        return Choose(m, dir + "/a.tst");
+    });
     EXPECT_EQ(m.Retrieve(), 1);
+    EXPECT_EQ(listed, std::vector<std::string>{dir + "/a.tst"});
     EXPECT_EQ(m.retrieved, dir + "/a.tst");
     EXPECT_EQ(m.LastDirectory(), dir);
     EXPECT_EQ(m.LastName(), "a.tst");
-    // A folder chosen as a file: told, and nothing opened.
     m.retrieved.clear();
     std::string told;
     int step = 0;
     Poll folder([&] {
-        if (step == 0)
-            return Choose(m, dir + "/sub") && (++step, false);
-        Widget notice = Notice();
-        if (!notice || !Viewable(XmMessageBoxGetChild(notice, XmDIALOG_OK_BUTTON)))
-            return false;
-        told = MessageOf(notice);
-        return PressWhenShown(XmMessageBoxGetChild(notice, XmDIALOG_OK_BUTTON));
+        return step == 0 ? Choose(m, dir + "/sub") && (++step, false)
+                         : Answer(XmDIALOG_OK_BUTTON, &told);
     });
     EXPECT_EQ(m.Retrieve(), -1);
     EXPECT_TRUE(folder.Done());
@@ -183,88 +219,32 @@ TEST_F(FileManagerTest, RetrieveRemembersTheFolderAndRefusesFolders) {
     EXPECT_EQ(told, dir + "/sub is a folder; choose a Testfile file.");
     m.ResetDirectory();
     EXPECT_EQ(m.LastDirectory(), "");
-}
 
-TEST_F(FileManagerTest, StoringOverAFileAsksFirstAndCancelIsMinusOne) {
-    RecordingManager m(form, dir);
-    // Over a.tst: "Cancel" at the question goes back to the browser; cancelling it stores nothing.
-    int step = 0;
-    std::string asked;
+    step = 0;
     Poll refuse([&] {
         if (step == 0)
             return Choose(m, dir + "/a.tst") && (++step, false);
-        if (step == 1) {
-            Widget q = Notice();
-            if (!q || !Viewable(XmMessageBoxGetChild(q, XmDIALOG_CANCEL_BUTTON)))
-                return false;
-            asked = MessageOf(q);
-            return PressWhenShown(XmMessageBoxGetChild(q, XmDIALOG_CANCEL_BUTTON)) &&
-                   (++step, false);
-        }
-        if (!m.Waiting())
-            return false;
-        return PressWhenShown(XmFileSelectionBoxGetChild(m.Browser(), XmDIALOG_CANCEL_BUTTON));
+        if (step == 1)
+            return Answer(XmDIALOG_CANCEL_BUTTON, &told) && (++step, false);
+        return m.Waiting() &&
+               PressWhenShown(XmFileSelectionBoxGetChild(m.Browser(), XmDIALOG_CANCEL_BUTTON));
     });
     EXPECT_EQ(m.StoreAs(1), -1);
-    EXPECT_EQ(asked, dir + "/a.tst already exists. Replace it?");
+    EXPECT_EQ(told, dir + "/a.tst already exists. Replace it?");
     EXPECT_TRUE(m.stored.empty());
-    // "Replace" stores.
     step = 0;
     Poll replace([&] {
-        if (step == 0)
-            return Choose(m, dir + "/a.tst") && (++step, false);
-        Widget q = Notice();
-        return q && PressWhenShown(XmMessageBoxGetChild(q, XmDIALOG_OK_BUTTON));
+        return step == 0 ? Choose(m, dir + "/a.tst") && (++step, false)
+                         : Answer(XmDIALOG_OK_BUTTON);
     });
     EXPECT_EQ(m.StoreAs(1), 1);
     EXPECT_EQ(m.stored, dir + "/a.tst");
-    // A new name is stored without a question.
     Poll fresh([&] { return Choose(m, dir + "/new.tst"); });
     EXPECT_EQ(m.StoreAs(1), 1);
     EXPECT_EQ(m.stored, dir + "/new.tst");
 }
 
-// A browser that lists only the names without "skip" in them.
-class FilteringManager : public RecordingManager {
-  public:
-    using RecordingManager::RecordingManager;
-    int DoPostFilter() override { return 1; }
-    int FilterFileList(int count, char** names) override {
-        int kept = 0;
-        for (int i = 0; i < count; i++)
-            if (!std::strstr(names[i], "skip"))
-                names[kept++] = names[i];
-        return kept;
-    }
-};
-
-TEST_F(FileManagerTest, PostFilterDropsNamesFromTheList) {
-    std::ofstream(dir + "/skip.tst") << "s\n";
-    FilteringManager m(form, dir);
-    std::vector<std::string> listed;
-    Poll look([&] {
-        if (!m.Waiting())
-            return false;
-        Widget cancel = XmFileSelectionBoxGetChild(m.Browser(), XmDIALOG_CANCEL_BUTTON);
-        if (!Viewable(cancel))
-            return false;
-        XmStringTable items = nullptr;
-        int count = 0;
-        XtVaGetValues(m.Browser(), XmNfileListItems, &items, XmNfileListItemCount, &count, nullptr);
-        for (int i = 0; i < count; i++) {
-            char* text = nullptr;
-            XmStringGetLtoR(items[i], const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-            listed.push_back(text ? text : "");
-            XtFree(text);
-        }
-        return PressWhenShown(cancel);
-    });
-    EXPECT_EQ(m.Retrieve(), -1);
-    ASSERT_EQ(listed.size(), 1u);
-    EXPECT_EQ(listed[0], dir + "/a.tst");
-}
-
-TEST_F(ToolkitTest, ImageViewMixesByFadeAndShowsBackgroundWithoutImage) {
+TEST_F(ToolkitTest, ImageViewFadesAndImageButtonDoubleClicks) {
     KLImageView* view = dynamic_cast<KLImageView*>(
         KLFiend::FromWidget(KLImageView::Create(form, const_cast<char*>("view"), nullptr, 0)));
     ASSERT_NE(view, nullptr);
@@ -297,9 +277,8 @@ TEST_F(ToolkitTest, ImageViewMixesByFadeAndShowsBackgroundWithoutImage) {
     guitest::Settle();
     EXPECT_EQ(guitest::PixelAt(w, 100, 50), background);
     XtDestroyWidget(w);
-}
 
-TEST_F(ToolkitTest, ImageButtonPressAndDoubleClick) {
+    // An image button: a click presses it; two presses close together are a double click.
     auto* button = dynamic_cast<KLImageButton*>(
         KLFiend::FromWidget(KLImageButton::Create(form, const_cast<char*>("tile"), nullptr, 0)));
     ASSERT_NE(button, nullptr);
@@ -322,8 +301,6 @@ TEST_F(ToolkitTest, ImageButtonPressAndDoubleClick) {
     EXPECT_EQ(doubles, 1);
     button->Pressed(100060);  // a third press starts a new pair
     EXPECT_EQ(doubles, 1);
-    button->SetState(1);
-    EXPECT_EQ(button->GetState(), 1);
     XtDestroyWidget(button->GetWidget());
 }
 

@@ -52,8 +52,8 @@ class WidgetTreeTest : public ::testing::Test {
     static void SetUpTestSuite() {
         Widget shell = guitest::Shell();
         ASSERT_NE(shell, nullptr);
-        top = XtVaAppCreateShell("treeTest", "Chirrup", topLevelShellWidgetClass,
-                                 XtDisplay(shell), nullptr);
+        top = XtVaAppCreateShell("treeTest", "Chirrup", topLevelShellWidgetClass, XtDisplay(shell),
+                                 nullptr);
         KLXmGnome::BuildWidgetTree(top, kTable);
         XtRealizeWidget(top);
     }
@@ -61,43 +61,45 @@ class WidgetTreeTest : public ::testing::Test {
 };
 Widget WidgetTreeTest::top = nullptr;
 
-TEST_F(WidgetTreeTest, RowsHangUnderTheParentTheirDepthGivesAndAreManagedByMarker) {
-    Widget form = KLXmGnome::FindWidget("testForm");
+Widget Find(const char* name, Widget root = nullptr) {
+    return KLXmGnome::FindWidget(name, root);
+}
+Widget SubMenu(const char* cascade) {
+    Widget menu = nullptr;
+    XtVaGetValues(Find(cascade), XmNsubMenuId, &menu, nullptr);
+    return menu;
+}
+
+// Rows hang under the parent their depth gives, managed by their marker; pulldowns hang from
+// their cascade and hold their items; FindWidget takes the first of repeated names under the
+// root it is given.
+TEST_F(WidgetTreeTest, RowsPulldownsAndNames) {
+    Widget form = Find("testForm");
     ASSERT_NE(form, nullptr);
     EXPECT_EQ(XtParent(form), top);
-    EXPECT_EQ(XtParent(KLXmGnome::FindWidget("testBar")), form);
-    EXPECT_TRUE(XtIsManaged(KLXmGnome::FindWidget("testBar")));
-    Widget hidden = KLXmGnome::FindWidget("testHidden");
+    EXPECT_EQ(XtParent(Find("testBar")), form);
+    EXPECT_TRUE(XtIsManaged(Find("testBar")));
+    Widget hidden = Find("testHidden");
     ASSERT_NE(hidden, nullptr);
     EXPECT_EQ(XtParent(hidden), form);
     EXPECT_FALSE(XtIsManaged(hidden));
-}
 
-TEST_F(WidgetTreeTest, PulldownsHangFromTheirCascadeAndHoldTheirItems) {
-    Widget cascade = KLXmGnome::FindWidget("testFile");
-    Widget menu = KLXmGnome::FindWidget("testFileMenu");
-    ASSERT_NE(cascade, nullptr);
-    ASSERT_NE(menu, nullptr);
-    Widget subMenu = nullptr;
-    XtVaGetValues(cascade, XmNsubMenuId, &subMenu, nullptr);
-    EXPECT_EQ(subMenu, menu);
-    EXPECT_EQ(XtParent(KLXmGnome::FindWidget("testOpen")), menu);
-    EXPECT_EQ(XtParent(KLXmGnome::FindWidget("testQuit")), menu);
-    Widget editSub = nullptr;
-    XtVaGetValues(KLXmGnome::FindWidget("testEdit"), XmNsubMenuId, &editSub, nullptr);
-    EXPECT_EQ(editSub, KLXmGnome::FindWidget("testEditMenu"));
-}
+    Widget fileMenu = Find("testFileMenu"), editMenu = Find("testEditMenu");
+    ASSERT_TRUE(fileMenu && editMenu);
+    EXPECT_EQ(SubMenu("testFile"), fileMenu);
+    EXPECT_EQ(SubMenu("testEdit"), editMenu);
+    EXPECT_EQ(XtParent(Find("testOpen")), fileMenu);
+    EXPECT_EQ(XtParent(Find("testQuit")), fileMenu);
 
-TEST_F(WidgetTreeTest, FindWidgetTakesTheFirstOfRepeatedNamesAndHonoursTheRoot) {
-    Widget first = KLXmGnome::FindWidget("sepMenu");
+    Widget first = Find("sepMenu");
     ASSERT_NE(first, nullptr);
-    EXPECT_EQ(XtParent(first), KLXmGnome::FindWidget("testFileMenu"));
-    Widget underEdit = KLXmGnome::FindWidget("sepMenu", KLXmGnome::FindWidget("testEditMenu"));
+    EXPECT_EQ(XtParent(first), fileMenu);
+    Widget underEdit = Find("sepMenu", editMenu);
     ASSERT_NE(underEdit, nullptr);
     EXPECT_NE(underEdit, first);
-    EXPECT_EQ(KLXmGnome::FindWidget("testOpen", KLXmGnome::FindWidget("testEditMenu")), nullptr);
-    EXPECT_EQ(KLXmGnome::FindWidget("noSuchWidget"), nullptr);
-    EXPECT_EQ(KLXmGnome::FindWidget(nullptr), nullptr);
+    EXPECT_EQ(Find("testOpen", editMenu), nullptr);
+    EXPECT_EQ(Find("noSuchWidget"), nullptr);
+    EXPECT_EQ(Find(nullptr), nullptr);
 }
 
 TEST_F(WidgetTreeTest, FiendsAreFoundByNameAndDieWithTheirWidget) {
@@ -110,13 +112,17 @@ TEST_F(WidgetTreeTest, FiendsAreFoundByNameAndDieWithTheirWidget) {
     guitest::Settle();
     EXPECT_EQ(LabelFiend::alive, before - 1);
     EXPECT_EQ(KLXmGnome::FindFiend("testFiend"), nullptr);
-    EXPECT_EQ(KLXmGnome::FindWidget("testFiend"), nullptr);
+    EXPECT_EQ(Find("testFiend"), nullptr);
 }
 
-void count_cb(Widget, XtPointer clientData, XtPointer) { ++*static_cast<int*>(clientData); }
+void count_cb(Widget, XtPointer clientData, XtPointer) {
+    ++*static_cast<int*>(clientData);
+}
 
-TEST_F(WidgetTreeTest, MenuEntriesAreAddedAndEmptiedKeepingTheFirstOnes) {
-    Widget menu = KLXmGnome::FindWidget("testEditMenu");
+// Menu entries are added and emptied keeping the first ones; AddCallback finds its widget
+// by name and ignores unknown names.
+TEST_F(WidgetTreeTest, MenuEntriesAndCallbacks) {
+    Widget menu = Find("testEditMenu");
     int calls = 0;
     Widget a = KLXmGnome::AddMenuEntry(menu, "alpha", count_cb, &calls);
     KLXmGnome::AddMenuEntry(menu, "beta", count_cb, &calls);
@@ -130,15 +136,12 @@ TEST_F(WidgetTreeTest, MenuEntriesAreAddedAndEmptiedKeepingTheFirstOnes) {
     guitest::Settle();
     XtVaGetValues(menu, XmNnumChildren, &count, nullptr);
     EXPECT_EQ(count, 1u);
-    EXPECT_NE(KLXmGnome::FindWidget("sepMenu", menu), nullptr);
-}
+    EXPECT_NE(Find("sepMenu", menu), nullptr);
 
-TEST_F(WidgetTreeTest, AddCallbackFindsTheWidgetByNameAndIgnoresUnknownNames) {
-    int calls = 0;
     KLXmGnome::AddCallback("testOpen", XmNactivateCallback, count_cb, &calls);
     KLXmGnome::AddCallback("noSuchWidget", XmNactivateCallback, count_cb, &calls);
-    XtCallCallbacks(KLXmGnome::FindWidget("testOpen"), XmNactivateCallback, nullptr);
-    EXPECT_EQ(calls, 1);
+    XtCallCallbacks(Find("testOpen"), XmNactivateCallback, nullptr);
+    EXPECT_EQ(calls, 2);
 }
 
 }  // namespace
