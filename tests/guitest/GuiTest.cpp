@@ -82,16 +82,25 @@ void Settle() {
     sync_and_process();
 }
 
+bool Viewable(Widget widget) {
+    if (!widget || (!XtIsShell(widget) && !XtIsManaged(widget)))
+        return false;
+    Widget windowed = XtIsWidget(widget) ? widget : XtParent(widget);
+    XWindowAttributes attributes;
+    return XtIsRealized(windowed) &&
+           XGetWindowAttributes(XtDisplay(windowed), XtWindow(windowed), &attributes) &&
+           attributes.map_state == IsViewable;
+}
+
 bool WaitMapped(Widget widget, double seconds) {
-    return WaitFor(
-        [widget] {
-            if (!XtIsRealized(widget))
-                return false;
-            XWindowAttributes attributes;
-            return XGetWindowAttributes(XtDisplay(widget), XtWindow(widget), &attributes) &&
-                   attributes.map_state == IsViewable;
-        },
-        seconds);
+    return WaitFor([widget] { return Viewable(widget); }, seconds);
+}
+
+std::vector<Widget> Children(Widget widget) {
+    WidgetList children = nullptr;
+    Cardinal count = 0;
+    XtVaGetValues(widget, XmNchildren, &children, XmNnumChildren, &count, nullptr);
+    return std::vector<Widget>(children, children + count);
 }
 
 void MoveTo(Widget widget, int x, int y) {
@@ -146,6 +155,13 @@ void DoubleClick(Widget widget, int button, int x, int y) {
     Settle();
 }
 
+bool ClickWhenViewable(Widget button) {
+    if (!Viewable(button))
+        return false;
+    Click(button);
+    return true;
+}
+
 void TypeKey(unsigned long keysym, unsigned int modifiers) {
     Display* d = GetDisplay();
     KeyCode code = XKeysymToKeycode(d, keysym);
@@ -165,13 +181,14 @@ void TypeKey(unsigned long keysym, unsigned int modifiers) {
 
 void TypeText(const std::string& text) {
     for (char c : text) {
-        KeySym sym = c == ' ' ? XK_space : c == '\n' ? XK_Return : static_cast<KeySym>(c);
-        if (c == '.')
-            sym = XK_period;
-        if (c == '-')
-            sym = XK_minus;
-        if (c == ':')
-            sym = XK_colon;
+        KeySym sym = static_cast<KeySym>(c);
+        for (auto [from, to] : {std::pair<char, KeySym>{' ', XK_space},
+                                {'\n', XK_Return},
+                                {'.', XK_period},
+                                {'-', XK_minus},
+                                {':', XK_colon}})
+            if (c == from)
+                sym = to;
         TypeKey(sym);
     }
 }
