@@ -44,10 +44,6 @@ struct SignalCase {
     bool raisedHoldingALock;
 };
 
-void PrintTo(const SignalCase& c, std::ostream* os) {
-    *os << sigabbrev_np(c.signal) << (c.raisedHoldingALock ? " raised holding a lock" : " sent");
-}
-
 int reportEnd = -1;  // the child's end of the pipe it reports on
 pthread_mutex_t theLock;
 SignalCase theCase;

@@ -5,12 +5,13 @@
 #include <Xm/TextF.h>
 #include <Xm/Xm.h>
 
-#include <filesystem>
 #include <fstream>
 #include <string>
 #include <vector>
 
+#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
+#include "testkit/TempDir.h"
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLString.h"
 #include "toolkit/xm/KLAlert.h"
@@ -18,8 +19,6 @@
 #include "window/Gnome.h"
 #include "window/WindowTestUtil.h"
 #include "workspace/Imp.h"
-
-namespace fs = std::filesystem;
 
 namespace {
 
@@ -43,12 +42,12 @@ class InfoTest : public ::testing::Test {
         KLAlert* alert = gnome->attentionAlert.get();
         told.clear();
         auto step = [&] {
-            if (!alert->Waiting() || !windowtest::Viewable(alert->Button(button)))
+            if (!alert->Waiting() || !guitest::Viewable(alert->Button(button)))
                 return false;
             told.push_back(MessageOf(alert));
-            return windowtest::ClickWhenViewable(alert->Button(button));
+            return guitest::ClickWhenViewable(alert->Button(button));
         };
-        windowtest::AnswerScript script({step, step, step, step});
+        guitest::AnswerScript script({step, step, step, step});
         action();
         EXPECT_FALSE(told.empty()) << "nothing was told";
         return told.empty() ? "" : told.back();
@@ -57,7 +56,9 @@ class InfoTest : public ::testing::Test {
     Gnome* gnome = nullptr;
 };
 
-TEST_F(InfoTest, TimecodeShowsTimeAndFractionalFrame) {
+// The information bar shows time and fractional frame, the duration and the reference offset;
+// status reports show in the status line.
+TEST_F(InfoTest, InformationBarAndStatusLine) {
     CueTime::default_fps = 30;
     gnome->DisplayTimecode(CueTime::FromTicks(300));  // one and a half frames
     EXPECT_EQ(LabelOf("infoFrameValue"), "1.5");
@@ -68,14 +69,14 @@ TEST_F(InfoTest, TimecodeShowsTimeAndFractionalFrame) {
     EXPECT_EQ(LabelOf("infoDurationValue"), "150");
     gnome->DisplayReferenceOffset(CueTime::FromTicks(2400));
     EXPECT_EQ(LabelOf("refAdjust"), "Set Reference Time [12]");
+    KLStatus("Parsing keyset description.");
+    EXPECT_EQ(LabelOf("statusLine"), "Parsing keyset description.");
 }
 
-TEST_F(InfoTest, VersionIsInformedWithOk) {
-    std::string told = Answer([] { Gnome::version_cb(nullptr, XtPointer(2), nullptr); });
-    EXPECT_EQ(told, "Tessel|Marlin Parlando and Facial Animation Version 2.0 (9704300208)");
-}
-
-TEST_F(InfoTest, ConfirmAsksInTheWindowAndAssumesOkInBatchMode) {
+// The version is told with OK; Confirm asks in the window and assumes OK in batch mode.
+TEST_F(InfoTest, VersionAndConfirm) {
+    EXPECT_EQ(Answer([] { Gnome::version_cb(nullptr, XtPointer(2), nullptr); }),
+              "Tessel|Marlin Parlando and Facial Animation Version 2.0 (9704300208)");
     int answer = -1;
     EXPECT_EQ(Answer([&] { answer = gnome->Confirm("Go on?", "Yes", "No"); }, 1), "Go on?");
     EXPECT_EQ(answer, 0);
@@ -89,8 +90,8 @@ TEST_F(InfoTest, ConfirmAsksInTheWindowAndAssumesOkInBatchMode) {
 }
 
 TEST_F(InfoTest, DamagedOrMissingFilesAreToldAndTheWindowGoesOn) {
-    std::string dir = fs::temp_directory_path() / ("chirrup-info-" + std::to_string(getpid()));
-    fs::create_directories(dir);
+    testkit::TempDir temp;
+    const std::string& dir = temp.path();
     std::string garbage = dir + "/garbage.kset";
     std::ofstream(garbage) << "\x01\x02 not a keyset\nbegin keyset\n";
     int result = -1;
@@ -102,13 +103,11 @@ TEST_F(InfoTest, DamagedOrMissingFilesAreToldAndTheWindowGoesOn) {
     EXPECT_EQ(told, "Failed to open track file [" + dir + "/missing.track].");
     told = Answer([&] { result = theImp.LoadKeyset(dir.c_str()); });  // a folder
     EXPECT_EQ(told, "Failed to open keyset file [" + dir + "].");
-    fs::remove_all(dir);
 }
 
 TEST_F(InfoTest, ErrorFlagTurnsSolidOnALoggedErrorAndClearsWhenTheLogIsViewed) {
-    std::string dir = fs::temp_directory_path() / ("chirrup-flag-" + std::to_string(getpid()));
-    fs::create_directories(dir);
-    theImp.SetErrorFilename((dir + "/errlog.vx").c_str());
+    testkit::TempDir dir;
+    theImp.SetErrorFilename((dir / "errlog.vx").c_str());
     Widget flag = KLXmGnome::FindWidget("errorFlag");
     ASSERT_NE(flag, nullptr);
     Pixel foreground = 0, background = 0, parentBackground = 0;
@@ -125,11 +124,10 @@ TEST_F(InfoTest, ErrorFlagTurnsSolidOnALoggedErrorAndClearsWhenTheLogIsViewed) {
     unsetenv("TESSEL_USER_ERROR_READER");
     XtVaGetValues(flag, XmNbackground, &background, nullptr);
     EXPECT_EQ(background, parentBackground);
-    std::ifstream in(dir + "/errlog.vx");
+    std::ifstream in(dir / "errlog.vx");
     std::string log((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
     EXPECT_NE(log.find("Something went wrong in a test."), std::string::npos);
     EXPECT_NE(log.find("\n---------------------------------------\n"), std::string::npos);
-    fs::remove_all(dir);
 }
 
 TEST_F(InfoTest, AdjustRelLoadFillsTheDialogAndCopiesBackTheAnswer) {
@@ -137,8 +135,8 @@ TEST_F(InfoTest, AdjustRelLoadFillsTheDialogAndCopiesBackTheAnswer) {
     char* ext = KLNewString("png");
     int start = 1, end = 24, by = 1, zoom = 2;
     Widget ok = KLXmGnome::FindWidget("refLoadOk");
-    windowtest::AnswerScript script({[&] {
-        if (!windowtest::Viewable(ok))
+    guitest::AnswerScript script({[&] {
+        if (!guitest::Viewable(ok))
             return false;
         guitest::Settle();
         XmTextFieldSetString(KLXmGnome::FindWidget("refPrefix"), const_cast<char*>("pix/ref."));
@@ -146,7 +144,7 @@ TEST_F(InfoTest, AdjustRelLoadFillsTheDialogAndCopiesBackTheAnswer) {
         XmTextFieldSetString(KLXmGnome::FindWidget("refBy"), const_cast<char*>("3"));
         guitest::Settle();
         guitest::Screenshot("window-reference-dialog");
-        return windowtest::ClickWhenViewable(ok);
+        return guitest::ClickWhenViewable(ok);
     }});
     EXPECT_EQ(gnome->AdjustRelLoad(&prefix, &ext, &start, &end, &by, &zoom), 1);
     EXPECT_TRUE(script.Finished());
@@ -159,13 +157,6 @@ TEST_F(InfoTest, AdjustRelLoadFillsTheDialogAndCopiesBackTheAnswer) {
     EXPECT_EQ(gnome->refImageView->Zoom(), 3);
     delete[] prefix;
     delete[] ext;
-}
-
-TEST_F(InfoTest, StatusReportsShowInTheStatusLine) {
-    int saved = KLErrHandler::outputLevel;
-    KLStatus("Parsing keyset description.");
-    EXPECT_EQ(LabelOf("statusLine"), "Parsing keyset description.");
-    KLErrHandler::outputLevel = saved;
 }
 
 }  // namespace

@@ -18,6 +18,7 @@
 #include <string>
 
 #include "chart/KLSyncChart.h"
+#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
 #include "model/KLKeyEvent.h"
 #include "model/KLKeySet.h"
@@ -56,14 +57,7 @@ Widget L(const char* name) {
 }
 
 std::string label_of(Widget w) {
-    XmString s = nullptr;
-    XtVaGetValues(w, XmNlabelString, &s, nullptr);
-    char* text = nullptr;
-    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-    std::string out = text ? text : "";
-    XtFree(text);
-    XmStringFree(s);
-    return out;
+    return guitest::XmText(w, XmNlabelString);
 }
 
 // The character set item `position` (1-based) of a list is written in.
@@ -128,14 +122,10 @@ class Recognizers : public ::testing::Test {
         guitest::Click(W("recognizer"));
         Widget entry = nullptr;
         ASSERT_TRUE(guitest::WaitFor([&] {
-            WidgetList children = nullptr;
-            Cardinal count = 0;
-            XtVaGetValues(W("recognizerMenu"), XmNchildren, &children, XmNnumChildren, &count,
-                          nullptr);
-            for (Cardinal i = 0; i < count; ++i)
-                if (label_of(children[i]) == name)
-                    entry = children[i];
-            return entry && windowtest::Viewable(entry);
+            for (Widget child : guitest::Children(W("recognizerMenu")))
+                if (label_of(child) == name)
+                    entry = child;
+            return guitest::Viewable(entry);
         }));
         guitest::Click(entry);
         guitest::Settle();
@@ -148,11 +138,23 @@ class Recognizers : public ::testing::Test {
     Widget panel_item(const char* recognizer, const char* item) {
         return gnome->find_recognizer_widget(recognizer, item, nullptr);
     }
+    // The chart shows the mouth's track over the dialogue and `after` seconds more.
+    KLSyncChart* ChartOverDialogue(double after) {
+        EXPECT_EQ(theImp.LoadSound((project + "/misc_data/dialogue.aiff").c_str()), 1);
+        KLSyncChart* chart = gnome->syncChart;
+        chart->SetSound(theImp.sound.get());
+        chart->SetKeyTrack(theImp.GetKeyTrack(0));
+        chart->SetUserDuration(CueTime::FromSeconds(theImp.sound->Length() + after));
+        chart->ZoomReset();
+        return chart;
+    }
     Gnome* gnome = nullptr;
     std::string project;
     KLKeySet* mouth = nullptr;
 };
 
+// The menu and panels come from the plug-ins; a menu entry whose plug-in cannot make a
+// recognizer says so and adds nothing.
 TEST_F(Recognizers, MenuAndPanelsComeFromThePlugins) {
     EXPECT_STREQ(theImp.recognizers.HeadKey(), "Loudness");
     EXPECT_STREQ(theImp.recognizers.NextKey("Loudness"), "Phoneme");
@@ -174,23 +176,30 @@ TEST_F(Recognizers, MenuAndPanelsComeFromThePlugins) {
         }
     }
     EXPECT_EQ(panel_item("Nobody", nullptr), nullptr);
+
+    KLAlert* alert = gnome->attentionAlert.get();
+    std::string told;
+    guitest::AnswerScript script({[&] {
+        if (!alert->Waiting() || !guitest::Viewable(alert->Button(0)))
+            return false;
+        told = guitest::XmText(alert->GetDialog(), XmNmessageString);
+        return guitest::ClickWhenViewable(alert->Button(0));
+    }});
+    const size_t before = mouth->recognizers.size();
+    Gnome::create_recognize_cb(nullptr, const_cast<char*>("Vowel"), nullptr);
+    EXPECT_TRUE(script.Finished());
+    EXPECT_EQ(told, "Failed to locate plug-in recognizer [Vowel].");
+    EXPECT_EQ(mouth->recognizers.size(), before);
 }
 
 TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
-    ASSERT_EQ(theImp.LoadSound((project + "/misc_data/dialogue.aiff").c_str()), 1);
-    // The chart shows the mouth's track over the whole dialogue.
-    KLSyncChart* chart = gnome->syncChart;
-    ASSERT_TRUE(chart);
-    chart->SetSound(theImp.sound.get());
-    chart->SetKeyTrack(theImp.GetKeyTrack(0));
-    chart->SetUserDuration(CueTime::FromSeconds(theImp.sound->Length()));
-    chart->ZoomReset();
+    ChartOverDialogue(0);
     choose_from_menu("Phoneme");
     CueRecognizer* r = mouth->GetRecognizer("Phoneme");
     ASSERT_TRUE(r);
     EXPECT_EQ(r->shown, 1);
     Widget container = panel_item("Phoneme", nullptr);
-    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(container); }));
     EXPECT_EQ(label_of(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
     EXPECT_EQ(label_of(panel_item("Phoneme", "value-step")), "     1 ");
     EXPECT_EQ(label_of(panel_item("Phoneme", "value-minimum")), "     2 ");
@@ -221,7 +230,7 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     click_panel("Phoneme", "Recognize");
     ASSERT_TRUE(guitest::WaitFor([&] { return track->events.Count() > 10; }, 30.0));
     guitest::Settle();
-    EXPECT_FALSE(windowtest::Viewable(gnome->informationAlert->GetDialog()));
+    EXPECT_FALSE(guitest::Viewable(gnome->informationAlert->GetDialog()));
     // The pause between the sentences (0.833 s to 1.222 s) holds the rest shape.
     const int rest = mouth->GetKeyShapeId("rest");
     int restInPause = 0;
@@ -235,21 +244,15 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     guitest::Screenshot("window-phoneme-recognized");
 
     click_panel("Phoneme", "Dismiss");
-    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(container); }));
+    EXPECT_TRUE(guitest::WaitFor([&] { return !guitest::Viewable(container); }));
     EXPECT_EQ(r->shown, 0);
 }
 
 // A recognizer that cannot run, or a region past the end of the sound, leaves the region's
 // keys as they were.
 TEST_F(Recognizers, RecognitionThatFindsNothingKeepsTheRegionsKeys) {
-    ASSERT_EQ(theImp.LoadSound((project + "/misc_data/dialogue.aiff").c_str()), 1);
-    KLSyncChart* chart = gnome->syncChart;
-    ASSERT_TRUE(chart);
-    chart->SetSound(theImp.sound.get());
-    chart->SetKeyTrack(theImp.GetKeyTrack(0));
+    KLSyncChart* chart = ChartOverDialogue(2.0);
     const double length = theImp.sound->Length();
-    chart->SetUserDuration(CueTime::FromSeconds(length + 2.0));
-    chart->ZoomReset();
     Gnome::create_recognize_cb(nullptr, const_cast<char*>("Phoneme"), nullptr);
     CueRecognizer* r = mouth->GetRecognizer("Phoneme");
     ASSERT_TRUE(r);
@@ -274,7 +277,7 @@ TEST_F(Recognizers, RecognitionThatFindsNothingKeepsTheRegionsKeys) {
     chart->SetRegionRange(CueTime::FromSeconds(0.5), CueTime::FromSeconds(2.0));
     Gnome::recognize_cb(nullptr, r, nullptr);
     EXPECT_EQ(keys(), before);
-    EXPECT_FALSE(windowtest::Viewable(gnome->informationAlert->GetDialog()));
+    EXPECT_FALSE(guitest::Viewable(gnome->informationAlert->GetDialog()));
 
     // A region wholly past the sound's end has nothing to hear.
     std::istringstream model("models \"" + std::string(PhonemeModels) + "\"\nend\n");
@@ -292,14 +295,14 @@ TEST_F(Recognizers, RecognitionThatFindsNothingKeepsTheRegionsKeys) {
     chart->SetRegionRange(CueTime(), CueTime());
 }
 
-// Loudness's sliders with their value labels, and the messages for controls that are not
-// there.
+// Loudness's sliders with their value labels, the messages for controls that are not there;
+// a keyset without the recognizer hides its panel and coming back shows it for the keyset.
 TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
     choose_from_menu("Loudness");
     CueRecognizer* r = mouth->GetRecognizer("Loudness");
     ASSERT_TRUE(r);
     ASSERT_TRUE(
-        guitest::WaitFor([&] { return windowtest::Viewable(panel_item("Loudness", nullptr)); }));
+        guitest::WaitFor([&] { return guitest::Viewable(panel_item("Loudness", nullptr)); }));
     EXPECT_EQ(label_of(panel_item("Loudness", "value-step")), "     1 ");
     EXPECT_EQ(label_of(panel_item("Loudness", "value-half")), " -36.000");
     EXPECT_EQ(label_of(panel_item("Loudness", "value-open")), " -24.000");
@@ -323,6 +326,17 @@ TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
     EXPECT_NE(err.find("Couldn't find slider gain"), std::string::npos) << err;
     EXPECT_NE(err.find("Couldn't find option colour"), std::string::npos) << err;
     EXPECT_NE(err.find("Couldn't find widget Stranger"), std::string::npos) << err;
+
+    Widget container = panel_item("Loudness", nullptr);
+    ASSERT_EQ(theImp.GetKeySet(1)->GetRecognizer("Loudness"), nullptr);
+    gnome->SetActiveKeyset(1);
+    gnome->update_recognizer_dialogs();
+    EXPECT_TRUE(guitest::WaitFor([&] { return !guitest::Viewable(container); }));
+    EXPECT_EQ(r->shown, 1) << "still wanted on the mouth";
+    gnome->SetActiveKeyset(0);
+    gnome->update_recognizer_dialogs();
+    EXPECT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(container); }));
+    EXPECT_EQ(label_of(panel_item("Loudness", "label")), "Recognizer [Loudness] (mouth)");
     click_panel("Loudness", "Dismiss");
 }
 
@@ -337,7 +351,7 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
     gnome->ShowRecognizerGui(r);
     click_panel("Loudness", "Configure");
     Widget dialog = W("linkDialog");
-    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(dialog); }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(dialog); }));
     raise(dialog);
     Widget targets = L("targetLister");
     Widget shapes = L("keyshapeLister");
@@ -397,7 +411,7 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
         << text.str();
     raise(dialog);
     guitest::Click(L("done_button"));
-    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(dialog); }));
+    EXPECT_TRUE(guitest::WaitFor([&] { return !guitest::Viewable(dialog); }));
     click_panel("Loudness", "Dismiss");
 }
 
@@ -407,7 +421,7 @@ TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
     CueRecognizer* r = mouth->GetRecognizer("Phoneme");
     ASSERT_TRUE(r);
     click_panel("Phoneme", "Configure");
-    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(W("linkDialog")); }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(W("linkDialog")); }));
     raise(W("linkDialog"));
     Widget targets = L("targetLister");
     click_item(targets, r->TargetIndex("OW") + 1);
@@ -425,51 +439,10 @@ TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
     guitest::Click(L("audition_button"));
     ASSERT_TRUE(guitest::WaitFor([&] { return heard() > before; }));
     guitest::Click(L("done_button"));
-    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(W("linkDialog")); }));
+    EXPECT_TRUE(guitest::WaitFor([&] { return !guitest::Viewable(W("linkDialog")); }));
     EXPECT_TRUE(guitest::WaitFor([] { return std::isnan(KLSoundControl::LastHanded().position); }))
         << "Dismiss stops the audition";
     click_panel("Phoneme", "Dismiss");
-}
-
-// A keyset without the recognizer hides its panel; coming back shows it again for the keyset.
-TEST_F(Recognizers, KeysetSwitchesHideAndShowPanels) {
-    choose_from_menu("Phoneme");
-    Widget container = panel_item("Phoneme", nullptr);
-    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
-    ASSERT_GE(theImp.keysetCount, 2);
-    ASSERT_EQ(theImp.GetKeySet(1)->GetRecognizer("Phoneme"), nullptr);
-    gnome->SetActiveKeyset(1);
-    gnome->update_recognizer_dialogs();
-    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(container); }));
-    EXPECT_EQ(mouth->GetRecognizer("Phoneme")->shown, 1) << "still wanted on the mouth";
-    gnome->SetActiveKeyset(0);
-    gnome->update_recognizer_dialogs();
-    EXPECT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
-    EXPECT_EQ(label_of(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
-    click_panel("Phoneme", "Dismiss");
-}
-
-// A menu entry whose plug-in cannot make a recognizer says so and adds nothing.
-TEST_F(Recognizers, UnknownRecognizerIsReported) {
-    KLAlert* alert = gnome->attentionAlert.get();
-    std::string told;
-    windowtest::AnswerScript script({[&] {
-        if (!alert->Waiting() || !windowtest::Viewable(alert->Button(0)))
-            return false;
-        XmString s = nullptr;
-        XtVaGetValues(alert->GetDialog(), XmNmessageString, &s, nullptr);
-        char* text = nullptr;
-        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-        told = text ? text : "";
-        XtFree(text);
-        XmStringFree(s);
-        return windowtest::ClickWhenViewable(alert->Button(0));
-    }});
-    const size_t before = mouth->recognizers.size();
-    Gnome::create_recognize_cb(nullptr, const_cast<char*>("Vowel"), nullptr);
-    EXPECT_TRUE(script.Finished());
-    EXPECT_EQ(told, "Failed to locate plug-in recognizer [Vowel].");
-    EXPECT_EQ(mouth->recognizers.size(), before);
 }
 
 }  // namespace

@@ -7,10 +7,10 @@
 #include <Xm/ToggleB.h>
 #include <Xm/Xm.h>
 
-#include <chrono>
 #include <cstring>
 #include <filesystem>
 
+#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
 #include "model/KLKey.h"
 #include "model/KLKeySet.h"
@@ -19,6 +19,7 @@
 #include "scene/gl/KLSceneView.h"
 #include "toolkit/KLImageSGI.h"
 #include "toolkit/xm/KLAlert.h"
+#include "window/EventPump.h"
 #include "window/Gnome.h"
 #include "window/WindowTestUtil.h"
 #include "workspace/Imp.h"
@@ -43,11 +44,7 @@ bool SameCamera(const KLCamera& a, const KLCamera& b) {
 class ViewsTest : public ::testing::Test {
   protected:
     void SetUp() override {
-        gnome = &windowtest::TheWindow();
-        if (theImp.keysetCount == 0) {
-            const std::string project = windowtest::DemoProject();
-            ASSERT_EQ(theImp.LoadKeyset((project + "/misc_data/demo.kset").c_str()), 1);
-        }
+        gnome = &windowtest::TheDemoWindow();
         ASSERT_TRUE(gnome->keyScene && gnome->mixScene);
         ASSERT_TRUE(gnome->keyScene->HasGL()) << "the test display offers no GL";
         ASSERT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
@@ -63,17 +60,7 @@ class ViewsTest : public ::testing::Test {
     // the view has drawn `count` more times, for at most five seconds.
     bool Steps(KLSceneView* view, int count) {
         const int until = view->Draws() + count;
-        const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(5);
-        XtAppContext app = KLXmGnome::AppContext();
-        while (view->Draws() < until && std::chrono::steady_clock::now() < limit) {
-            bool fired = false;
-            XtAppAddTimeOut(
-                app, 10, [](XtPointer done, XtIntervalId*) { *static_cast<bool*>(done) = true; },
-                &fired);
-            while (!fired)
-                XtAppProcessEvent(app, XtIMAll);
-        }
-        return view->Draws() >= until;
+        return windowtest::Pump([&] { return view->Draws() >= until; });
     }
     void PointerAt(int x, int y) {
         XTestFakeMotionEvent(guitest::GetDisplay(), -1, x, y, CurrentTime);
@@ -111,8 +98,8 @@ TEST_F(ViewsTest, TumbleDragAtARateFromTheAnchor) {
 }
 
 // The middle button turns only about the vertical axis, the right one only tilts; a second
-// button neither starts nor ends a drag.
-TEST_F(ViewsTest, ButtonsLockAxesAndASecondButtonIsIgnored) {
+// button neither starts nor ends a drag; while sound plays a drag moves nothing.
+TEST_F(ViewsTest, ButtonsLockAxesAndASecondButtonOrSoundStopsNothing) {
     KLSceneView* view = gnome->mixScene;
     for (int button : {2, 3}) {
         const KLCamera start = view->Camera();
@@ -136,27 +123,21 @@ TEST_F(ViewsTest, ButtonsLockAxesAndASecondButtonIsIgnored) {
         guitest::Release(button);
         ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 0; }));
     }
-}
-
-// While sound plays the arm adds no work procedure: the camera does not move.
-TEST_F(ViewsTest, NoDragWhileSoundPlays) {
-    KLSceneView* view = gnome->keyScene;
-    const KLCamera start = view->Camera();
+    const KLCamera start = gnome->keyScene->Camera();
     gnome->soundPlaying = 1;
     guitest::MoveTo(W("keyVuZoom"));
     guitest::Press(1);
     ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 1; }));
     PointerAt(gnome->anchorX + 80, gnome->anchorY);
-    guitest::Settle();
     guitest::Release(1);
     ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 0; }));
     gnome->soundPlaying = 0;
-    EXPECT_TRUE(SameCamera(view->Camera(), start));
+    EXPECT_TRUE(SameCamera(gnome->keyScene->Camera(), start));
 }
 
 // The four feedback toggles are one radio group setting the workspace's style; each style
-// draws differently.
-TEST_F(ViewsTest, FeedbackTogglesAreOneRadioGroup) {
+// draws differently. Turning loadGeometry informs once per run and only stores the flag.
+TEST_F(ViewsTest, FeedbackAndGeometryToggles) {
     const char* names[] = {"points", "lines", "polygons", "polygonsboth"};
     std::unique_ptr<KLImageSGI> pictures[4];
     for (int style : {1, 0, 3, 2}) {
@@ -165,7 +146,7 @@ TEST_F(ViewsTest, FeedbackTogglesAreOneRadioGroup) {
             EXPECT_EQ(XmToggleButtonGetState(W(names[i])), i == style) << names[i];
         EXPECT_EQ(theImp.feedback, style);
         EXPECT_EQ(theImp.scene->Feedback(), style);
-        EXPECT_FALSE(windowtest::Viewable(gnome->informationAlert->GetDialog()));
+        EXPECT_FALSE(guitest::Viewable(gnome->informationAlert->GetDialog()));
         pictures[style] = gnome->mixScene->DrawPix(320, 240);
         ASSERT_TRUE(pictures[style]);
         if (style == 2 || style == 1) {
@@ -175,13 +156,10 @@ TEST_F(ViewsTest, FeedbackTogglesAreOneRadioGroup) {
     }
     EXPECT_FALSE(SamePixels(*pictures[0], *pictures[1]));
     EXPECT_FALSE(SamePixels(*pictures[1], *pictures[2]));
-}
 
-// Turning loadGeometry informs once per run and only stores the flag.
-TEST_F(ViewsTest, LoadGeometryInformsOnce) {
     KLAlert* alert = gnome->attentionAlert.get();
-    windowtest::AnswerScript script({
-        [&] { return alert->Waiting() && windowtest::ClickWhenViewable(alert->Button(0)); },
+    guitest::AnswerScript script({
+        [&] { return alert->Waiting() && guitest::ClickWhenViewable(alert->Button(0)); },
     });
     XmToggleButtonSetState(W("loadGeometry"), False, True);
     EXPECT_TRUE(script.Finished());
@@ -189,7 +167,6 @@ TEST_F(ViewsTest, LoadGeometryInformsOnce) {
     EXPECT_EQ(theImp.geometryActive, 1) << "not before the next load";
     XmToggleButtonSetState(W("loadGeometry"), True, True);  // no question this time
     EXPECT_EQ(theImp.loadGeometry, 1);
-    EXPECT_EQ(gnome->geometryInformed, 1);
 }
 
 // keyVuSet keeps the key view's camera for look-at; keyVuClear lets look-at frame again.
@@ -213,10 +190,33 @@ TEST_F(ViewsTest, KeyViewCameraSetAndClear) {
     EXPECT_GT(view->Camera().distance, zoomed * 1.5f);
 }
 
-// Every key shape of the active keyset has a 160 x 121 picture and an 80 x 60 icon, grabbed
-// from the key view (also while the key image view stands in its place); different shapes
-// give different pictures.
-TEST_F(ViewsTest, KeysetImagesAreGrabbedPerKeyShape) {
+// Whichever alternative a view shows (key pictures, scene or blank), it fills the view's frame
+// rather than shrinking to a picture view with no picture yet. Every key shape of the active
+// keyset has a 160 x 121 picture and an 80 x 60 icon, grabbed from the key view (also while the
+// key image view stands in its place); different shapes give different pictures.
+TEST_F(ViewsTest, KeyImagesAndEveryViewChoiceFillTheirFrames) {
+    struct Choice {
+        int keyOn, keyMode, mixOn;
+        const char *key, *mix;
+    };
+    const Choice choices[] = {{1, 0, 1, "keyVu", "mixScn"},
+                              {1, 1, 0, "keyScn", "mixFake"},
+                              {0, 1, 1, "keyFake", "mixScn"},
+                              {1, 0, 0, "keyVu", "mixFake"}};
+    for (const Choice& c : choices) {
+        gnome->keyViewOn = c.keyOn;
+        gnome->keyViewMode = c.keyMode;
+        gnome->mixViewOn = c.mixOn;
+        gnome->SetViewStatus();
+        guitest::Settle();
+        for (const char* name : {c.key, c.mix}) {
+            ASSERT_TRUE(XtIsManaged(W(name))) << name;
+            Dimension width = 0, height = 0;
+            XtVaGetValues(W(name), XmNwidth, &width, XmNheight, &height, nullptr);
+            EXPECT_GE(width, 300) << name << " after choice " << c.key << "/" << c.mix;
+            EXPECT_GE(height, 220) << name << " after choice " << c.key << "/" << c.mix;
+        }
+    }
     gnome->keyViewMode = 0;
     gnome->SetViewStatus();
     ASSERT_FALSE(XtIsManaged(gnome->keyScene->GetWidget()));
@@ -240,6 +240,8 @@ TEST_F(ViewsTest, KeysetImagesAreGrabbedPerKeyShape) {
     EXPECT_EQ(set->imagesChanged, 1);
     EXPECT_FALSE(theImp.GetKeyTrack(gnome->GetActiveKeyset())->vuKeyFrames)
         << "the track is back on its events";
+    gnome->keyViewOn = gnome->keyViewMode = gnome->mixViewOn = 1;
+    gnome->SetViewStatus();
 }
 
 // The key view holds every keyset but the active one at its default shape; the mix view shows
@@ -266,52 +268,6 @@ TEST_F(ViewsTest, KeyViewHoldsOtherKeysetsStatic) {
     brows->RemoveKey(CueTime::FromFrames(20));
     theImp.PrepareKeyFrames(-1);
 }
-
-// Whichever alternative a view shows (key pictures, scene or blank), it fills the view's frame:
-// the frame keeps its size and does not shrink to a picture view that has no picture yet.
-TEST_F(ViewsTest, EveryViewChoiceFillsItsFrame) {
-    struct Choice {
-        int keyOn, keyMode, mixOn;
-        const char *key, *mix;
-    };
-    const Choice choices[] = {{1, 0, 1, "keyVu", "mixScn"},
-                              {1, 1, 0, "keyScn", "mixFake"},
-                              {0, 1, 1, "keyFake", "mixScn"},
-                              {1, 0, 0, "keyVu", "mixFake"}};
-    for (const Choice& c : choices) {
-        gnome->keyViewOn = c.keyOn;
-        gnome->keyViewMode = c.keyMode;
-        gnome->mixViewOn = c.mixOn;
-        gnome->SetViewStatus();
-        guitest::Settle();
-        for (const char* name : {c.key, c.mix}) {
-            ASSERT_TRUE(XtIsManaged(W(name))) << name;
-            Dimension width = 0, height = 0;
-            XtVaGetValues(W(name), XmNwidth, &width, XmNheight, &height, nullptr);
-            EXPECT_GE(width, 300) << name << " after choice " << c.key << "/" << c.mix;
-            EXPECT_GE(height, 220) << name << " after choice " << c.key << "/" << c.mix;
-        }
-    }
-    gnome->keyViewOn = 1;
-    gnome->keyViewMode = 1;
-    gnome->mixViewOn = 1;
-    gnome->SetViewStatus();
-}
-
-// ClearViews leaves both views without a scene; showing the keyset gives it back.
-TEST_F(ViewsTest, ClearViewsAndShowAgain) {
-    gnome->ClearViews();
-    EXPECT_EQ(gnome->keyScene->GetScene(), nullptr);
-    EXPECT_EQ(gnome->mixScene->GetScene(), nullptr);
-    EXPECT_EQ(gnome->shownKeyset, nullptr);
-    gnome->SetActiveKeyset(0);
-    EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
-    EXPECT_EQ(gnome->mixScene->GetScene(), theImp.scene.get());
-}
-
-}  // namespace
-
-namespace {
 
 // Played forward to a playblast, each frame of the mix view becomes a playblast frame of the
 // view's size, shown in the reference view from the region's start.
@@ -350,10 +306,6 @@ TEST_F(ViewsTest, PlayblastFramesAreTheMixViewsFrames) {
     theImp.DeletePlayblast();
 }
 
-}  // namespace
-
-namespace {
-
 // A key edited on the active track shows in both views at once, without a call to draw.
 TEST_F(ViewsTest, EditedKeysRedrawBothViews) {
     for (KLSceneView* view : {gnome->keyScene, gnome->mixScene})
@@ -370,13 +322,17 @@ TEST_F(ViewsTest, EditedKeysRedrawBothViews) {
     theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
 }
 
-}  // namespace
-
-namespace {
-
-// Loaded without geometry, the views get no scene and no key-shape pictures are grabbed;
-// loaded with it again, both come back.
-TEST_F(ViewsTest, WithoutGeometryTheViewsStayEmpty) {
+// ClearViews leaves both views without a scene, showing the keyset gives it back; loaded
+// without geometry, the views get no scene and no key-shape pictures are grabbed; loaded with
+// it again, both come back.
+TEST_F(ViewsTest, ClearedOrWithoutGeometryTheViewsStayEmpty) {
+    gnome->ClearViews();
+    EXPECT_EQ(gnome->keyScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->mixScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->shownKeyset, nullptr);
+    gnome->SetActiveKeyset(0);
+    EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
+    EXPECT_EQ(gnome->mixScene->GetScene(), theImp.scene.get());
     const std::string kset = windowtest::DemoProject() + "/misc_data/demo.kset";
     theImp.loadGeometry = 0;
     ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);
