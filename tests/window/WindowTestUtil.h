@@ -8,6 +8,7 @@
 #include "window/DemoProject.h"
 
 class Gnome;
+class KLAlert;
 
 // Helpers of the main-window tests: the one Gnome of the test program, built on the test
 // display with the program's own resource file.
@@ -21,6 +22,10 @@ Gnome& TheDemoWindow(bool track = false);
 
 // Types `path` into a file browser's name field and presses its OK button.
 bool ChooseInBrowser(Widget browser, const std::string& path);
+
+// Runs `action`, answering every question `alert` asks meanwhile with its button `button`; the
+// last message told, empty when none was.
+std::string AnswerAlerts(KLAlert* alert, const std::function<void()>& action, int button = 0);
 
 // The option menu's entry `index` chosen as a click on it would (its activate callbacks).
 void ChooseOption(Widget optionMenu, int index);

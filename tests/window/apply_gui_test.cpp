@@ -127,21 +127,13 @@ TEST_F(ApplyDialogTest, OpeningTheApplyFileFillsTheDialog) {
     guitest::Screenshot("window-apply-dialog");
 
     // Apply without a dag node or a keyset selected: told, and the dialog stays.
-    KLAlert* alert = gnome->attentionAlert.get();
     for (bool withDag : {false, true}) {
         XmListDeselectAllItems(KLXmGnome::FindWidget("keyLister"));
         XmListDeselectAllItems(dags);
         if (withDag)
             XmListSelectPos(dags, 1, False);
-        std::string told;
-        guitest::AnswerScript script({[&] {
-            if (!alert->Waiting() || !guitest::Viewable(alert->Button(0)))
-                return false;
-            told = guitest::XmText(alert->GetDialog(), XmNmessageString);
-            return guitest::ClickWhenViewable(alert->Button(0));
-        }});
-        Gnome::apply_cb(nullptr, nullptr, nullptr);
-        EXPECT_TRUE(script.Finished());
+        const std::string told = windowtest::AnswerAlerts(
+            gnome->attentionAlert.get(), [] { Gnome::apply_cb(nullptr, nullptr, nullptr); });
         EXPECT_EQ(told, withDag ? "You must select one or more keysets to apply."
                                 : "You must select a dag node to apply under.");
         EXPECT_TRUE(XtIsManaged(dialog));

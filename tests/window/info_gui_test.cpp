@@ -29,30 +29,15 @@ std::string LabelOf(const char* name) {
     return guitest::XmText(w, XmNlabelString);
 }
 
-std::string MessageOf(KLAlert* alert) {
-    return guitest::XmText(alert->GetDialog(), XmNmessageString);
-}
-
 class InfoTest : public ::testing::Test {
   protected:
     void SetUp() override { gnome = &windowtest::TheWindow(); }
-    // Runs `action`, answering every "Attention" alert it shows with `button`; the texts told,
-    // the last one returned.
+    // Runs `action`, answering every "Attention" alert it shows with `button`; the last told.
     std::string Answer(const std::function<void()>& action, int button = 0) {
-        KLAlert* alert = gnome->attentionAlert.get();
-        told.clear();
-        auto step = [&] {
-            if (!alert->Waiting() || !guitest::Viewable(alert->Button(button)))
-                return false;
-            told.push_back(MessageOf(alert));
-            return guitest::ClickWhenViewable(alert->Button(button));
-        };
-        guitest::AnswerScript script({step, step, step, step});
-        action();
-        EXPECT_FALSE(told.empty()) << "nothing was told";
-        return told.empty() ? "" : told.back();
+        std::string told = windowtest::AnswerAlerts(gnome->attentionAlert.get(), action, button);
+        EXPECT_NE(told, "") << "nothing was told";
+        return told;
     }
-    std::vector<std::string> told;
     Gnome* gnome = nullptr;
 };
 

@@ -177,18 +177,11 @@ TEST_F(Recognizers, MenuAndPanelsComeFromThePlugins) {
     }
     EXPECT_EQ(panel_item("Nobody", nullptr), nullptr);
 
-    KLAlert* alert = gnome->attentionAlert.get();
-    std::string told;
-    guitest::AnswerScript script({[&] {
-        if (!alert->Waiting() || !guitest::Viewable(alert->Button(0)))
-            return false;
-        told = guitest::XmText(alert->GetDialog(), XmNmessageString);
-        return guitest::ClickWhenViewable(alert->Button(0));
-    }});
     const size_t before = mouth->recognizers.size();
-    Gnome::create_recognize_cb(nullptr, const_cast<char*>("Vowel"), nullptr);
-    EXPECT_TRUE(script.Finished());
-    EXPECT_EQ(told, "Failed to locate plug-in recognizer [Vowel].");
+    EXPECT_EQ(windowtest::AnswerAlerts(
+                  gnome->attentionAlert.get(),
+                  [] { Gnome::create_recognize_cb(nullptr, const_cast<char*>("Vowel"), nullptr); }),
+              "Failed to locate plug-in recognizer [Vowel].");
     EXPECT_EQ(mouth->recognizers.size(), before);
 }
 

@@ -8,7 +8,6 @@
 #include <Xm/Xm.h>
 
 #include <cstring>
-#include <filesystem>
 
 #include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
@@ -69,8 +68,12 @@ class ViewsTest : public ::testing::Test {
     Gnome* gnome = nullptr;
 };
 
-// Held at the anchor the camera stays; moved off it, it turns continuously until release.
-TEST_F(ViewsTest, TumbleDragAtARateFromTheAnchor) {
+// Camera drags with real pointer input: held at the anchor the camera stays, moved off it, it
+// turns continuously until release; the middle button turns only about the vertical axis, the
+// right one only tilts; a second button neither starts nor ends a drag; while sound plays a
+// drag moves nothing. keyVuSet keeps the key view's camera for look-at; keyVuClear lets
+// look-at frame again.
+TEST_F(ViewsTest, CameraDragsAndTheStoredCamera) {
     KLSceneView* view = gnome->keyScene;
     const KLCamera start = view->Camera();
     const int ended = view->DragsEnded();
@@ -95,26 +98,17 @@ TEST_F(ViewsTest, TumbleDragAtARateFromTheAnchor) {
     const KLCamera after = view->Camera();
     guitest::Settle();
     EXPECT_TRUE(SameCamera(view->Camera(), after)) << "stops at release";
-}
 
-// The middle button turns only about the vertical axis, the right one only tilts; a second
-// button neither starts nor ends a drag; while sound plays a drag moves nothing.
-TEST_F(ViewsTest, ButtonsLockAxesAndASecondButtonOrSoundStopsNothing) {
-    KLSceneView* view = gnome->mixScene;
     for (int button : {2, 3}) {
-        const KLCamera start = view->Camera();
+        const KLCamera before = gnome->mixScene->Camera();
         guitest::MoveTo(W("mixVuTumble"));
         guitest::Press(button);
         ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 1; }));
         PointerAt(gnome->anchorX + 50, gnome->anchorY + 50);
-        ASSERT_TRUE(Steps(view, 5));
-        if (button == 2) {
-            EXPECT_NE(view->Camera().yaw, start.yaw);
-            EXPECT_EQ(view->Camera().pitch, start.pitch);
-        } else {
-            EXPECT_EQ(view->Camera().yaw, start.yaw);
-            EXPECT_NE(view->Camera().pitch, start.pitch);
-        }
+        ASSERT_TRUE(Steps(gnome->mixScene, 5));
+        const KLCamera& now = gnome->mixScene->Camera();
+        EXPECT_EQ(now.yaw != before.yaw, button == 2);
+        EXPECT_EQ(now.pitch != before.pitch, button == 3);
         guitest::Press(1);
         guitest::Release(1);
         guitest::Settle();
@@ -123,7 +117,7 @@ TEST_F(ViewsTest, ButtonsLockAxesAndASecondButtonOrSoundStopsNothing) {
         guitest::Release(button);
         ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 0; }));
     }
-    const KLCamera start = gnome->keyScene->Camera();
+    const KLCamera still = view->Camera();
     gnome->soundPlaying = 1;
     guitest::MoveTo(W("keyVuZoom"));
     guitest::Press(1);
@@ -132,7 +126,24 @@ TEST_F(ViewsTest, ButtonsLockAxesAndASecondButtonOrSoundStopsNothing) {
     guitest::Release(1);
     ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 0; }));
     gnome->soundPlaying = 0;
-    EXPECT_TRUE(SameCamera(gnome->keyScene->Camera(), start));
+    EXPECT_TRUE(SameCamera(view->Camera(), still));
+
+    for (int i = 0; i < 30; i++)
+        view->CameraTumble(200, 50, 0);
+    const KLCamera stored = view->Camera();
+    Gnome::key_view_set_cb(nullptr, nullptr, nullptr);
+    for (int i = 0; i < 30; i++)
+        view->CameraZoom(300, 0);
+    gnome->CenterKeyView();
+    EXPECT_TRUE(SameCamera(view->Camera(), stored));
+    Gnome::key_view_clear_cb(nullptr, nullptr, nullptr);
+    for (int i = 0; i < 30; i++)
+        view->CameraZoom(300, 0);
+    const float zoomed = view->Camera().distance;
+    gnome->CenterKeyView();
+    EXPECT_EQ(view->Camera().yaw, stored.yaw) << "framed again from the same direction";
+    EXPECT_EQ(view->Camera().pitch, stored.pitch);
+    EXPECT_GT(view->Camera().distance, zoomed * 1.5f);
 }
 
 // The four feedback toggles are one radio group setting the workspace's style; each style
@@ -157,37 +168,14 @@ TEST_F(ViewsTest, FeedbackAndGeometryToggles) {
     EXPECT_FALSE(SamePixels(*pictures[0], *pictures[1]));
     EXPECT_FALSE(SamePixels(*pictures[1], *pictures[2]));
 
-    KLAlert* alert = gnome->attentionAlert.get();
-    guitest::AnswerScript script({
-        [&] { return alert->Waiting() && guitest::ClickWhenViewable(alert->Button(0)); },
-    });
-    XmToggleButtonSetState(W("loadGeometry"), False, True);
-    EXPECT_TRUE(script.Finished());
+    EXPECT_NE(
+        windowtest::AnswerAlerts(gnome->attentionAlert.get(),
+                                 [&] { XmToggleButtonSetState(W("loadGeometry"), False, True); }),
+        "");
     EXPECT_EQ(theImp.loadGeometry, 0);
     EXPECT_EQ(theImp.geometryActive, 1) << "not before the next load";
     XmToggleButtonSetState(W("loadGeometry"), True, True);  // no question this time
     EXPECT_EQ(theImp.loadGeometry, 1);
-}
-
-// keyVuSet keeps the key view's camera for look-at; keyVuClear lets look-at frame again.
-TEST_F(ViewsTest, KeyViewCameraSetAndClear) {
-    KLSceneView* view = gnome->keyScene;
-    for (int i = 0; i < 30; i++)
-        view->CameraTumble(200, 50, 0);
-    const KLCamera stored = view->Camera();
-    Gnome::key_view_set_cb(nullptr, nullptr, nullptr);
-    for (int i = 0; i < 30; i++)
-        view->CameraZoom(300, 0);
-    gnome->CenterKeyView();
-    EXPECT_TRUE(SameCamera(view->Camera(), stored));
-    Gnome::key_view_clear_cb(nullptr, nullptr, nullptr);
-    for (int i = 0; i < 30; i++)
-        view->CameraZoom(300, 0);
-    const float zoomed = view->Camera().distance;
-    gnome->CenterKeyView();
-    EXPECT_EQ(view->Camera().yaw, stored.yaw) << "framed again from the same direction";
-    EXPECT_EQ(view->Camera().pitch, stored.pitch);
-    EXPECT_GT(view->Camera().distance, zoomed * 1.5f);
 }
 
 // Whichever alternative a view shows (key pictures, scene or blank), it fills the view's frame
@@ -269,14 +257,22 @@ TEST_F(ViewsTest, KeyViewHoldsOtherKeysetsStatic) {
     theImp.PrepareKeyFrames(-1);
 }
 
-// Played forward to a playblast, each frame of the mix view becomes a playblast frame of the
-// view's size, shown in the reference view from the region's start.
-TEST_F(ViewsTest, PlayblastFramesAreTheMixViewsFrames) {
+// Keys edited on the active track show in both views at once, without a call to draw. Played
+// forward to a playblast, each frame of the mix view becomes a playblast frame of the view's
+// size, shown in the reference view from the region's start.
+TEST_F(ViewsTest, EditedKeysRedrawAndPlayblastFramesAreTheMixViews) {
+    for (KLSceneView* view : {gnome->keyScene, gnome->mixScene})
+        view->time = CueTime::FromFrames(11);
+    guitest::Settle();
+    const int keyDraws = gnome->keyScene->Draws(), mixDraws = gnome->mixScene->Draws();
     KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
     KLKeySet* set = gnome->shownKeyset;
     mouth->InsertKey(1, CueTime::FromFrames(10), set->GetKeyShape(1), KLKeyEvent::kLinear, 1.0f);
     mouth->InsertKey(3, CueTime::FromFrames(12), set->GetKeyShape(3), KLKeyEvent::kLinear, 1.0f);
-    theImp.PrepareKeyFrames(-1);
+    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
+    EXPECT_TRUE(guitest::WaitFor([&] {
+        return gnome->keyScene->Draws() > keyDraws && gnome->mixScene->Draws() > mixDraws;
+    }));
     theImp.playblastImages = std::make_unique<std::unique_ptr<KLImageSGI>[]>(3);
     theImp.playblastCount = 3;
     const CueTime start = CueTime::FromFrames(10);
@@ -298,28 +294,9 @@ TEST_F(ViewsTest, PlayblastFramesAreTheMixViewsFrames) {
     EXPECT_EQ(gnome->playblastViewOn, 1);
     EXPECT_EQ(gnome->refViewOn, 0);
     EXPECT_EQ(theImp.GetPlayblast(start + CueTime::FromFrames(1)), theImp.playblastImages[1].get());
-    mouth->RemoveKey(CueTime::FromFrames(10));
-    mouth->RemoveKey(CueTime::FromFrames(12));
-    theImp.PrepareKeyFrames(-1);
     Gnome::toggle_ref_view_cb(nullptr, XtPointer(0), nullptr);
     gnome->DisplayReference(start);  // lets go of the playblast picture
     theImp.DeletePlayblast();
-}
-
-// A key edited on the active track shows in both views at once, without a call to draw.
-TEST_F(ViewsTest, EditedKeysRedrawBothViews) {
-    for (KLSceneView* view : {gnome->keyScene, gnome->mixScene})
-        view->time = CueTime::FromFrames(5);
-    guitest::Settle();
-    const int key = gnome->keyScene->Draws(), mix = gnome->mixScene->Draws();
-    KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
-    mouth->InsertKey(2, CueTime::FromFrames(5), gnome->shownKeyset->GetKeyShape(2),
-                     KLKeyEvent::kLinear, 1.0f);
-    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
-    EXPECT_TRUE(guitest::WaitFor(
-        [&] { return gnome->keyScene->Draws() > key && gnome->mixScene->Draws() > mix; }));
-    mouth->RemoveKey(CueTime::FromFrames(5));
-    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
 }
 
 // ClearViews leaves both views without a scene, showing the keyset gives it back; loaded

@@ -7,7 +7,9 @@
 #include <Xm/TextF.h>
 #include <Xm/Xm.h>
 
+#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
+#include "toolkit/xm/KLAlert.h"
 #include "window/FallbackResources.h"
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
@@ -51,6 +53,19 @@ bool ChooseInBrowser(Widget browser, const std::string& path) {
     XmTextFieldSetString(text, const_cast<char*>(path.c_str()));
     guitest::Click(ok);
     return true;
+}
+
+std::string AnswerAlerts(KLAlert* alert, const std::function<void()>& action, int button) {
+    std::string told;
+    auto answer = [&] {
+        if (!alert->Waiting() || !guitest::Viewable(alert->Button(button)))
+            return false;
+        told = guitest::XmText(alert->GetDialog(), XmNmessageString);
+        return guitest::ClickWhenViewable(alert->Button(button));
+    };
+    guitest::AnswerScript script({answer, answer, answer, answer});
+    action();
+    return told;
 }
 
 void ChooseOption(Widget optionMenu, int index) {
