@@ -14,6 +14,12 @@ class KLAlert;
 // display with the program's own resource file.
 namespace windowtest {
 
+// The widget registered under `name`.
+Widget W(const char* name);
+// A widget's label string; "<none>" when there is no widget.
+std::string Label(Widget widget);
+std::string Label(const char* name);
+
 // The window, built once per test program (Xt cannot reopen the display).
 Gnome& TheWindow();
 // The window with the demo keyset (and, when `track`, its track and sound) loaded from the

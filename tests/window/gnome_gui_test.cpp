@@ -24,12 +24,11 @@
 namespace fs = std::filesystem;
 using guitest::AnswerScript;
 using guitest::ClickWhenViewable;
+using windowtest::Label;
+using windowtest::W;
 
 namespace {
 
-Widget W(const char* name) {
-    return KLXmGnome::FindWidget(name);
-}
 bool Managed(const char* name) {
     return W(name) && XtIsManaged(W(name));
 }
@@ -72,8 +71,8 @@ TEST(WindowTest, BuiltFromTheTableAndTheResourceFile) {
     EXPECT_EQ(help, W("help"));
 
     // Labels, option entries and toggles as the resource file writes them.
-    EXPECT_EQ(guitest::XmText(W("openTrack"), XmNlabelString), "Open Track...");
-    EXPECT_EQ(guitest::XmText(W("infoFrameValue"), XmNlabelString), "0");
+    EXPECT_EQ(Label("openTrack"), "Open Track...");
+    EXPECT_EQ(Label("infoFrameValue"), "0");
     const std::pair<const char*, size_t> menus[] = {{"speedMenu", 4},
                                                     {"repeatMenu", 2},
                                                     {"keyVuToggle", 3},

@@ -22,12 +22,7 @@
 
 namespace {
 
-std::string LabelOf(const char* name) {
-    Widget w = KLXmGnome::FindWidget(name);
-    if (!w)
-        return "<none>";
-    return guitest::XmText(w, XmNlabelString);
-}
+using windowtest::Label;
 
 class InfoTest : public ::testing::Test {
   protected:
@@ -46,16 +41,16 @@ class InfoTest : public ::testing::Test {
 TEST_F(InfoTest, InformationBarAndStatusLine) {
     CueTime::default_fps = 30;
     gnome->DisplayTimecode(CueTime::FromTicks(300));  // one and a half frames
-    EXPECT_EQ(LabelOf("infoFrameValue"), "1.5");
-    EXPECT_EQ(LabelOf("infoTimeValue"), "1.5");
+    EXPECT_EQ(Label("infoFrameValue"), "1.5");
+    EXPECT_EQ(Label("infoTimeValue"), "1.5");
     gnome->DisplayTimecode(CueTime::FromTicks(6000 * 2));
-    EXPECT_EQ(LabelOf("infoFrameValue"), "60");
+    EXPECT_EQ(Label("infoFrameValue"), "60");
     gnome->DisplayDuration(CueTime::FromTicks(6000 * 5));
-    EXPECT_EQ(LabelOf("infoDurationValue"), "150");
+    EXPECT_EQ(Label("infoDurationValue"), "150");
     gnome->DisplayReferenceOffset(CueTime::FromTicks(2400));
-    EXPECT_EQ(LabelOf("refAdjust"), "Set Reference Time [12]");
+    EXPECT_EQ(Label("refAdjust"), "Set Reference Time [12]");
     KLStatus("Parsing keyset description.");
-    EXPECT_EQ(LabelOf("statusLine"), "Parsing keyset description.");
+    EXPECT_EQ(Label("statusLine"), "Parsing keyset description.");
 }
 
 // The version is told with OK; Confirm asks in the window and assumes OK in batch mode.

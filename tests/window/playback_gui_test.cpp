@@ -24,16 +24,13 @@
 
 namespace {
 
-// The pass arithmetic at 30 frames a second.
-class PlaybackPassTest : public ::testing::Test {
-  protected:
-    void SetUp() override { saved_ = CueTime::default_fps, CueTime::default_fps = 30; }
-    void TearDown() override { CueTime::default_fps = saved_; }
-    int saved_ = 30;
-};
-
-// The timer spans the region stretched by the speed, either way; Position maps timer time back.
-TEST_F(PlaybackPassTest, TheTimerSpansTheRegionStretchedBySpeed) {
+// At 30 frames a second: the timer spans the region stretched by the speed, either way, and
+// Position maps timer time back; fast is a quarter more, the menu has four speeds, region
+// frames round to nearest; the key images by display style (midpoint, keyframe, dissolve) and
+// the keys either side.
+TEST(PlaybackPass, ArithmeticAndKeyImages) {
+    const int fps = CueTime::default_fps;
+    CueTime::default_fps = 30;
     using Case = std::tuple<double, double, float, double>;  // from, to, speed, end (frames)
     for (auto [from, to, speed, end] :
          {Case{10, 40, 1.0f, 40}, Case{10, 40, 0.5f, 70}, Case{10, 40, 0.25f, 130},
@@ -46,9 +43,6 @@ TEST_F(PlaybackPassTest, TheTimerSpansTheRegionStretchedBySpeed) {
         EXPECT_EQ(PlaybackPass::Position(f, f, speed), f);
         EXPECT_NEAR(PlaybackPass::Position(f, e, speed).Ticks(), t.Ticks(), 1);
     }
-}
-
-TEST_F(PlaybackPassTest, SpeedsAndRegionFrames) {
     EXPECT_EQ(PlaybackPass::FastSpeed(0.25f), 0.5f);
     EXPECT_EQ(PlaybackPass::FastSpeed(1.0f), 1.25f);
     EXPECT_EQ(PlaybackPass::MenuSpeed(1, 0.5f), 0.75f);
@@ -57,32 +51,32 @@ TEST_F(PlaybackPassTest, SpeedsAndRegionFrames) {
     EXPECT_EQ(PlaybackPass::MenuSpeed(-1, 0.75f), 0.75f);
     EXPECT_EQ(PlaybackPass::RegionFrames(CueTime(), CueTime::FromFrames(10.4)), 10);
     EXPECT_EQ(PlaybackPass::RegionFrames(CueTime(), CueTime::FromFrames(10.6)), 11);
-}
+    CueTime::default_fps = fps;
 
-// The key images by display style (midpoint, keyframe, dissolve) and the keys either side.
-TEST(DisplayStyle, ChoosesTheImages) {
     using K = KeyImageChoice;
-    struct Case {
+    struct Style {
         int style;
         bool prev, next;
         float fraction;
         K::Show show;
         float fade;
     };
-    for (Case c :
-         {Case{0, true, true, 0.25f, K::kPrev, 0},
-          Case{0, true, true, 0.5f, K::kPrev, 0},  // the exact half: prev
-          Case{0, true, true, 0.5001f, K::kNext, 0}, Case{1, true, true, 0.9f, K::kPrev, 0},
-          Case{2, true, true, 0.3f, K::kDissolve, 0.3f}, Case{1, false, true, 0.7f, K::kNext, 0},
-          Case{2, false, true, 0.7f, K::kNext, 0}, Case{2, true, false, 0.7f, K::kPrev, 0},
-          Case{0, false, false, 0, K::kNone, 0}}) {
+    for (Style c :
+         {Style{0, true, true, 0.25f, K::kPrev, 0},
+          Style{0, true, true, 0.5f, K::kPrev, 0},  // the exact half: prev
+          Style{0, true, true, 0.5001f, K::kNext, 0}, Style{1, true, true, 0.9f, K::kPrev, 0},
+          Style{2, true, true, 0.3f, K::kDissolve, 0.3f}, Style{1, false, true, 0.7f, K::kNext, 0},
+          Style{2, false, true, 0.7f, K::kNext, 0}, Style{2, true, false, 0.7f, K::kPrev, 0},
+          Style{0, false, false, 0, K::kNone, 0}}) {
         K k = K::Choose(c.style, c.prev, c.next, c.fraction);
         EXPECT_EQ(k.show, c.show) << c.style << " " << c.prev << c.next << " " << c.fraction;
         EXPECT_EQ(k.fade, c.fade) << c.style << " " << c.prev << c.next << " " << c.fraction;
     }
 }
 
+using windowtest::Label;
 using windowtest::Pump;
+using windowtest::W;
 
 // The window with the demo loaded, once per program; sound goes to SDL's silent driver unless
 // the run asks for another (CTest runs these under "disk" too).
@@ -100,10 +94,6 @@ class PlaybackWindowTest : public ::testing::Test {
     void TearDown() override {
         gnome->PlayStop();
         Pump([&] { return !gnome->playTimer; }, 5);
-    }
-    static Widget W(const char* name) { return KLXmGnome::FindWidget(name); }
-    static std::string LabelText(const char* name) {
-        return guitest::XmText(W(name), XmNlabelString);
     }
     // The chart's region set to from..to, as the chart stores it.
     void Region(CueTime from, CueTime to, CueTime* s, CueTime* e) {
@@ -173,7 +163,7 @@ TEST_F(PlaybackWindowTest, LoopsRestartUntilStoppedWhereTheyAre) {
     const CueTime at = chart->GetIndicatorTime();
     EXPECT_GE(at, s);
     EXPECT_LE(at, e);
-    EXPECT_EQ(LabelText("infoTimeValue"), at.Text());
+    EXPECT_EQ(Label("infoTimeValue"), at.Text());
 }
 
 // The key image view by style, on three keys of the active keyset with pictures of their own.
@@ -252,7 +242,7 @@ TEST_F(PlaybackWindowTest, TheTimecodeFollowsAnIndicatorDraggedByHand) {
     guitest::Settle();
     const CueTime at = chart->GetIndicatorTime();
     EXPECT_EQ(g.indicatorX, to);
-    EXPECT_EQ(LabelText("infoTimeValue"), at.Text());
+    EXPECT_EQ(Label("infoTimeValue"), at.Text());
 }
 
 }  // namespace

@@ -48,16 +48,12 @@ const bool kEnvironment = [] {
     return true;
 }();
 
-Widget W(const char* name) {
-    return KLXmGnome::FindWidget(name);
-}
+using windowtest::Label;
+using windowtest::W;
+
 // A widget of the link dialog (other dialogs use some of the same names).
 Widget L(const char* name) {
     return XtNameToWidget(KLXmGnome::FindWidget("linkDialog"), (std::string("*") + name).c_str());
-}
-
-std::string label_of(Widget w) {
-    return guitest::XmText(w, XmNlabelString);
 }
 
 // The character set item `position` (1-based) of a list is written in.
@@ -123,7 +119,7 @@ class Recognizers : public ::testing::Test {
         Widget entry = nullptr;
         ASSERT_TRUE(guitest::WaitFor([&] {
             for (Widget child : guitest::Children(W("recognizerMenu")))
-                if (label_of(child) == name)
+                if (Label(child) == name)
                     entry = child;
             return guitest::Viewable(entry);
         }));
@@ -168,7 +164,7 @@ TEST_F(Recognizers, MenuAndPanelsComeFromThePlugins) {
         for (int i = 0; i < 3; ++i) {
             Widget b = panel_item(name, labels[i]);
             ASSERT_TRUE(b);
-            EXPECT_EQ(label_of(b), labels[i]);
+            EXPECT_EQ(Label(b), labels[i]);
             int left = 0, right = 0;
             XtVaGetValues(b, XmNleftPosition, &left, XmNrightPosition, &right, nullptr);
             EXPECT_EQ(left, positions[i][0]);
@@ -193,9 +189,9 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     EXPECT_EQ(r->shown, 1);
     Widget container = panel_item("Phoneme", nullptr);
     ASSERT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(container); }));
-    EXPECT_EQ(label_of(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
-    EXPECT_EQ(label_of(panel_item("Phoneme", "value-step")), "     1 ");
-    EXPECT_EQ(label_of(panel_item("Phoneme", "value-minimum")), "     2 ");
+    EXPECT_EQ(Label(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
+    EXPECT_EQ(Label(panel_item("Phoneme", "value-step")), "     1 ");
+    EXPECT_EQ(Label(panel_item("Phoneme", "value-minimum")), "     2 ");
     ASSERT_TRUE(panel_item("Phoneme", "speed"));
     EXPECT_TRUE(XtIsSensitive(panel_item("Phoneme", "Recognize"))) << "every phone is linked";
 
@@ -206,14 +202,14 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     XtVaGetValues(minimum, XmNwidth, &width, nullptr);
     guitest::Click(minimum, 1, width - 4, -1);
     ASSERT_TRUE(guitest::WaitFor(
-        [&] { return label_of(panel_item("Phoneme", "value-minimum")) == "     3 "; }));
+        [&] { return Label(panel_item("Phoneme", "value-minimum")) == "     3 "; }));
     std::ostringstream settings;
     r->WriteSettings(settings);
     EXPECT_NE(settings.str().find("    minimum 3\n"), std::string::npos) << settings.str();
     // Setting a slider from the program moves it and its label, and tells the plug-in
     // nothing: it set the value itself.
     EXPECT_EQ(CueChirrup::SetIntSlider(r, "minimum", 2), 1);
-    EXPECT_EQ(label_of(panel_item("Phoneme", "value-minimum")), "     2 ");
+    EXPECT_EQ(Label(panel_item("Phoneme", "value-minimum")), "     2 ");
     std::istringstream back("minimum 2\nend\n");
     r->ReadSettings(back);
 
@@ -232,8 +228,7 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     EXPECT_GE(restInPause, 1);
     // The placed keys become active one after another while the indicator is hidden (no
     // click yet): the information bar keeps a time the chart can show.
-    EXPECT_EQ(label_of(W("infoTimeValue")).find('-'), std::string::npos)
-        << label_of(W("infoTimeValue"));
+    EXPECT_EQ(Label(W("infoTimeValue")).find('-'), std::string::npos) << Label(W("infoTimeValue"));
     guitest::Screenshot("window-phoneme-recognized");
 
     click_panel("Phoneme", "Dismiss");
@@ -296,13 +291,12 @@ TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
     ASSERT_TRUE(r);
     ASSERT_TRUE(
         guitest::WaitFor([&] { return guitest::Viewable(panel_item("Loudness", nullptr)); }));
-    EXPECT_EQ(label_of(panel_item("Loudness", "value-step")), "     1 ");
-    EXPECT_EQ(label_of(panel_item("Loudness", "value-half")), " -36.000");
-    EXPECT_EQ(label_of(panel_item("Loudness", "value-open")), " -24.000");
-    EXPECT_FALSE(XtIsSensitive(panel_item("Loudness", "Recognize"))) << "nothing is linked";
+    EXPECT_EQ(Label(panel_item("Loudness", "value-step")), "     1 ");
+    EXPECT_EQ(Label(panel_item("Loudness", "value-half")), " -36.000");
+    EXPECT_EQ(Label(panel_item("Loudness", "value-open")), " -24.000");
     // A second Create only sets the value and says so by returning 0.
     EXPECT_EQ(CueChirrup::CreateFloatSlider(r, "half", -60, -1, -40.5f, nullptr), 0);
-    EXPECT_EQ(label_of(panel_item("Loudness", "value-half")), " -40.500");
+    EXPECT_EQ(Label(panel_item("Loudness", "value-half")), " -40.500");
 
     ::testing::internal::CaptureStderr();
     EXPECT_EQ(CueChirrup::SetIntSlider(r, "loudness", 3), 0);
@@ -315,10 +309,8 @@ TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
     } stranger;
     EXPECT_EQ(CueChirrup::CreateIntSlider(&stranger, "step", 1, 5, 2, nullptr), 0);
     const std::string err = ::testing::internal::GetCapturedStderr();
-    EXPECT_NE(err.find("Couldn't find slider loudness"), std::string::npos) << err;
-    EXPECT_NE(err.find("Couldn't find slider gain"), std::string::npos) << err;
-    EXPECT_NE(err.find("Couldn't find option colour"), std::string::npos) << err;
-    EXPECT_NE(err.find("Couldn't find widget Stranger"), std::string::npos) << err;
+    for (const char* what : {"slider loudness", "slider gain", "option colour", "widget Stranger"})
+        EXPECT_NE(err.find(std::string("Couldn't find ") + what), std::string::npos) << err;
 
     Widget container = panel_item("Loudness", nullptr);
     ASSERT_EQ(theImp.GetKeySet(1)->GetRecognizer("Loudness"), nullptr);
@@ -329,7 +321,7 @@ TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
     gnome->SetActiveKeyset(0);
     gnome->update_recognizer_dialogs();
     EXPECT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(container); }));
-    EXPECT_EQ(label_of(panel_item("Loudness", "label")), "Recognizer [Loudness] (mouth)");
+    EXPECT_EQ(Label(panel_item("Loudness", "label")), "Recognizer [Loudness] (mouth)");
     click_panel("Loudness", "Dismiss");
 }
 
@@ -357,10 +349,10 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
 
     // Select "closed" and "rest", press "Link".
     click_item(targets, 1);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "closed"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "closed"; }));
     EXPECT_FALSE(XtIsSensitive(L("audition_button"))) << "Loudness's targets have no sound";
     click_item(shapes, mouth->GetKeyShapeId("rest") + 1);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("keyshapeLabel")) == "rest"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("keyshapeLabel")) == "rest"; }));
     guitest::Click(L("link_button"));
     ASSERT_TRUE(guitest::WaitFor([&] { return r->FindTarget("closed")->keyShapeIndex >= 0; }));
     EXPECT_EQ(r->FindTarget("closed")->keyShapeIndex, mouth->GetKeyShapeId("rest"));
@@ -370,7 +362,7 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
 
     // "half", then a double click on "E" links them.
     click_item(targets, 2);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "half"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "half"; }));
     click_item(shapes, mouth->GetKeyShapeId("E") + 1, true);
     ASSERT_TRUE(guitest::WaitFor([&] { return r->FindTarget("half")->keyShapeIndex >= 0; }));
     EXPECT_EQ(r->FindTarget("half")->keyShapeIndex, mouth->GetKeyShapeId("E"));
@@ -378,12 +370,10 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
 
     // Selecting a linked target selects its key shape; with none selected, "Link" does nothing.
     click_item(targets, 1);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "closed"; }))
-        << label_of(L("targetLabel"));
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("keyshapeLabel")) == "rest"; }))
-        << label_of(L("keyshapeLabel"));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "closed"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("keyshapeLabel")) == "rest"; }));
     click_item(targets, 3);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "open"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "open"; }));
     XmListDeselectAllItems(shapes);
     raise(dialog);
     guitest::Click(L("link_button"));
@@ -418,9 +408,9 @@ TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
     raise(W("linkDialog"));
     Widget targets = L("targetLister");
     click_item(targets, r->TargetIndex("OW") + 1);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "OW"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "OW"; }));
     EXPECT_TRUE(XtIsSensitive(L("audition_button")));
-    EXPECT_EQ(label_of(L("keyshapeLabel")), "O") << "the demo links OW to O";
+    EXPECT_EQ(Label(L("keyshapeLabel")), "O") << "the demo links OW to O";
     // The sample reaches the output; a second press replaces it while it plays, and
     // dismissing the dialog silences it. The program then ends with the output still open.
     const auto heard = [] { return KLSoundControl::LastHanded().sounding; };

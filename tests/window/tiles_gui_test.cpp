@@ -30,14 +30,9 @@
 
 namespace {
 
-Widget W(const char* name) {
-    return KLXmGnome::FindWidget(name);
-}
-
-std::string LabelText(Widget w) {
-    return guitest::XmText(w, XmNlabelString);
-}
 using guitest::Children;
+using windowtest::Label;
+using windowtest::W;
 
 // The demo's keysets (mouth with 11 shapes, two brows with 3) and a fourth of 9 shapes,
 // loaded once with 4 tiles per row.
@@ -81,7 +76,7 @@ TEST_F(TilesTest, TilesShowTheShapesAndPickThem) {
     auto parts = Children(Children(Children(box)[0])[0]);
     ASSERT_EQ(parts.size(), 2u);
     EXPECT_STREQ(XtName(parts[0]), "s0");
-    EXPECT_EQ(LabelText(parts[1]), "s0");
+    EXPECT_EQ(Label(parts[1]), "s0");
     KLImageSGI* blank = gnome->tiles[3][0]->Image();
     ASSERT_NE(blank, nullptr);
     EXPECT_EQ(blank->Width(), 80);
@@ -123,13 +118,13 @@ TEST_F(TilesTest, TheKeysetMenuSwitchesChartTitleAndPanel) {
     Widget status = XtNameToWidget(gnome->AppShell(), "*statusLine");
     ASSERT_NE(status, nullptr);
     // The event loop as the program runs it, work procedures included, until "Ready.".
-    auto ready = [&] { return windowtest::Pump([&] { return LabelText(status) == "Ready."; }); };
+    auto ready = [&] { return windowtest::Pump([&] { return Label(status) == "Ready."; }); };
     ASSERT_TRUE(ready()) << "after loading";
     XtCallCallbacks(gnome->keysetMenuEntries[1], XmNvalueChangedCallback, nullptr);
     EXPECT_EQ(gnome->GetActiveKeyset(), 1);
     EXPECT_EQ(chart->keyTrack, theImp.GetKeyTrack(1));
-    EXPECT_EQ(LabelText(W("infoKeysetTitle")), "brow_L");
-    EXPECT_EQ(LabelText(W("keyVuLabel")), "brow_L:");
+    EXPECT_EQ(Label(W("infoKeysetTitle")), "brow_L");
+    EXPECT_EQ(Label(W("keyVuLabel")), "brow_L:");
     EXPECT_TRUE(XtIsManaged(gnome->tileBoxes[1]));
     EXPECT_FALSE(XtIsManaged(gnome->tileBoxes[0]));
     EXPECT_NE(gnome->tileBoxes[0], nullptr) << "other panels stay built";
@@ -140,7 +135,7 @@ TEST_F(TilesTest, TheKeysetMenuSwitchesChartTitleAndPanel) {
     KLKeySet* brows = theImp.GetKeySet(1);
     for (int i = 0; i < brows->keyShapeCount; i++)
         EXPECT_NE(brows->GetKeyShape(i)->GetImage(), nullptr) << brows->GetKeyShape(i)->Name();
-    EXPECT_TRUE(ready()) << "the status line still says " << LabelText(status);
+    EXPECT_TRUE(ready()) << "the status line still says " << Label(status);
 }
 
 // Types into the value field with real keys: the text, then Return.

@@ -25,9 +25,7 @@
 
 namespace {
 
-Widget W(const char* name) {
-    return KLXmGnome::FindWidget(name);
-}
+using windowtest::W;
 
 bool SamePixels(const KLImageSGI& a, const KLImageSGI& b) {
     return a.Width() == b.Width() && a.Height() == b.Height() &&

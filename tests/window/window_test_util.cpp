@@ -16,6 +16,18 @@
 
 namespace windowtest {
 
+Widget W(const char* name) {
+    return KLXmGnome::FindWidget(name);
+}
+
+std::string Label(Widget widget) {
+    return widget ? guitest::XmText(widget, XmNlabelString) : "<none>";
+}
+
+std::string Label(const char* name) {
+    return Label(W(name));
+}
+
 Gnome& TheWindow() {
     static Gnome* gnome = [] {
         guitest::Shell(chirrup_fallback_resources());
