@@ -11,7 +11,6 @@
 #include <fstream>
 #include <string>
 
-#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
 #include "model/KLEdlEvent.h"
 #include "model/KLKeySet.h"

@@ -4,8 +4,6 @@
 #include <gtest/gtest.h>
 
 #include <Xm/List.h>
-#include <Xm/RowColumn.h>
-#include <Xm/Scale.h>
 #include <Xm/Xm.h>
 
 #include <chrono>
@@ -18,7 +16,6 @@
 #include <string>
 
 #include "chart/KLSyncChart.h"
-#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
 #include "model/KLKeyEvent.h"
 #include "model/KLKeySet.h"
@@ -154,22 +151,13 @@ class Recognizers : public ::testing::Test {
 TEST_F(Recognizers, MenuAndPanelsComeFromThePlugins) {
     EXPECT_STREQ(theImp.recognizers.HeadKey(), "Loudness");
     EXPECT_STREQ(theImp.recognizers.NextKey("Loudness"), "Phoneme");
+    // A panel per plug-in with its three buttons (the other tests press them).
     for (const char* name : {"Loudness", "Phoneme"}) {
         Widget container = panel_item(name, nullptr);
         ASSERT_TRUE(container) << name;
-        EXPECT_STREQ(XtName(container), "mid_rc");
         EXPECT_EQ(XtName(XtParent(container)), std::string(name) + " Recognizer");
-        const int positions[3][2] = {{1, 5}, {6, 10}, {11, 15}};
-        const char* labels[] = {"Configure", "Recognize", "Dismiss"};
-        for (int i = 0; i < 3; ++i) {
-            Widget b = panel_item(name, labels[i]);
-            ASSERT_TRUE(b);
-            EXPECT_EQ(Label(b), labels[i]);
-            int left = 0, right = 0;
-            XtVaGetValues(b, XmNleftPosition, &left, XmNrightPosition, &right, nullptr);
-            EXPECT_EQ(left, positions[i][0]);
-            EXPECT_EQ(right, positions[i][1]);
-        }
+        for (const char* label : {"Configure", "Recognize", "Dismiss"})
+            EXPECT_EQ(Label(panel_item(name, label)), label);
     }
     EXPECT_EQ(panel_item("Nobody", nullptr), nullptr);
 

@@ -92,25 +92,27 @@ TEST_F(TilesTest, TilesShowTheShapesAndPickThem) {
     guitest::Click(gnome->tiles[0][1]->GetWidget());
     guitest::Settle();
     EXPECT_EQ(gnome->CurrentKeyShape(), 1);
+    guitest::Click(gnome->tiles[0][4]->GetWidget());
+    ASSERT_TRUE(guitest::WaitFor([&] { return gnome->CurrentKeyShape() == 4; }));
+    EXPECT_EQ(gnome->tiles[0][1]->GetState(), 0) << "the old selection is cleared";
     gnome->HighlightKeyframe(7);
     EXPECT_EQ(gnome->CurrentKeyShape(), 7);
-    EXPECT_EQ(gnome->tiles[0][1]->GetState(), 0) << "the old selection is cleared";
+    EXPECT_EQ(gnome->tiles[0][4]->GetState(), 0);
 
     KLKeyTrack* track = theImp.GetKeyTrack(0);
     chart->activeKey = nullptr;
     chart->SetIndicatorTime(CueTime::FromSeconds(1.5));
     const CueTime t = chart->GetIndicatorTime();
     guitest::WaitFor([] { return false; }, 0.6);
-    guitest::DoubleClick(gnome->tiles[0][4]->GetWidget());
+    guitest::DoubleClick(gnome->tiles[0][5]->GetWidget());
     KLKeyEvent* prev = nullptr;
     KLKeyEvent* next = nullptr;
     ASSERT_TRUE(guitest::WaitFor([&] {
         track->bracket_keys_from_time(t, &prev, &next);
         return prev && prev->time == t;
     }));
-    EXPECT_EQ(prev->shapeIndex, 4);
-    EXPECT_EQ(gnome->CurrentKeyShape(), 4);
-    EXPECT_EQ(gnome->tiles[0][7]->GetState(), 0);
+    EXPECT_EQ(prev->shapeIndex, 5);
+    EXPECT_EQ(gnome->CurrentKeyShape(), 5);
 }
 
 TEST_F(TilesTest, TheKeysetMenuSwitchesChartTitleAndPanel) {

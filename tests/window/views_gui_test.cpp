@@ -9,7 +9,6 @@
 
 #include <cstring>
 
-#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
 #include "model/KLKey.h"
 #include "model/KLKeySet.h"
