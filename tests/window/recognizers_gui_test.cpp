@@ -176,7 +176,7 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     ASSERT_TRUE(r);
     EXPECT_EQ(r->shown, 1);
     Widget container = panel_item("Phoneme", nullptr);
-    ASSERT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(container); }));
+    ASSERT_TRUE(guitest::WaitMapped(container));
     EXPECT_EQ(Label(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
     EXPECT_EQ(Label(panel_item("Phoneme", "value-step")), "     1 ");
     EXPECT_EQ(Label(panel_item("Phoneme", "value-minimum")), "     2 ");
@@ -277,8 +277,7 @@ TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
     choose_from_menu("Loudness");
     CueRecognizer* r = mouth->GetRecognizer("Loudness");
     ASSERT_TRUE(r);
-    ASSERT_TRUE(
-        guitest::WaitFor([&] { return guitest::Viewable(panel_item("Loudness", nullptr)); }));
+    ASSERT_TRUE(guitest::WaitMapped(panel_item("Loudness", nullptr)));
     EXPECT_EQ(Label(panel_item("Loudness", "value-step")), "     1 ");
     EXPECT_EQ(Label(panel_item("Loudness", "value-half")), " -36.000");
     EXPECT_EQ(Label(panel_item("Loudness", "value-open")), " -24.000");
@@ -308,7 +307,7 @@ TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
     EXPECT_EQ(r->shown, 1) << "still wanted on the mouth";
     gnome->SetActiveKeyset(0);
     gnome->update_recognizer_dialogs();
-    EXPECT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(container); }));
+    EXPECT_TRUE(guitest::WaitMapped(container));
     EXPECT_EQ(Label(panel_item("Loudness", "label")), "Recognizer [Loudness] (mouth)");
     click_panel("Loudness", "Dismiss");
 }
@@ -324,7 +323,7 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
     gnome->ShowRecognizerGui(r);
     click_panel("Loudness", "Configure");
     Widget dialog = W("linkDialog");
-    ASSERT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(dialog); }));
+    ASSERT_TRUE(guitest::WaitMapped(dialog));
     raise(dialog);
     Widget targets = L("targetLister");
     Widget shapes = L("keyshapeLister");
@@ -392,7 +391,7 @@ TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
     CueRecognizer* r = mouth->GetRecognizer("Phoneme");
     ASSERT_TRUE(r);
     click_panel("Phoneme", "Configure");
-    ASSERT_TRUE(guitest::WaitFor([&] { return guitest::Viewable(W("linkDialog")); }));
+    ASSERT_TRUE(guitest::WaitMapped(W("linkDialog")));
     raise(W("linkDialog"));
     Widget targets = L("targetLister");
     click_item(targets, r->TargetIndex("OW") + 1);
