@@ -13,6 +13,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
+#include <map>
 #include <thread>
 
 #include "toolkit/xm/KLXmGnome.h"
@@ -180,17 +181,10 @@ void TypeKey(unsigned long keysym, unsigned int modifiers) {
 }
 
 void TypeText(const std::string& text) {
-    for (char c : text) {
-        KeySym sym = static_cast<KeySym>(c);
-        for (auto [from, to] : {std::pair<char, KeySym>{' ', XK_space},
-                                {'\n', XK_Return},
-                                {'.', XK_period},
-                                {'-', XK_minus},
-                                {':', XK_colon}})
-            if (c == from)
-                sym = to;
-        TypeKey(sym);
-    }
+    static const std::map<char, KeySym> named = {
+        {' ', XK_space}, {'\n', XK_Return}, {'.', XK_period}, {'-', XK_minus}, {':', XK_colon}};
+    for (char c : text)
+        TypeKey(named.count(c) ? named.at(c) : static_cast<KeySym>(c));
 }
 
 unsigned long PixelAt(Widget widget, int x, int y) {
