@@ -85,6 +85,8 @@ TEST_F(InfoTest, DamagedOrMissingFilesAreToldAndTheWindowGoesOn) {
     EXPECT_EQ(told, "Failed to open keyset file [" + dir + "].");
 }
 
+// A logged error makes the flag solid; viewing the log (what the log holds is the workspace's
+// business) clears it.
 TEST_F(InfoTest, ErrorFlagTurnsSolidOnALoggedErrorAndClearsWhenTheLogIsViewed) {
     testkit::TempDir dir;
     theImp.SetErrorFilename((dir / "errlog.vx").c_str());
@@ -98,16 +100,12 @@ TEST_F(InfoTest, ErrorFlagTurnsSolidOnALoggedErrorAndClearsWhenTheLogIsViewed) {
     EXPECT_EQ(background, foreground) << "a logged error makes the flag solid";
     guitest::Settle();
     guitest::Screenshot("window-error-flag");
-    // Viewing the log (here with a viewer that does nothing) clears the flag.
+    // Viewed with a viewer that does nothing.
     setenv("TESSEL_USER_ERROR_READER", "true", 1);
     Gnome::view_errors_cb(nullptr, nullptr, nullptr);
     unsetenv("TESSEL_USER_ERROR_READER");
     XtVaGetValues(flag, XmNbackground, &background, nullptr);
     EXPECT_EQ(background, parentBackground);
-    std::ifstream in(dir / "errlog.vx");
-    std::string log((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-    EXPECT_NE(log.find("Something went wrong in a test."), std::string::npos);
-    EXPECT_NE(log.find("\n---------------------------------------\n"), std::string::npos);
 }
 
 TEST_F(InfoTest, AdjustRelLoadFillsTheDialogAndCopiesBackTheAnswer) {
