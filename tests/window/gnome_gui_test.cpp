@@ -11,6 +11,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <string>
+#include <tuple>
 
 #include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
@@ -92,21 +93,18 @@ TEST(WindowTest, BuiltFromTheTableAndTheResourceFile) {
 TEST(WindowTest, MenusAndViewsFollowTheState) {
     Gnome& gnome = windowtest::TheWindow();
     KLKeySet keyset("mouth", "face.glb");
-    struct MenuCase {
-        bool shown;
-        int geometry;
-        bool keysetItems, keyView;
-    };
-    for (MenuCase c : {MenuCase{false, 1, false, false}, MenuCase{false, 0, false, false},
-                       MenuCase{true, 1, true, false}, MenuCase{true, 0, true, true}}) {
-        SCOPED_TRACE(testing::Message() << "shown " << c.shown << " geometry " << c.geometry);
-        gnome.shownKeyset = c.shown ? &keyset : nullptr;
-        theImp.geometryActive = c.geometry;
+    // (keyset shown, geometry loaded) -> keyset items, key-view camera items sensitive
+    for (auto [shown, geometry, keysetItems, keyView] :
+         {std::tuple{false, 1, false, false}, std::tuple{false, 0, false, false},
+          std::tuple{true, 1, true, false}, std::tuple{true, 0, true, true}}) {
+        SCOPED_TRACE(testing::Message() << "shown " << shown << " geometry " << geometry);
+        gnome.shownKeyset = shown ? &keyset : nullptr;
+        theImp.geometryActive = geometry;
         gnome.SetMenuStatus();
         for (const char* name : {"saveKeyset", "openTrack", "saveTrack", "applyWire"})
-            EXPECT_EQ(Sensitive(name), c.keysetItems) << name;
+            EXPECT_EQ(Sensitive(name), keysetItems) << name;
         for (const char* name : {"keyVuSet", "keyVuClear"})
-            EXPECT_EQ(Sensitive(name), c.keyView) << name;
+            EXPECT_EQ(Sensitive(name), keyView) << name;
         for (const char* name : {"openKeyset", "newTrack", "quit"})
             EXPECT_TRUE(Sensitive(name)) << name;
     }
