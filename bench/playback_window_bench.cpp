@@ -18,6 +18,7 @@
 #include "toolkit/KLImageSGI.h"
 #include "toolkit/MonotonicClock.h"
 #include "window/DemoProject.h"
+#include "window/EventPump.h"
 #include "window/FallbackResources.h"
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
@@ -67,18 +68,6 @@ Gnome* OpenWindow() {
     return gnome;
 }
 
-// One round of the event loop, as the main loop runs it (work procedures included); a short
-// timeout makes sure it returns.
-void OneRound(XtAppContext context) {
-    static bool armed = false;  // one wake-up timeout at a time
-    if (!armed) {
-        armed = true;
-        XtAppAddTimeOut(
-            context, 10, [](XtPointer, XtIntervalId*) { armed = false; }, nullptr);
-    }
-    XtAppProcessEvent(context, XtIMAll);
-}
-
 void BM_PlaybackDisplayRate(benchmark::State& state) {
     Gnome* g = OpenWindow();
     if (!g || !g->syncChart)
@@ -95,14 +84,14 @@ void BM_PlaybackDisplayRate(benchmark::State& state) {
         const double cpu0 = CpuSeconds(), wall0 = MonotonicSeconds();
         g->PlayForward();
         while (MonotonicSeconds() - wall0 < seconds)
-            OneRound(context);
+            windowtest::PumpRound(context);
         const double cpu = CpuSeconds() - cpu0, wall = MonotonicSeconds() - wall0;
         state.counters["updates_per_s"] = g->stopWatch.FrameRate();
         state.counters["cpu_percent"] = 100.0 * cpu / wall;
         state.counters["chart_px"] = double(g->syncChart->geometry.width);
         g->PlayStop();
         while (g->playTimer)
-            OneRound(context);
+            windowtest::PumpRound(context);
     }
 }
 BENCHMARK(BM_PlaybackDisplayRate)

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <string>
 #include <vector>
@@ -216,15 +217,14 @@ class Gnome : public KLXmGnome, public virtual Ghost {
                      int value, void (*callback)(void*, int));
     int SetOption(CueRecognizer* r, const char* name, int index);
     void RecognizeProgress(CueRecognizer* r, float done);
-    // The panels' controls: a labelled row "rc" for a new one, a slider and its value label
-    // (the record is the control's callback record, kept for the life of the process), and
-    // finding a slider again.
+    // The panels' controls: a labelled row "rc" for a new one (or `update` for one that exists),
+    // a slider and its value label (the record is the control's callback record, kept for the
+    // life of the process), and moving a slider found again.
     static void install_chirrup_host();
-    Widget control_row(CueRecognizer* r, const char* name, void** existing);
+    Widget control_row(CueRecognizer* r, const char* name, const std::function<void()>& update);
     void add_scale(CueRecognizer* r, const char* name, Widget row, int low, int high, int at,
                    int decimals, const std::string& shown, void* record);
-    Widget find_scale(CueRecognizer* r, const char* name, int* minimum, int* maximum,
-                      void** record);
+    int move_scale(CueRecognizer* r, const char* name, int at, std::string (*text)(int));
 
     // --- Link dialog (GnomeLink.cpp)
     void create_link_dialog();

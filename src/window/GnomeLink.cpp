@@ -9,6 +9,7 @@
 #include <Xm/Separator.h>
 #include <Xm/Xm.h>
 
+#include <functional>
 #include <memory>
 #include <string>
 
@@ -63,6 +64,23 @@ Widget make(WidgetClass cls, const char* name, Widget parent, const char* label 
     if (!KLXmGnome::FindWidget(name))
         KLXmGnome::RegisterWidget(w);
     return w;
+}
+
+// Makes `proc` (with `client`) the one callback of `w`'s list `which`: the dialog serves one
+// recognizer and one keyset at a time.
+void rebind(Widget w, const char* which, XtCallbackProc proc, XtPointer client) {
+    XtRemoveAllCallbacks(w, which);
+    XtAddCallback(w, which, proc, client);
+}
+
+// Empties a lister and fills it with `count` items made by `item`.
+void refill(Widget list, int count, const std::function<XmString(int)>& item) {
+    XmListDeleteAllItems(list);
+    for (int i = 0; i < count; ++i) {
+        XmString text = item(i);
+        XmListAddItemUnselected(list, text, 0);
+        XmStringFree(text);
+    }
 }
 
 void set_label(Widget w, const char* text) {
@@ -213,24 +231,15 @@ void Gnome::update_target_lister(CueRecognizer* recognizer) {
     if (!list)
         return;
     linkRecognizer = recognizer;
-    XtRemoveAllCallbacks(list, XmNbrowseSelectionCallback);
-    XtAddCallback(list, XmNbrowseSelectionCallback, select_target_cb, recognizer);
-    for (Widget w : {theLink.targetLister, theLink.keyshapeLister}) {
-        XtRemoveAllCallbacks(w, XmNdefaultActionCallback);
-        XtAddCallback(w, XmNdefaultActionCallback, link_link_cb, recognizer);
-    }
-    XtRemoveAllCallbacks(theLink.linkButton, XmNactivateCallback);
-    XtAddCallback(theLink.linkButton, XmNactivateCallback, link_link_cb, recognizer);
-    XmListDeleteAllItems(list);
-    if (!recognizer)
-        return;
-    for (const CueRecognizer::Target& t : recognizer->targets) {
-        XmString item =
-            XmStringCreate(const_cast<char*>(t.name.c_str()),
-                           const_cast<char*>(t.keyShapeIndex >= 0 ? kLinked : kUnlinked));
-        XmListAddItemUnselected(list, item, 0);
-        XmStringFree(item);
-    }
+    rebind(list, XmNbrowseSelectionCallback, select_target_cb, recognizer);
+    for (Widget w : {theLink.targetLister, theLink.keyshapeLister})
+        rebind(w, XmNdefaultActionCallback, link_link_cb, recognizer);
+    rebind(theLink.linkButton, XmNactivateCallback, link_link_cb, recognizer);
+    refill(list, recognizer ? int(recognizer->targets.size()) : 0, [&](int i) {
+        const CueRecognizer::Target& t = recognizer->targets[size_t(i)];
+        return XmStringCreate(const_cast<char*>(t.name.c_str()),
+                              const_cast<char*>(t.keyShapeIndex >= 0 ? kLinked : kUnlinked));
+    });
 }
 
 void Gnome::update_keyshape_lister(KLKeySet* keyset) {
@@ -238,16 +247,10 @@ void Gnome::update_keyshape_lister(KLKeySet* keyset) {
     if (!list)
         return;
     linkKeyset = keyset;
-    XtRemoveAllCallbacks(list, XmNbrowseSelectionCallback);
-    XtAddCallback(list, XmNbrowseSelectionCallback, select_keyshape_cb, keyset);
-    XmListDeleteAllItems(list);
-    if (!keyset)
-        return;
-    for (int i = 0; i < keyset->keyShapeCount; ++i) {
-        XmString item = XmStringCreateLocalized(const_cast<char*>(keyset->GetKeyShapeName(i)));
-        XmListAddItemUnselected(list, item, 0);
-        XmStringFree(item);
-    }
+    rebind(list, XmNbrowseSelectionCallback, select_keyshape_cb, keyset);
+    refill(list, keyset ? keyset->keyShapeCount : 0, [&](int i) {
+        return XmStringCreateLocalized(const_cast<char*>(keyset->GetKeyShapeName(i)));
+    });
 }
 
 void Gnome::select_target_cb(Widget, XtPointer client, XtPointer) {

@@ -119,16 +119,17 @@ void Gnome::install_chirrup_host() {
 // --- The plug-ins' controls
 
 // A new control row named `name` on r's panel. Null when there is none to make: either the
-// control exists already (*existing is its record, now serving r) or r has no panel (said).
-Widget Gnome::control_row(CueRecognizer* r, const char* name, void** existing) {
-    *existing = nullptr;
+// control exists already (its record now serves r, and `update` gives it the plug-in's value)
+// or r has no panel (said).
+Widget Gnome::control_row(CueRecognizer* r, const char* name, const std::function<void()>& update) {
     if (!r || !name)
         return nullptr;
-    if (find_recognizer_widget(r->Name(), name, existing) && *existing) {
-        static_cast<SliderRecord*>(*existing)->recognizer = r;
+    void* existing = nullptr;
+    if (find_recognizer_widget(r->Name(), name, &existing) && existing) {
+        static_cast<SliderRecord*>(existing)->recognizer = r;
+        update();
         return nullptr;
     }
-    *existing = nullptr;
     Widget container = find_recognizer_widget(r->Name(), nullptr, nullptr);
     if (!container) {
         std::fprintf(stderr, "Couldn't find widget %s\n", r->Name());
@@ -164,28 +165,28 @@ void Gnome::add_scale(CueRecognizer* r, const char* name, Widget row, int low, i
     stash_recognizer_widget(r->Name(), name, scale, record);
 }
 
-// The slider `name` of r, its range and its record; null (said) when there is none.
-Widget Gnome::find_scale(CueRecognizer* r, const char* name, int* minimum, int* maximum,
-                         void** record) {
-    *record = nullptr;
-    Widget scale = r && name ? find_recognizer_widget(r->Name(), name, record) : nullptr;
-    if (!scale || !*record || !XmIsScale(scale)) {
+// Moves the slider `name` of r to `at` on its own scale (kept within its range) and shows
+// text(at) in its value label; 0 (said) when r has no such slider.
+int Gnome::move_scale(CueRecognizer* r, const char* name, int at, std::string (*text)(int)) {
+    void* record = nullptr;
+    Widget scale = r && name ? find_recognizer_widget(r->Name(), name, &record) : nullptr;
+    if (!scale || !record || !XmIsScale(scale)) {
         std::fprintf(stderr, "Couldn't find slider %s\n", name ? name : "");
-        return nullptr;
+        return 0;
     }
-    XtVaGetValues(scale, XmNminimum, minimum, XmNmaximum, maximum, nullptr);
-    return scale;
+    int minimum = 0, maximum = 0;
+    XtVaGetValues(scale, XmNminimum, &minimum, XmNmaximum, &maximum, nullptr);
+    at = std::min(std::max(at, minimum), maximum);
+    XmScaleSetValue(scale, at);
+    SetLabel(static_cast<SliderRecord*>(record)->valueLabel, text(at));
+    return 1;
 }
 
 int Gnome::CreateIntSlider(CueRecognizer* r, const char* name, int minimum, int maximum, int value,
                            CueChirrupHost::IntCallback callback) {
-    void* existing = nullptr;
-    Widget row = control_row(r, name, &existing);
-    if (!row) {
-        if (existing)
-            SetIntSlider(r, name, value);
+    Widget row = control_row(r, name, [&] { SetIntSlider(r, name, value); });
+    if (!row)
         return 0;
-    }
     maximum = std::max(maximum, minimum + 1);
     value = std::min(std::max(value, minimum), maximum);
     auto record = std::make_unique<SliderRecord>();
@@ -196,26 +197,14 @@ int Gnome::CreateIntSlider(CueRecognizer* r, const char* name, int minimum, int 
 }
 
 int Gnome::SetIntSlider(CueRecognizer* r, const char* name, int value) {
-    int minimum = 0, maximum = 0;
-    void* record = nullptr;
-    Widget scale = find_scale(r, name, &minimum, &maximum, &record);
-    if (!scale)
-        return 0;
-    value = std::min(std::max(value, minimum), maximum);
-    XmScaleSetValue(scale, value);
-    SetLabel(static_cast<SliderRecord*>(record)->valueLabel, int_text(value));
-    return 1;
+    return move_scale(r, name, value, int_text);
 }
 
 int Gnome::CreateFloatSlider(CueRecognizer* r, const char* name, float minimum, float maximum,
                              float value, CueChirrupHost::FloatCallback callback) {
-    void* existing = nullptr;
-    Widget row = control_row(r, name, &existing);
-    if (!row) {
-        if (existing)
-            SetFloatSlider(r, name, value);
+    Widget row = control_row(r, name, [&] { SetFloatSlider(r, name, value); });
+    if (!row)
         return 0;
-    }
     const int low = int(std::lround(minimum * kFloatScale));
     const int high = std::max(int(std::lround(maximum * kFloatScale)), low + 1);
     const int at = std::min(std::max(int(std::lround(value * kFloatScale)), low), high);
@@ -227,26 +216,15 @@ int Gnome::CreateFloatSlider(CueRecognizer* r, const char* name, float minimum, 
 }
 
 int Gnome::SetFloatSlider(CueRecognizer* r, const char* name, float value) {
-    int minimum = 0, maximum = 0;
-    void* record = nullptr;
-    Widget scale = find_scale(r, name, &minimum, &maximum, &record);
-    if (!scale)
-        return 0;
-    const int at = std::min(std::max(int(std::lround(value * kFloatScale)), minimum), maximum);
-    XmScaleSetValue(scale, at);
-    SetLabel(static_cast<SliderRecord*>(record)->valueLabel, float_text(float(at) / kFloatScale));
-    return 1;
+    return move_scale(r, name, int(std::lround(value * kFloatScale)),
+                      [](int at) { return float_text(float(at) / kFloatScale); });
 }
 
 int Gnome::CreateOption(CueRecognizer* r, const char* name, int count, const char* const* labels,
                         int value, CueChirrupHost::OptionCallback callback) {
-    void* existing = nullptr;
-    Widget row = control_row(r, name, &existing);
-    if (!row) {
-        if (existing)
-            SetOption(r, name, value);
+    Widget row = control_row(r, name, [&] { SetOption(r, name, value); });
+    if (!row)
         return 0;
-    }
     auto record = std::make_unique<SliderRecord>();
     record->recognizer = r;
     record->optionCallback = callback;

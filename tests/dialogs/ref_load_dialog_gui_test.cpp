@@ -8,10 +8,10 @@
 #include <Xm/TextF.h>
 #include <Xm/Xm.h>
 
-#include <functional>
 #include <string>
 
 #include "dialogs/RefLoadDialog.h"
+#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
 #include "toolkit/xm/KLXmGnome.h"
 
@@ -51,69 +51,38 @@ class RefLoadDialogTest : public ::testing::Test {
         XtRealizeWidget(shell);
         dialog = new RefLoadDialog;
     }
-    // Runs `step` every 20 ms (from the nested loop of the modal dialog) until it returns true.
-    struct Poll {
-        std::function<bool()> step;
-        bool done = false;
-        static void tick(XtPointer self, XtIntervalId*) {
-            auto* p = static_cast<Poll*>(self);
-            if (p->step())
-                p->done = true;
-            else
-                XtAppAddTimeOut(KLXmGnome::AppContext(), 20, tick, self);
-        }
-        explicit Poll(std::function<bool()> f) : step(std::move(f)) {
-            XtAppAddTimeOut(KLXmGnome::AppContext(), 20, tick, this);
-        }
-    };
-    static bool viewable(Widget w) {
-        XWindowAttributes a;
-        return XtIsRealized(w) && XGetWindowAttributes(XtDisplay(w), XtWindow(w), &a) &&
-               a.map_state == IsViewable;
-    }
-    // Shows the dialog and presses `button` once it is on the screen.
-    int ShowAndPress(Widget button) {
-        Poll press([button] {
-            if (!viewable(button))
+    // Shows the dialog and, once `widget` is on the screen, runs `answer` on it.
+    static int ShowAndAnswer(Widget widget, void (*answer)(Widget)) {
+        guitest::AnswerScript script({[&] {
+            if (!guitest::Viewable(widget))
                 return false;
             guitest::Settle();  // the form's layout is final before the click
-            guitest::Click(button);
+            answer(widget);
             return true;
-        });
+        }});
         int result = dialog->Show();
-        EXPECT_TRUE(press.done);
+        EXPECT_TRUE(script.Finished());
         return result;
     }
+    static void press(Widget button) { guitest::Click(button); }
     static RefLoadDialog* dialog;
 };
 RefLoadDialog* RefLoadDialogTest::dialog = nullptr;
 
-TEST_F(RefLoadDialogTest, FindsItsWidgets) {
-    EXPECT_EQ(dialog->dialog, KLXmGnome::FindWidget("refDialog"));
-    EXPECT_EQ(dialog->byField, KLXmGnome::FindWidget("refBy"));
-    EXPECT_EQ(dialog->okButton, KLXmGnome::FindWidget("refLoadOk"));
-    EXPECT_EQ(dialog->cancelButton, KLXmGnome::FindWidget("refLoadCancel"));
-}
-
-TEST_F(RefLoadDialogTest, ValuesRoundTripAndZoomTravelsInRefBy) {
+// The step is always 1 and the zoom travels in refBy; numbers that do not read are 0; Prefix
+// gives a fresh string each call.
+TEST_F(RefLoadDialogTest, FieldsHoldTheValues) {
     dialog->SetPrefix("shots/take1.");
-    dialog->SetExt("png");
-    dialog->SetStart(3);
-    dialog->SetEnd(120);
-    dialog->SetBy(5);  // the step is always 1
+    std::string first = dialog->Prefix();
+    dialog->SetPrefix("two");
+    EXPECT_EQ(first, "shots/take1.");
+    EXPECT_STREQ(dialog->Prefix(), "two");
+    dialog->SetBy(5);
     dialog->SetZoom(2);
-    EXPECT_STREQ(dialog->Prefix(), "shots/take1.");
-    EXPECT_STREQ(dialog->Ext(), "png");
-    EXPECT_EQ(dialog->Start(), 3);
-    EXPECT_EQ(dialog->End(), 120);
     EXPECT_EQ(dialog->By(), 1);
-    EXPECT_EQ(dialog->Zoom(), 2);
-    char* text = XmTextFieldGetString(dialog->byField);
+    char* text = XmTextFieldGetString(KLXmGnome::FindWidget("refBy"));
     EXPECT_STREQ(text, "2");
     XtFree(text);
-}
-
-TEST_F(RefLoadDialogTest, GarbageAndEmptyNumbersReadAsZero) {
     for (const char* typed : {"", "abc", " "}) {
         XmTextFieldSetString(dialog->startField, const_cast<char*>(typed));
         EXPECT_EQ(dialog->Start(), 0) << "\"" << typed << "\"";
@@ -122,31 +91,16 @@ TEST_F(RefLoadDialogTest, GarbageAndEmptyNumbersReadAsZero) {
     EXPECT_EQ(dialog->End(), 42);
 }
 
-TEST_F(RefLoadDialogTest, PrefixReturnsAFreshStringEachCall) {
-    dialog->SetPrefix("one");
-    std::string first = dialog->Prefix();
-    dialog->SetPrefix("two");
-    char* second = dialog->Prefix();
-    EXPECT_EQ(first, "one");
-    EXPECT_STREQ(second, "two");
-}
-
-TEST_F(RefLoadDialogTest, OkAndCancelAnswerTheModalShow) {
-    EXPECT_EQ(ShowAndPress(dialog->okButton), 1);
+// OK answers 1; Cancel and the window manager's close answer 0 and leave the fields alone.
+TEST_F(RefLoadDialogTest, OkCancelAndCloseAnswerTheModalShow) {
+    EXPECT_EQ(ShowAndAnswer(dialog->okButton, press), 1);
     EXPECT_FALSE(XtIsManaged(dialog->dialog));
     dialog->SetStart(7);
-    EXPECT_EQ(ShowAndPress(dialog->cancelButton), 0);
-    EXPECT_EQ(dialog->Start(), 7) << "Cancel leaves the fields as they were";
-}
-
-TEST_F(RefLoadDialogTest, WindowManagerCloseIsCancel) {
-    Poll close([] {
-        if (!viewable(XtParent(dialog->dialog)))
-            return false;
-        guitest::CloseFromWindowManager(dialog->dialog);
-        return true;
-    });
-    EXPECT_EQ(dialog->Show(), 0);
+    EXPECT_EQ(ShowAndAnswer(dialog->cancelButton, press), 0);
+    EXPECT_EQ(dialog->Start(), 7);
+    EXPECT_EQ(ShowAndAnswer(XtParent(dialog->dialog),
+                            [](Widget) { guitest::CloseFromWindowManager(dialog->dialog); }),
+              0);
 }
 
 }  // namespace

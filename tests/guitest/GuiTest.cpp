@@ -13,6 +13,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
+#include <map>
 #include <thread>
 
 #include "toolkit/xm/KLXmGnome.h"
@@ -82,16 +83,25 @@ void Settle() {
     sync_and_process();
 }
 
+bool Viewable(Widget widget) {
+    if (!widget || (!XtIsShell(widget) && !XtIsManaged(widget)))
+        return false;
+    Widget windowed = XtIsWidget(widget) ? widget : XtParent(widget);
+    XWindowAttributes attributes;
+    return XtIsRealized(windowed) &&
+           XGetWindowAttributes(XtDisplay(windowed), XtWindow(windowed), &attributes) &&
+           attributes.map_state == IsViewable;
+}
+
 bool WaitMapped(Widget widget, double seconds) {
-    return WaitFor(
-        [widget] {
-            if (!XtIsRealized(widget))
-                return false;
-            XWindowAttributes attributes;
-            return XGetWindowAttributes(XtDisplay(widget), XtWindow(widget), &attributes) &&
-                   attributes.map_state == IsViewable;
-        },
-        seconds);
+    return WaitFor([widget] { return Viewable(widget); }, seconds);
+}
+
+std::vector<Widget> Children(Widget widget) {
+    WidgetList children = nullptr;
+    Cardinal count = 0;
+    XtVaGetValues(widget, XmNchildren, &children, XmNnumChildren, &count, nullptr);
+    return std::vector<Widget>(children, children + count);
 }
 
 void MoveTo(Widget widget, int x, int y) {
@@ -146,6 +156,13 @@ void DoubleClick(Widget widget, int button, int x, int y) {
     Settle();
 }
 
+bool ClickWhenViewable(Widget button) {
+    if (!Viewable(button))
+        return false;
+    Click(button);
+    return true;
+}
+
 void TypeKey(unsigned long keysym, unsigned int modifiers) {
     Display* d = GetDisplay();
     KeyCode code = XKeysymToKeycode(d, keysym);
@@ -164,16 +181,10 @@ void TypeKey(unsigned long keysym, unsigned int modifiers) {
 }
 
 void TypeText(const std::string& text) {
-    for (char c : text) {
-        KeySym sym = c == ' ' ? XK_space : c == '\n' ? XK_Return : static_cast<KeySym>(c);
-        if (c == '.')
-            sym = XK_period;
-        if (c == '-')
-            sym = XK_minus;
-        if (c == ':')
-            sym = XK_colon;
-        TypeKey(sym);
-    }
+    static const std::map<char, KeySym> named = {
+        {' ', XK_space}, {'\n', XK_Return}, {'.', XK_period}, {'-', XK_minus}, {':', XK_colon}};
+    for (char c : text)
+        TypeKey(named.count(c) ? named.at(c) : static_cast<KeySym>(c));
 }
 
 unsigned long PixelAt(Widget widget, int x, int y) {

@@ -2,6 +2,7 @@
 
 #include <functional>
 #include <string>
+#include <vector>
 
 #include <X11/Intrinsic.h>
 
@@ -20,8 +21,13 @@ Display* GetDisplay();
 bool WaitFor(const std::function<bool()>& done, double seconds = 5.0);
 // Processes events for a short while (until the server has answered everything sent so far).
 void Settle();
-// Maps `shell` (a top-level or dialog shell) and waits until it is viewable.
+// Whether a widget is on the screen: managed (shells excepted) and its window viewable; a
+// gadget (a dialog's buttons) by its parent's window.
+bool Viewable(Widget widget);
+// Waits until `widget` (a top-level or dialog shell, a dialog's button) is viewable.
 bool WaitMapped(Widget widget, double seconds = 5.0);
+// The children of a composite (a menu's entries, a row's tiles).
+std::vector<Widget> Children(Widget widget);
 
 // Real input through XTest, at widget-relative positions (x or y of -1: the widget's centre).
 void MoveTo(Widget widget, int x = -1, int y = -1);
@@ -29,6 +35,8 @@ void Press(int button, unsigned int modifiers = 0);
 void Release(int button, unsigned int modifiers = 0);
 void Click(Widget widget, int button = 1, int x = -1, int y = -1, unsigned int modifiers = 0);
 void DoubleClick(Widget widget, int button = 1, int x = -1, int y = -1);
+// Clicks a button when it is viewable; false when it is not (yet).
+bool ClickWhenViewable(Widget button);
 // Types one key (a keysym such as XK_BackSpace or XK_a) with ShiftMask/ControlMask/Mod1Mask
 // modifiers held; the key goes to the window under the pointer (no window manager).
 void TypeKey(unsigned long keysym, unsigned int modifiers = 0);

@@ -4,40 +4,36 @@
 
 #include <functional>
 #include <string>
-#include <vector>
 
 #include "window/DemoProject.h"
 
 class Gnome;
+class KLAlert;
 
 // Helpers of the main-window tests: the one Gnome of the test program, built on the test
-// display with the program's own resource file, and a script of answers given to modal
-// dialogs while the code under test waits in its nested event loop.
+// display with the program's own resource file.
 namespace windowtest {
+
+// The widget registered under `name`.
+Widget W(const char* name);
+// A widget's label string; "<none>" when there is no widget.
+std::string Label(Widget widget);
+std::string Label(const char* name);
 
 // The window, built once per test program (Xt cannot reopen the display).
 Gnome& TheWindow();
+// The window with the demo keyset (and, when `track`, its track and sound) loaded from the
+// demo project, loaded once unless a keyset is there already.
+Gnome& TheDemoWindow(bool track = false);
 
-// Steps run from a short timeout while the test waits in a modal loop: each step is tried
-// every few milliseconds until it returns true, then the next is tried.
-class AnswerScript {
-  public:
-    explicit AnswerScript(std::vector<std::function<bool()>> steps);
-    ~AnswerScript();
-    bool Finished() const { return next_ >= steps_.size(); }
-
-  private:
-    static void tick(XtPointer self, XtIntervalId*);
-    std::vector<std::function<bool()>> steps_;
-    size_t next_ = 0;
-    XtIntervalId timer_ = 0;
-};
-
-// Whether a dialog (or any widget) is on the screen.
-bool Viewable(Widget widget);
-// Clicks a push button when it is viewable; false when it is not (yet).
-bool ClickWhenViewable(Widget button);
 // Types `path` into a file browser's name field and presses its OK button.
 bool ChooseInBrowser(Widget browser, const std::string& path);
+
+// Runs `action`, answering every question `alert` asks meanwhile with its button `button`; the
+// last message told, empty when none was.
+std::string AnswerAlerts(KLAlert* alert, const std::function<void()>& action, int button = 0);
+
+// The option menu's entry `index` chosen as a click on it would (its activate callbacks).
+void ChooseOption(Widget optionMenu, int index);
 
 }  // namespace windowtest

@@ -31,68 +31,53 @@ CueTime Frames(int f) {
     return CueTime::FromTicks(f * 200);
 }  // at 30 frames a second
 
-struct TypeinCase {
-    const char* text;
-    int32_t ticks;
-};
-
-class ParseTypeinTest : public ::testing::TestWithParam<TypeinCase> {};
-
-TEST_P(ParseTypeinTest, TextBecomesTime) {
+TEST(ApplyTypein, TextBecomesTime) {
     CueTime::default_fps = 30;
-    EXPECT_EQ(Gnome::parse_typein(GetParam().text).Ticks(), GetParam().ticks) << GetParam().text;
+    const std::pair<const char*, int32_t> cases[] = {
+        {"1:2", 6000 + 400},         // seconds and frames
+        {"1.2.3", 62 * 6000 + 600},  // minutes, seconds, frames
+        {"1:0:0:0", 3600 * 6000},    // hours
+        {"7:", 1400},                // one number: frames
+        {"  12", 2400},              // a frame count
+        {"2.5", 2 * 6000 + 1000},    // a point makes a time code
+        {"", 0},                     // nothing read: time 0
+        {"abc", 0},
+        {":", 0},
+        {"-3", -600}};
+    for (const auto& [text, ticks] : cases)
+        EXPECT_EQ(Gnome::parse_typein(text).Ticks(), ticks) << '"' << text << '"';
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Texts, ParseTypeinTest,
-    ::testing::Values(TypeinCase{"1:2", 6000 + 400},                // seconds and frames
-                      TypeinCase{"1.2.3", 62 * 6000 + 600},         // minutes, seconds, frames
-                      TypeinCase{"1:0:0:0", 3600 * 6000},           // hours
-                      TypeinCase{"7:", 1400},                       // one number: frames
-                      TypeinCase{"12", 2400},                       // a frame count
-                      TypeinCase{"2.5", 2 * 6000 + 1000},           // a point makes a time code
-                      TypeinCase{"  12", 2400}, TypeinCase{"", 0},  // empty: time 0
-                      TypeinCase{"abc", 0}, TypeinCase{":", 0},     // nothing read: time 0
-                      TypeinCase{"-3", -600}));
-
-struct FieldCase {
-    const char* field;
-    int typed;                         // frames
-    int srcIn, srcOut, dstIn, dstOut;  // the event after, in frames
-};
-
-class ApplyTypeinTest : public ::testing::TestWithParam<FieldCase> {};
-
-TEST_P(ApplyTypeinTest, FieldCorrectsTheOthers) {
-    const FieldCase& c = GetParam();
-    // Before: source 10..40, destination 100..130; duration 60 frames.
-    KLEdlEvent e("scene.glb", Frames(10), Frames(40), Frames(100), Frames(130));
-    Gnome::apply_typein(&e, c.field, Frames(c.typed), Frames(60));
-    EXPECT_EQ(e.sourceIn, Frames(c.srcIn));
-    EXPECT_EQ(e.sourceOut, Frames(c.srcOut));
-    EXPECT_EQ(e.destIn, Frames(c.dstIn));
-    EXPECT_EQ(e.destOut, Frames(c.dstOut));
+// Each field corrects the others: source 10..40, destination 100..130, duration 60 frames.
+TEST(ApplyTypein, FieldCorrectsTheOthers) {
+    struct Case {
+        const char* field;
+        int typed;                         // frames
+        int srcIn, srcOut, dstIn, dstOut;  // the event after, in frames
+    };
+    for (Case c : {Case{"src_in", 20, 20, 40, 100, 120},
+                   Case{"src_in", 50, 50, 50, 100, 100},  // out follows in
+                   Case{"src_out", 30, 10, 30, 100, 120},
+                   Case{"src_out", 90, 10, 60, 100, 150},  // cut to the duration
+                   Case{"src_out", 5, 5, 5, 100, 100},     // in follows out
+                   Case{"dst_in", 0, 10, 40, 0, 30},
+                   Case{"dst_out", 200, 10, 40, 170, 200},  // keeps the length
+                   Case{"nonsense", 7, 10, 40, 100, 130}}) {
+        SCOPED_TRACE(testing::Message() << c.field << " " << c.typed);
+        KLEdlEvent e("scene.glb", Frames(10), Frames(40), Frames(100), Frames(130));
+        Gnome::apply_typein(&e, c.field, Frames(c.typed), Frames(60));
+        EXPECT_EQ(e.sourceIn, Frames(c.srcIn));
+        EXPECT_EQ(e.sourceOut, Frames(c.srcOut));
+        EXPECT_EQ(e.destIn, Frames(c.dstIn));
+        EXPECT_EQ(e.destOut, Frames(c.dstOut));
+    }
 }
-
-INSTANTIATE_TEST_SUITE_P(
-    Fields, ApplyTypeinTest,
-    ::testing::Values(FieldCase{"src_in", 20, 20, 40, 100, 120},
-                      FieldCase{"src_in", 50, 50, 50, 100, 100},  // out follows in
-                      FieldCase{"src_out", 30, 10, 30, 100, 120},
-                      FieldCase{"src_out", 90, 10, 60, 100, 150},  // cut to the duration
-                      FieldCase{"src_out", 5, 5, 5, 100, 100},     // in follows out
-                      FieldCase{"dst_in", 0, 10, 40, 0, 30},
-                      FieldCase{"dst_out", 200, 10, 40, 170, 200},  // keeps the length
-                      FieldCase{"nonsense", 7, 10, 40, 100, 130}));
 
 class ApplyDialogTest : public ::testing::Test {
   protected:
     void SetUp() override {
-        gnome = &windowtest::TheWindow();
+        gnome = &windowtest::TheDemoWindow();
         project = windowtest::DemoProject();
-        if (theImp.keysetCount == 0) {
-            ASSERT_EQ(theImp.LoadKeyset((project + "/misc_data/demo.kset").c_str()), 1);
-        }
     }
     Gnome* gnome = nullptr;
     std::string project;
@@ -118,6 +103,8 @@ TEST_F(ApplyDialogTest, SelectedItemIsTheFirstWordOfTheNthSelection) {
     EXPECT_STREQ(Gnome::selected_item(dags, 0), "two");
 }
 
+// Opening the apply file fills the dialog; a typed time is corrected; Apply without a dag
+// node or a keyset alerts and keeps the dialog; Done closes it.
 TEST_F(ApplyDialogTest, OpeningTheApplyFileFillsTheDialog) {
     theImp.OpenApplyWire((project + "/wire/face.glb").c_str());
     ASSERT_TRUE(theImp.applyEvent);
@@ -137,36 +124,27 @@ TEST_F(ApplyDialogTest, OpeningTheApplyFileFillsTheDialog) {
     EXPECT_EQ(theImp.applyEvent->sourceOut, theImp.duration);
     guitest::Settle();
     guitest::Screenshot("window-apply-dialog");
+
+    // Apply without a dag node or a keyset selected: told, and the dialog stays.
+    for (bool withDag : {false, true}) {
+        XmListDeselectAllItems(KLXmGnome::FindWidget("keyLister"));
+        XmListDeselectAllItems(dags);
+        if (withDag)
+            XmListSelectPos(dags, 1, False);
+        const std::string told = windowtest::AnswerAlerts(
+            gnome->attentionAlert.get(), [] { Gnome::apply_cb(nullptr, nullptr, nullptr); });
+        EXPECT_EQ(told, withDag ? "You must select one or more keysets to apply."
+                                : "You must select a dag node to apply under.");
+        EXPECT_TRUE(XtIsManaged(dialog));
+    }
     Gnome::done_cb(nullptr, nullptr, nullptr);
     EXPECT_FALSE(XtIsManaged(dialog));
     EXPECT_FALSE(theImp.applyEvent->wire);
 }
 
-TEST_F(ApplyDialogTest, ApplyWithoutDagOrKeysetAlertsAndKeepsTheDialog) {
-    theImp.OpenApplyWire((project + "/wire/face.glb").c_str());
-    KLAlert* alert = gnome->attentionAlert.get();
-    for (bool withDag : {false, true}) {
-        XmListDeselectAllItems(KLXmGnome::FindWidget("keyLister"));
-        XmListDeselectAllItems(KLXmGnome::FindWidget("dagLister"));
-        if (withDag)
-            XmListSelectPos(KLXmGnome::FindWidget("dagLister"), 1, False);
-        std::string told;
-        windowtest::AnswerScript script({[&] {
-            if (!alert->Waiting() || !windowtest::Viewable(alert->Button(0)))
-                return false;
-            told = guitest::XmText(alert->GetDialog(), XmNmessageString);
-            return windowtest::ClickWhenViewable(alert->Button(0));
-        }});
-        Gnome::apply_cb(nullptr, nullptr, nullptr);
-        EXPECT_TRUE(script.Finished());
-        EXPECT_EQ(told, withDag ? "You must select one or more keysets to apply."
-                                : "You must select a dag node to apply under.");
-        EXPECT_TRUE(XtIsManaged(KLXmGnome::FindWidget("applyDialog")));
-    }
-    Gnome::done_cb(nullptr, nullptr, nullptr);
-}
-
-TEST_F(ApplyDialogTest, StoringTheApplyFileWritesRawGeometryOnlyWithVxRawfile) {
+// The apply file is stored with its raw geometry only with VX_RAWFILE; the other file managers
+// have their kinds and filters, and stores that write nothing or are refused.
+TEST_F(ApplyDialogTest, StoresWriteWhatTheirKindWrites) {
     std::string out = project + "/wire/applied.glb";
     for (bool raw : {false, true}) {
         fs::remove(out);
@@ -193,9 +171,7 @@ TEST_F(ApplyDialogTest, StoringTheApplyFileWritesRawGeometryOnlyWithVxRawfile) {
     }
     EXPECT_GT(vertices, 3);
     EXPECT_GT(faces, 0);
-}
 
-TEST(FileManagers, KindsFiltersAndStores) {
     SoundFileManager sound(nullptr);
     ReferenceFileManager reference(nullptr);
     WireFileManager wire(nullptr);

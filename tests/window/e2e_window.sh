@@ -42,21 +42,23 @@ wait_window() {
     timeout 20 xdotool search --sync --onlyvisible --name "^$1\$" | head -1 ||
         fail "no window \"$1\""
 }
-# Waits (up to 20 s) until no visible window has that title.
-wait_gone() {
+# Waits (up to 20 s) until `test` (a command) fails: a window gone, the program ended.
+wait_until_not() {
     for _ in $(seq 200); do
-        xdotool search --onlyvisible --name "^$1\$" >/dev/null 2>&1 || return 0
+        "$@" >/dev/null 2>&1 || return 0
         timeout 0.1 tail -f /dev/null || true
     done
-    fail "window \"$1\" stayed up"
+    return 1
 }
-# Types a path into the browser under the pointer (replacing its text) and presses Return.
+# In the browser of that title, replaces the path typed and presses Return; waits until it goes.
 choose() {
-    xdotool mousemove --window "$1" 200 40
-    xdotool key End
-    xdotool key --delay 0 --repeat 300 BackSpace
-    xdotool type --delay 5 "$2"
+    local browser
+    browser=$(wait_window "$1")
+    [ -z "${2:-}" ] || shot "$2"
+    xdotool mousemove --window "$browser" 200 40 key End key --delay 0 --repeat 300 BackSpace
+    xdotool type --delay 5 "$3"
     xdotool key Return
+    wait_until_not xdotool search --onlyvisible --name "^$1\$" || fail "window \"$1\" stayed up"
 }
 
 # A project whose data, scene and picture folders hold the demo.
@@ -77,30 +79,21 @@ shot e2e-1-demo-keyset
 
 # Ctrl+O: the track browser; choose the demo track.
 xdotool key ctrl+o
-browser=$(wait_window "Open Track")
-shot e2e-2-open-track-browser
-choose "$browser" "$work/project/misc_data/demo.track"
-wait_gone "Open Track"
+choose "Open Track" e2e-2-open-track-browser "$work/project/misc_data/demo.track"
 kill -0 "$pid" 2>/dev/null || fail "the program ended while opening the track"
 xdotool mousemove --window "$main" 600 600
 shot e2e-3-track-opened
 
 # Ctrl+S: save the track under a new name.
 xdotool key ctrl+s
-browser=$(wait_window "Save Track As")
-choose "$browser" "$work/project/misc_data/saved.track"
-wait_gone "Save Track As"
+choose "Save Track As" "" "$work/project/misc_data/saved.track"
 [ -s "$work/project/misc_data/saved.track" ] || fail "the track was not saved"
 grep -q "keytrack" "$work/project/misc_data/saved.track" || fail "the saved track has no key tracks"
 
 # Ctrl+Q: nothing is modified, so the program ends at once with status 0.
 xdotool mousemove --window "$main" 600 600
 xdotool key ctrl+q
-for _ in $(seq 100); do
-    kill -0 "$pid" 2>/dev/null || break
-    timeout 0.1 tail -f /dev/null || true
-done
-if kill -0 "$pid" 2>/dev/null; then
+if ! wait_until_not kill -0 "$pid"; then
     shot e2e-4-still-running
     fail "the program did not quit"
 fi

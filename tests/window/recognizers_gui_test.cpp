@@ -4,8 +4,6 @@
 #include <gtest/gtest.h>
 
 #include <Xm/List.h>
-#include <Xm/RowColumn.h>
-#include <Xm/Scale.h>
 #include <Xm/Xm.h>
 
 #include <chrono>
@@ -47,23 +45,12 @@ const bool kEnvironment = [] {
     return true;
 }();
 
-Widget W(const char* name) {
-    return KLXmGnome::FindWidget(name);
-}
+using windowtest::Label;
+using windowtest::W;
+
 // A widget of the link dialog (other dialogs use some of the same names).
 Widget L(const char* name) {
     return XtNameToWidget(KLXmGnome::FindWidget("linkDialog"), (std::string("*") + name).c_str());
-}
-
-std::string label_of(Widget w) {
-    XmString s = nullptr;
-    XtVaGetValues(w, XmNlabelString, &s, nullptr);
-    char* text = nullptr;
-    XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-    std::string out = text ? text : "";
-    XtFree(text);
-    XmStringFree(s);
-    return out;
 }
 
 // The character set item `position` (1-based) of a list is written in.
@@ -128,14 +115,10 @@ class Recognizers : public ::testing::Test {
         guitest::Click(W("recognizer"));
         Widget entry = nullptr;
         ASSERT_TRUE(guitest::WaitFor([&] {
-            WidgetList children = nullptr;
-            Cardinal count = 0;
-            XtVaGetValues(W("recognizerMenu"), XmNchildren, &children, XmNnumChildren, &count,
-                          nullptr);
-            for (Cardinal i = 0; i < count; ++i)
-                if (label_of(children[i]) == name)
-                    entry = children[i];
-            return entry && windowtest::Viewable(entry);
+            for (Widget child : guitest::Children(W("recognizerMenu")))
+                if (Label(child) == name)
+                    entry = child;
+            return guitest::Viewable(entry);
         }));
         guitest::Click(entry);
         guitest::Settle();
@@ -148,52 +131,55 @@ class Recognizers : public ::testing::Test {
     Widget panel_item(const char* recognizer, const char* item) {
         return gnome->find_recognizer_widget(recognizer, item, nullptr);
     }
+    // The chart shows the mouth's track over the dialogue and `after` seconds more.
+    KLSyncChart* ChartOverDialogue(double after) {
+        EXPECT_EQ(theImp.LoadSound((project + "/misc_data/dialogue.aiff").c_str()), 1);
+        KLSyncChart* chart = gnome->syncChart;
+        chart->SetSound(theImp.sound.get());
+        chart->SetKeyTrack(theImp.GetKeyTrack(0));
+        chart->SetUserDuration(CueTime::FromSeconds(theImp.sound->Length() + after));
+        chart->ZoomReset();
+        return chart;
+    }
     Gnome* gnome = nullptr;
     std::string project;
     KLKeySet* mouth = nullptr;
 };
 
+// The menu and panels come from the plug-ins; a menu entry whose plug-in cannot make a
+// recognizer says so and adds nothing.
 TEST_F(Recognizers, MenuAndPanelsComeFromThePlugins) {
     EXPECT_STREQ(theImp.recognizers.HeadKey(), "Loudness");
     EXPECT_STREQ(theImp.recognizers.NextKey("Loudness"), "Phoneme");
+    // A panel per plug-in with its three buttons (the other tests press them).
     for (const char* name : {"Loudness", "Phoneme"}) {
         Widget container = panel_item(name, nullptr);
         ASSERT_TRUE(container) << name;
-        EXPECT_STREQ(XtName(container), "mid_rc");
         EXPECT_EQ(XtName(XtParent(container)), std::string(name) + " Recognizer");
-        const int positions[3][2] = {{1, 5}, {6, 10}, {11, 15}};
-        const char* labels[] = {"Configure", "Recognize", "Dismiss"};
-        for (int i = 0; i < 3; ++i) {
-            Widget b = panel_item(name, labels[i]);
-            ASSERT_TRUE(b);
-            EXPECT_EQ(label_of(b), labels[i]);
-            int left = 0, right = 0;
-            XtVaGetValues(b, XmNleftPosition, &left, XmNrightPosition, &right, nullptr);
-            EXPECT_EQ(left, positions[i][0]);
-            EXPECT_EQ(right, positions[i][1]);
-        }
+        for (const char* label : {"Configure", "Recognize", "Dismiss"})
+            EXPECT_EQ(Label(panel_item(name, label)), label);
     }
     EXPECT_EQ(panel_item("Nobody", nullptr), nullptr);
+
+    const size_t before = mouth->recognizers.size();
+    EXPECT_EQ(windowtest::AnswerAlerts(
+                  gnome->attentionAlert.get(),
+                  [] { Gnome::create_recognize_cb(nullptr, const_cast<char*>("Vowel"), nullptr); }),
+              "Failed to locate plug-in recognizer [Vowel].");
+    EXPECT_EQ(mouth->recognizers.size(), before);
 }
 
 TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
-    ASSERT_EQ(theImp.LoadSound((project + "/misc_data/dialogue.aiff").c_str()), 1);
-    // The chart shows the mouth's track over the whole dialogue.
-    KLSyncChart* chart = gnome->syncChart;
-    ASSERT_TRUE(chart);
-    chart->SetSound(theImp.sound.get());
-    chart->SetKeyTrack(theImp.GetKeyTrack(0));
-    chart->SetUserDuration(CueTime::FromSeconds(theImp.sound->Length()));
-    chart->ZoomReset();
+    ChartOverDialogue(0);
     choose_from_menu("Phoneme");
     CueRecognizer* r = mouth->GetRecognizer("Phoneme");
     ASSERT_TRUE(r);
     EXPECT_EQ(r->shown, 1);
     Widget container = panel_item("Phoneme", nullptr);
-    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
-    EXPECT_EQ(label_of(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
-    EXPECT_EQ(label_of(panel_item("Phoneme", "value-step")), "     1 ");
-    EXPECT_EQ(label_of(panel_item("Phoneme", "value-minimum")), "     2 ");
+    ASSERT_TRUE(guitest::WaitMapped(container));
+    EXPECT_EQ(Label(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
+    EXPECT_EQ(Label(panel_item("Phoneme", "value-step")), "     1 ");
+    EXPECT_EQ(Label(panel_item("Phoneme", "value-minimum")), "     2 ");
     ASSERT_TRUE(panel_item("Phoneme", "speed"));
     EXPECT_TRUE(XtIsSensitive(panel_item("Phoneme", "Recognize"))) << "every phone is linked";
 
@@ -204,14 +190,14 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     XtVaGetValues(minimum, XmNwidth, &width, nullptr);
     guitest::Click(minimum, 1, width - 4, -1);
     ASSERT_TRUE(guitest::WaitFor(
-        [&] { return label_of(panel_item("Phoneme", "value-minimum")) == "     3 "; }));
+        [&] { return Label(panel_item("Phoneme", "value-minimum")) == "     3 "; }));
     std::ostringstream settings;
     r->WriteSettings(settings);
     EXPECT_NE(settings.str().find("    minimum 3\n"), std::string::npos) << settings.str();
     // Setting a slider from the program moves it and its label, and tells the plug-in
     // nothing: it set the value itself.
     EXPECT_EQ(CueChirrup::SetIntSlider(r, "minimum", 2), 1);
-    EXPECT_EQ(label_of(panel_item("Phoneme", "value-minimum")), "     2 ");
+    EXPECT_EQ(Label(panel_item("Phoneme", "value-minimum")), "     2 ");
     std::istringstream back("minimum 2\nend\n");
     r->ReadSettings(back);
 
@@ -221,7 +207,7 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     click_panel("Phoneme", "Recognize");
     ASSERT_TRUE(guitest::WaitFor([&] { return track->events.Count() > 10; }, 30.0));
     guitest::Settle();
-    EXPECT_FALSE(windowtest::Viewable(gnome->informationAlert->GetDialog()));
+    EXPECT_FALSE(guitest::Viewable(gnome->informationAlert->GetDialog()));
     // The pause between the sentences (0.833 s to 1.222 s) holds the rest shape.
     const int rest = mouth->GetKeyShapeId("rest");
     int restInPause = 0;
@@ -230,26 +216,19 @@ TEST_F(Recognizers, PanelShowsThePluginsSlidersAndRecognizeFillsTheMouthTrack) {
     EXPECT_GE(restInPause, 1);
     // The placed keys become active one after another while the indicator is hidden (no
     // click yet): the information bar keeps a time the chart can show.
-    EXPECT_EQ(label_of(W("infoTimeValue")).find('-'), std::string::npos)
-        << label_of(W("infoTimeValue"));
+    EXPECT_EQ(Label(W("infoTimeValue")).find('-'), std::string::npos) << Label(W("infoTimeValue"));
     guitest::Screenshot("window-phoneme-recognized");
 
     click_panel("Phoneme", "Dismiss");
-    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(container); }));
+    EXPECT_TRUE(guitest::WaitFor([&] { return !guitest::Viewable(container); }));
     EXPECT_EQ(r->shown, 0);
 }
 
 // A recognizer that cannot run, or a region past the end of the sound, leaves the region's
 // keys as they were.
 TEST_F(Recognizers, RecognitionThatFindsNothingKeepsTheRegionsKeys) {
-    ASSERT_EQ(theImp.LoadSound((project + "/misc_data/dialogue.aiff").c_str()), 1);
-    KLSyncChart* chart = gnome->syncChart;
-    ASSERT_TRUE(chart);
-    chart->SetSound(theImp.sound.get());
-    chart->SetKeyTrack(theImp.GetKeyTrack(0));
+    KLSyncChart* chart = ChartOverDialogue(2.0);
     const double length = theImp.sound->Length();
-    chart->SetUserDuration(CueTime::FromSeconds(length + 2.0));
-    chart->ZoomReset();
     Gnome::create_recognize_cb(nullptr, const_cast<char*>("Phoneme"), nullptr);
     CueRecognizer* r = mouth->GetRecognizer("Phoneme");
     ASSERT_TRUE(r);
@@ -274,7 +253,7 @@ TEST_F(Recognizers, RecognitionThatFindsNothingKeepsTheRegionsKeys) {
     chart->SetRegionRange(CueTime::FromSeconds(0.5), CueTime::FromSeconds(2.0));
     Gnome::recognize_cb(nullptr, r, nullptr);
     EXPECT_EQ(keys(), before);
-    EXPECT_FALSE(windowtest::Viewable(gnome->informationAlert->GetDialog()));
+    EXPECT_FALSE(guitest::Viewable(gnome->informationAlert->GetDialog()));
 
     // A region wholly past the sound's end has nothing to hear.
     std::istringstream model("models \"" + std::string(PhonemeModels) + "\"\nend\n");
@@ -292,21 +271,19 @@ TEST_F(Recognizers, RecognitionThatFindsNothingKeepsTheRegionsKeys) {
     chart->SetRegionRange(CueTime(), CueTime());
 }
 
-// Loudness's sliders with their value labels, and the messages for controls that are not
-// there.
+// Loudness's sliders with their value labels, the messages for controls that are not there;
+// a keyset without the recognizer hides its panel and coming back shows it for the keyset.
 TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
     choose_from_menu("Loudness");
     CueRecognizer* r = mouth->GetRecognizer("Loudness");
     ASSERT_TRUE(r);
-    ASSERT_TRUE(
-        guitest::WaitFor([&] { return windowtest::Viewable(panel_item("Loudness", nullptr)); }));
-    EXPECT_EQ(label_of(panel_item("Loudness", "value-step")), "     1 ");
-    EXPECT_EQ(label_of(panel_item("Loudness", "value-half")), " -36.000");
-    EXPECT_EQ(label_of(panel_item("Loudness", "value-open")), " -24.000");
-    EXPECT_FALSE(XtIsSensitive(panel_item("Loudness", "Recognize"))) << "nothing is linked";
+    ASSERT_TRUE(guitest::WaitMapped(panel_item("Loudness", nullptr)));
+    EXPECT_EQ(Label(panel_item("Loudness", "value-step")), "     1 ");
+    EXPECT_EQ(Label(panel_item("Loudness", "value-half")), " -36.000");
+    EXPECT_EQ(Label(panel_item("Loudness", "value-open")), " -24.000");
     // A second Create only sets the value and says so by returning 0.
     EXPECT_EQ(CueChirrup::CreateFloatSlider(r, "half", -60, -1, -40.5f, nullptr), 0);
-    EXPECT_EQ(label_of(panel_item("Loudness", "value-half")), " -40.500");
+    EXPECT_EQ(Label(panel_item("Loudness", "value-half")), " -40.500");
 
     ::testing::internal::CaptureStderr();
     EXPECT_EQ(CueChirrup::SetIntSlider(r, "loudness", 3), 0);
@@ -319,10 +296,19 @@ TEST_F(Recognizers, SliderLabelsAndMessagesForUnknownControls) {
     } stranger;
     EXPECT_EQ(CueChirrup::CreateIntSlider(&stranger, "step", 1, 5, 2, nullptr), 0);
     const std::string err = ::testing::internal::GetCapturedStderr();
-    EXPECT_NE(err.find("Couldn't find slider loudness"), std::string::npos) << err;
-    EXPECT_NE(err.find("Couldn't find slider gain"), std::string::npos) << err;
-    EXPECT_NE(err.find("Couldn't find option colour"), std::string::npos) << err;
-    EXPECT_NE(err.find("Couldn't find widget Stranger"), std::string::npos) << err;
+    for (const char* what : {"slider loudness", "slider gain", "option colour", "widget Stranger"})
+        EXPECT_NE(err.find(std::string("Couldn't find ") + what), std::string::npos) << err;
+
+    Widget container = panel_item("Loudness", nullptr);
+    ASSERT_EQ(theImp.GetKeySet(1)->GetRecognizer("Loudness"), nullptr);
+    gnome->SetActiveKeyset(1);
+    gnome->update_recognizer_dialogs();
+    EXPECT_TRUE(guitest::WaitFor([&] { return !guitest::Viewable(container); }));
+    EXPECT_EQ(r->shown, 1) << "still wanted on the mouth";
+    gnome->SetActiveKeyset(0);
+    gnome->update_recognizer_dialogs();
+    EXPECT_TRUE(guitest::WaitMapped(container));
+    EXPECT_EQ(Label(panel_item("Loudness", "label")), "Recognizer [Loudness] (mouth)");
     click_panel("Loudness", "Dismiss");
 }
 
@@ -337,7 +323,7 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
     gnome->ShowRecognizerGui(r);
     click_panel("Loudness", "Configure");
     Widget dialog = W("linkDialog");
-    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(dialog); }));
+    ASSERT_TRUE(guitest::WaitMapped(dialog));
     raise(dialog);
     Widget targets = L("targetLister");
     Widget shapes = L("keyshapeLister");
@@ -350,10 +336,10 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
 
     // Select "closed" and "rest", press "Link".
     click_item(targets, 1);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "closed"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "closed"; }));
     EXPECT_FALSE(XtIsSensitive(L("audition_button"))) << "Loudness's targets have no sound";
     click_item(shapes, mouth->GetKeyShapeId("rest") + 1);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("keyshapeLabel")) == "rest"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("keyshapeLabel")) == "rest"; }));
     guitest::Click(L("link_button"));
     ASSERT_TRUE(guitest::WaitFor([&] { return r->FindTarget("closed")->keyShapeIndex >= 0; }));
     EXPECT_EQ(r->FindTarget("closed")->keyShapeIndex, mouth->GetKeyShapeId("rest"));
@@ -363,7 +349,7 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
 
     // "half", then a double click on "E" links them.
     click_item(targets, 2);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "half"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "half"; }));
     click_item(shapes, mouth->GetKeyShapeId("E") + 1, true);
     ASSERT_TRUE(guitest::WaitFor([&] { return r->FindTarget("half")->keyShapeIndex >= 0; }));
     EXPECT_EQ(r->FindTarget("half")->keyShapeIndex, mouth->GetKeyShapeId("E"));
@@ -371,12 +357,10 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
 
     // Selecting a linked target selects its key shape; with none selected, "Link" does nothing.
     click_item(targets, 1);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "closed"; }))
-        << label_of(L("targetLabel"));
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("keyshapeLabel")) == "rest"; }))
-        << label_of(L("keyshapeLabel"));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "closed"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("keyshapeLabel")) == "rest"; }));
     click_item(targets, 3);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "open"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "open"; }));
     XmListDeselectAllItems(shapes);
     raise(dialog);
     guitest::Click(L("link_button"));
@@ -397,7 +381,7 @@ TEST_F(Recognizers, LinkDialogLinksTargetsToKeyShapes) {
         << text.str();
     raise(dialog);
     guitest::Click(L("done_button"));
-    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(dialog); }));
+    EXPECT_TRUE(guitest::WaitFor([&] { return !guitest::Viewable(dialog); }));
     click_panel("Loudness", "Dismiss");
 }
 
@@ -407,13 +391,13 @@ TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
     CueRecognizer* r = mouth->GetRecognizer("Phoneme");
     ASSERT_TRUE(r);
     click_panel("Phoneme", "Configure");
-    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(W("linkDialog")); }));
+    ASSERT_TRUE(guitest::WaitMapped(W("linkDialog")));
     raise(W("linkDialog"));
     Widget targets = L("targetLister");
     click_item(targets, r->TargetIndex("OW") + 1);
-    ASSERT_TRUE(guitest::WaitFor([&] { return label_of(L("targetLabel")) == "OW"; }));
+    ASSERT_TRUE(guitest::WaitFor([&] { return Label(L("targetLabel")) == "OW"; }));
     EXPECT_TRUE(XtIsSensitive(L("audition_button")));
-    EXPECT_EQ(label_of(L("keyshapeLabel")), "O") << "the demo links OW to O";
+    EXPECT_EQ(Label(L("keyshapeLabel")), "O") << "the demo links OW to O";
     // The sample reaches the output; a second press replaces it while it plays, and
     // dismissing the dialog silences it. The program then ends with the output still open.
     const auto heard = [] { return KLSoundControl::LastHanded().sounding; };
@@ -425,51 +409,10 @@ TEST_F(Recognizers, AuditionNeedsATargetWithASound) {
     guitest::Click(L("audition_button"));
     ASSERT_TRUE(guitest::WaitFor([&] { return heard() > before; }));
     guitest::Click(L("done_button"));
-    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(W("linkDialog")); }));
+    EXPECT_TRUE(guitest::WaitFor([&] { return !guitest::Viewable(W("linkDialog")); }));
     EXPECT_TRUE(guitest::WaitFor([] { return std::isnan(KLSoundControl::LastHanded().position); }))
         << "Dismiss stops the audition";
     click_panel("Phoneme", "Dismiss");
-}
-
-// A keyset without the recognizer hides its panel; coming back shows it again for the keyset.
-TEST_F(Recognizers, KeysetSwitchesHideAndShowPanels) {
-    choose_from_menu("Phoneme");
-    Widget container = panel_item("Phoneme", nullptr);
-    ASSERT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
-    ASSERT_GE(theImp.keysetCount, 2);
-    ASSERT_EQ(theImp.GetKeySet(1)->GetRecognizer("Phoneme"), nullptr);
-    gnome->SetActiveKeyset(1);
-    gnome->update_recognizer_dialogs();
-    EXPECT_TRUE(guitest::WaitFor([&] { return !windowtest::Viewable(container); }));
-    EXPECT_EQ(mouth->GetRecognizer("Phoneme")->shown, 1) << "still wanted on the mouth";
-    gnome->SetActiveKeyset(0);
-    gnome->update_recognizer_dialogs();
-    EXPECT_TRUE(guitest::WaitFor([&] { return windowtest::Viewable(container); }));
-    EXPECT_EQ(label_of(panel_item("Phoneme", "label")), "Recognizer [Phoneme] (mouth)");
-    click_panel("Phoneme", "Dismiss");
-}
-
-// A menu entry whose plug-in cannot make a recognizer says so and adds nothing.
-TEST_F(Recognizers, UnknownRecognizerIsReported) {
-    KLAlert* alert = gnome->attentionAlert.get();
-    std::string told;
-    windowtest::AnswerScript script({[&] {
-        if (!alert->Waiting() || !windowtest::Viewable(alert->Button(0)))
-            return false;
-        XmString s = nullptr;
-        XtVaGetValues(alert->GetDialog(), XmNmessageString, &s, nullptr);
-        char* text = nullptr;
-        XmStringGetLtoR(s, const_cast<char*>(XmFONTLIST_DEFAULT_TAG), &text);
-        told = text ? text : "";
-        XtFree(text);
-        XmStringFree(s);
-        return windowtest::ClickWhenViewable(alert->Button(0));
-    }});
-    const size_t before = mouth->recognizers.size();
-    Gnome::create_recognize_cb(nullptr, const_cast<char*>("Vowel"), nullptr);
-    EXPECT_TRUE(script.Finished());
-    EXPECT_EQ(told, "Failed to locate plug-in recognizer [Vowel].");
-    EXPECT_EQ(mouth->recognizers.size(), before);
 }
 
 }  // namespace

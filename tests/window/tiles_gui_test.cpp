@@ -3,7 +3,6 @@
 // field and the duration prompt through real typing.
 #include <gtest/gtest.h>
 
-#include <X11/keysym.h>
 #include <Xm/SelectioB.h>
 #include <Xm/TextF.h>
 #include <Xm/ToggleB.h>
@@ -15,6 +14,7 @@
 #include <string>
 
 #include "chart/KLSyncChart.h"
+#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
 #include "model/KLKey.h"
 #include "model/KLKeyEvent.h"
@@ -23,26 +23,16 @@
 #include "toolkit/KLImageSGI.h"
 #include "toolkit/xm/KLImageButton.h"
 #include "toolkit/xm/KLPrompt.h"
+#include "window/EventPump.h"
 #include "window/Gnome.h"
 #include "window/WindowTestUtil.h"
 #include "workspace/Imp.h"
 
 namespace {
 
-Widget W(const char* name) {
-    return KLXmGnome::FindWidget(name);
-}
-
-std::string LabelText(Widget w) {
-    return guitest::XmText(w, XmNlabelString);
-}
-
-std::vector<Widget> Children(Widget w) {
-    WidgetList children = nullptr;
-    Cardinal count = 0;
-    XtVaGetValues(w, XmNchildren, &children, XmNnumChildren, &count, nullptr);
-    return std::vector<Widget>(children, children + count);
-}
+using guitest::Children;
+using windowtest::Label;
+using windowtest::W;
 
 // The demo's keysets (mouth with 11 shapes, two brows with 3) and a fourth of 9 shapes,
 // loaded once with 4 tiles per row.
@@ -72,7 +62,10 @@ class TilesTest : public ::testing::Test {
     KLSyncChart* chart = nullptr;
 };
 
-TEST_F(TilesTest, PanelsHoldRowsOfTilesWithLabelsAndTheSharedBlankIcon) {
+// Panels hold rows of tiles, each a button named after its shape and a label, pictureless
+// shapes sharing one blank icon; a press selects one tile and a second keeps it; a double click
+// adds a key of the tile's shape at the indicator.
+TEST_F(TilesTest, TilesShowTheShapesAndPickThem) {
     Widget box = gnome->tileBoxes[3];
     ASSERT_NE(box, nullptr);
     EXPECT_EQ(gnome->tileCount[3], 9);
@@ -80,21 +73,16 @@ TEST_F(TilesTest, PanelsHoldRowsOfTilesWithLabelsAndTheSharedBlankIcon) {
     for (Widget row : Children(box))
         rows.push_back(int(Children(row).size()));
     EXPECT_EQ(rows, (std::vector<int>{4, 4, 1}));
-    // Each tile: the button named after the shape, then its label.
-    Widget firstTile = Children(Children(box)[0])[0];
-    auto parts = Children(firstTile);
+    auto parts = Children(Children(Children(box)[0])[0]);
     ASSERT_EQ(parts.size(), 2u);
     EXPECT_STREQ(XtName(parts[0]), "s0");
-    EXPECT_EQ(LabelText(parts[1]), "s0");
-    // Shapes without pictures share one blank 80 x 60 icon.
+    EXPECT_EQ(Label(parts[1]), "s0");
     KLImageSGI* blank = gnome->tiles[3][0]->Image();
     ASSERT_NE(blank, nullptr);
     EXPECT_EQ(blank->Width(), 80);
     EXPECT_EQ(blank->Height(), 60);
     EXPECT_EQ(gnome->tiles[3][8]->Image(), blank);
-}
 
-TEST_F(TilesTest, PressingSelectsOneTileAndASecondPressKeepsIt) {
     gnome->HighlightKeyframe(-1);
     EXPECT_EQ(gnome->CurrentKeyShape(), -1);
     guitest::Click(gnome->tiles[0][1]->GetWidget());
@@ -106,27 +94,25 @@ TEST_F(TilesTest, PressingSelectsOneTileAndASecondPressKeepsIt) {
     EXPECT_EQ(gnome->CurrentKeyShape(), 1);
     guitest::Click(gnome->tiles[0][4]->GetWidget());
     ASSERT_TRUE(guitest::WaitFor([&] { return gnome->CurrentKeyShape() == 4; }));
-    EXPECT_EQ(gnome->tiles[0][1]->GetState(), 0);
+    EXPECT_EQ(gnome->tiles[0][1]->GetState(), 0) << "the old selection is cleared";
     gnome->HighlightKeyframe(7);
     EXPECT_EQ(gnome->CurrentKeyShape(), 7);
-    EXPECT_EQ(gnome->tiles[0][4]->GetState(), 0) << "the old selection is cleared";
-}
+    EXPECT_EQ(gnome->tiles[0][4]->GetState(), 0);
 
-TEST_F(TilesTest, DoubleClickAddsAKeyOfThatShapeAtTheIndicator) {
     KLKeyTrack* track = theImp.GetKeyTrack(0);
-    const CueTime at = CueTime::FromSeconds(1.5);
     chart->activeKey = nullptr;
-    chart->SetIndicatorTime(at);
+    chart->SetIndicatorTime(CueTime::FromSeconds(1.5));
     const CueTime t = chart->GetIndicatorTime();
-    guitest::DoubleClick(gnome->tiles[0][4]->GetWidget());
+    guitest::WaitFor([] { return false; }, 0.6);
+    guitest::DoubleClick(gnome->tiles[0][5]->GetWidget());
     KLKeyEvent* prev = nullptr;
     KLKeyEvent* next = nullptr;
     ASSERT_TRUE(guitest::WaitFor([&] {
         track->bracket_keys_from_time(t, &prev, &next);
         return prev && prev->time == t;
     }));
-    EXPECT_EQ(prev->shapeIndex, 4);
-    EXPECT_EQ(gnome->CurrentKeyShape(), 4);
+    EXPECT_EQ(prev->shapeIndex, 5);
+    EXPECT_EQ(gnome->CurrentKeyShape(), 5);
 }
 
 TEST_F(TilesTest, TheKeysetMenuSwitchesChartTitleAndPanel) {
@@ -134,21 +120,13 @@ TEST_F(TilesTest, TheKeysetMenuSwitchesChartTitleAndPanel) {
     Widget status = XtNameToWidget(gnome->AppShell(), "*statusLine");
     ASSERT_NE(status, nullptr);
     // The event loop as the program runs it, work procedures included, until "Ready.".
-    auto ready = [&] {
-        XtAppContext app = KLXmGnome::AppContext();
-        return guitest::WaitFor([&] {
-            XtAppAddTimeOut(
-                app, 5, [](XtPointer, XtIntervalId*) {}, nullptr);
-            XtAppProcessEvent(app, XtIMAll);
-            return LabelText(status) == "Ready.";
-        });
-    };
+    auto ready = [&] { return windowtest::Pump([&] { return Label(status) == "Ready."; }); };
     ASSERT_TRUE(ready()) << "after loading";
     XtCallCallbacks(gnome->keysetMenuEntries[1], XmNvalueChangedCallback, nullptr);
     EXPECT_EQ(gnome->GetActiveKeyset(), 1);
     EXPECT_EQ(chart->keyTrack, theImp.GetKeyTrack(1));
-    EXPECT_EQ(LabelText(W("infoKeysetTitle")), "brow_L");
-    EXPECT_EQ(LabelText(W("keyVuLabel")), "brow_L:");
+    EXPECT_EQ(Label(W("infoKeysetTitle")), "brow_L");
+    EXPECT_EQ(Label(W("keyVuLabel")), "brow_L:");
     EXPECT_TRUE(XtIsManaged(gnome->tileBoxes[1]));
     EXPECT_FALSE(XtIsManaged(gnome->tileBoxes[0]));
     EXPECT_NE(gnome->tileBoxes[0], nullptr) << "other panels stay built";
@@ -159,46 +137,29 @@ TEST_F(TilesTest, TheKeysetMenuSwitchesChartTitleAndPanel) {
     KLKeySet* brows = theImp.GetKeySet(1);
     for (int i = 0; i < brows->keyShapeCount; i++)
         EXPECT_NE(brows->GetKeyShape(i)->GetImage(), nullptr) << brows->GetKeyShape(i)->Name();
-    EXPECT_TRUE(ready()) << "the status line still says " << LabelText(status);
+    EXPECT_TRUE(ready()) << "the status line still says " << Label(status);
 }
 
-TEST_F(TilesTest, DisplayStylesAreARadioGroup) {
-    const char* names[] = {"midpoint", "keyframe", "dissolve"};
-    for (int pick : {2, 1, 1, 0}) {
-        XmToggleButtonGadgetSetState(W(names[pick]), pick != 1, False);  // a click toggles
-        XtCallCallbacks(W(names[pick]), XmNvalueChangedCallback, nullptr);
-        EXPECT_EQ(gnome->displayStyle, pick);
-        for (int i = 0; i < 3; i++)
-            EXPECT_EQ(bool(XmToggleButtonGadgetGetState(W(names[i]))), i == pick) << names[i];
-    }
-}
-
-// Types into the value field with real keys: select all, the text, Return.
+// Types into the value field with real keys: the text, then Return.
 void TypeValue(const std::string& text) {
     Widget field = W("valTypein");
     XmTextFieldSetString(field, const_cast<char*>(""));
     guitest::Click(field);
-    for (char c : text)
-        if (c == '-')
-            guitest::TypeKey(XK_minus);
-        else
-            guitest::TypeText(std::string(1, c));
-    guitest::TypeKey(XK_Return);
-    guitest::Settle();
+    guitest::TypeText(text + "\n");
 }
 
 TEST_F(TilesTest, TheValueFieldSetsTheActiveKeyOnlyForOneFiniteNumber) {
     KLKeyTrack* track = theImp.GetKeyTrack(0);
     KLKeyEvent* key = track->InsertKey(1, CueTime::FromSeconds(2.2), nullptr, 1, 1.0f);
     ASSERT_NE(key, nullptr);
-    // The key at the indicator is the chart's active key.
+    // The key at the indicator is the chart's active key; its value is shown, its tile selected.
     chart->SetIndicatorTime(key->time);
     chart->UpdateDisplay();
     ASSERT_EQ(chart->activeKey, key);
     char* shown = XmTextFieldGetString(W("valTypein"));
-    EXPECT_STREQ(shown, "1") << "the active key's value is shown";
+    EXPECT_STREQ(shown, "1");
     XtFree(shown);
-    EXPECT_EQ(gnome->CurrentKeyShape(), 1) << "and its shape's tile selected";
+    EXPECT_EQ(gnome->CurrentKeyShape(), 1);
     gnome->ActivateKeyValue(1);
     EXPECT_TRUE(XtIsSensitive(W("valTypein")));
     TypeValue("1.5");
@@ -223,13 +184,23 @@ TEST_F(TilesTest, TheValueFieldSetsTheActiveKeyOnlyForOneFiniteNumber) {
     gnome->ActivateKeyValue(1);
 }
 
-TEST_F(TilesTest, TheDurationButtonAsksForANewDuration) {
+// The display styles are a radio group; the duration button asks for a new duration.
+TEST_F(TilesTest, TheStyleRadioGroupAndTheDurationPrompt) {
+    const char* names[] = {"midpoint", "keyframe", "dissolve"};
+    for (int pick : {2, 1, 1, 0}) {
+        XmToggleButtonGadgetSetState(W(names[pick]), pick != 1, False);  // a click toggles
+        XtCallCallbacks(W(names[pick]), XmNvalueChangedCallback, nullptr);
+        EXPECT_EQ(gnome->displayStyle, pick);
+        for (int i = 0; i < 3; i++)
+            EXPECT_EQ(bool(XmToggleButtonGadgetGetState(W(names[i]))), i == pick) << names[i];
+    }
+
     Widget dialog = gnome->prompt->GetDialog();
     Widget text = XmSelectionBoxGetChild(dialog, XmDIALOG_TEXT);
     Widget ok = XmSelectionBoxGetChild(dialog, XmDIALOG_OK_BUTTON);
     std::string question;
-    windowtest::AnswerScript answers({[&] {
-        if (!windowtest::Viewable(ok))
+    guitest::AnswerScript answers({[&] {
+        if (!guitest::Viewable(ok))
             return false;
         question = guitest::XmText(dialog, XmNselectionLabelString);
         XmTextFieldSetString(text, const_cast<char*>(""));

@@ -7,9 +7,7 @@
 #include <Xm/ToggleB.h>
 #include <Xm/Xm.h>
 
-#include <chrono>
 #include <cstring>
-#include <filesystem>
 
 #include "guitest/GuiTest.h"
 #include "model/KLKey.h"
@@ -19,15 +17,14 @@
 #include "scene/gl/KLSceneView.h"
 #include "toolkit/KLImageSGI.h"
 #include "toolkit/xm/KLAlert.h"
+#include "window/EventPump.h"
 #include "window/Gnome.h"
 #include "window/WindowTestUtil.h"
 #include "workspace/Imp.h"
 
 namespace {
 
-Widget W(const char* name) {
-    return KLXmGnome::FindWidget(name);
-}
+using windowtest::W;
 
 bool SamePixels(const KLImageSGI& a, const KLImageSGI& b) {
     return a.Width() == b.Width() && a.Height() == b.Height() &&
@@ -43,11 +40,7 @@ bool SameCamera(const KLCamera& a, const KLCamera& b) {
 class ViewsTest : public ::testing::Test {
   protected:
     void SetUp() override {
-        gnome = &windowtest::TheWindow();
-        if (theImp.keysetCount == 0) {
-            const std::string project = windowtest::DemoProject();
-            ASSERT_EQ(theImp.LoadKeyset((project + "/misc_data/demo.kset").c_str()), 1);
-        }
+        gnome = &windowtest::TheDemoWindow();
         ASSERT_TRUE(gnome->keyScene && gnome->mixScene);
         ASSERT_TRUE(gnome->keyScene->HasGL()) << "the test display offers no GL";
         ASSERT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
@@ -63,17 +56,7 @@ class ViewsTest : public ::testing::Test {
     // the view has drawn `count` more times, for at most five seconds.
     bool Steps(KLSceneView* view, int count) {
         const int until = view->Draws() + count;
-        const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(5);
-        XtAppContext app = KLXmGnome::AppContext();
-        while (view->Draws() < until && std::chrono::steady_clock::now() < limit) {
-            bool fired = false;
-            XtAppAddTimeOut(
-                app, 10, [](XtPointer done, XtIntervalId*) { *static_cast<bool*>(done) = true; },
-                &fired);
-            while (!fired)
-                XtAppProcessEvent(app, XtIMAll);
-        }
-        return view->Draws() >= until;
+        return windowtest::Pump([&] { return view->Draws() >= until; });
     }
     void PointerAt(int x, int y) {
         XTestFakeMotionEvent(guitest::GetDisplay(), -1, x, y, CurrentTime);
@@ -82,8 +65,12 @@ class ViewsTest : public ::testing::Test {
     Gnome* gnome = nullptr;
 };
 
-// Held at the anchor the camera stays; moved off it, it turns continuously until release.
-TEST_F(ViewsTest, TumbleDragAtARateFromTheAnchor) {
+// Camera drags with real pointer input: held at the anchor the camera stays, moved off it, it
+// turns continuously until release; the middle button turns only about the vertical axis, the
+// right one only tilts; a second button neither starts nor ends a drag; while sound plays a
+// drag moves nothing. keyVuSet keeps the key view's camera for look-at; keyVuClear lets
+// look-at frame again.
+TEST_F(ViewsTest, CameraDragsAndTheStoredCamera) {
     KLSceneView* view = gnome->keyScene;
     const KLCamera start = view->Camera();
     const int ended = view->DragsEnded();
@@ -108,26 +95,17 @@ TEST_F(ViewsTest, TumbleDragAtARateFromTheAnchor) {
     const KLCamera after = view->Camera();
     guitest::Settle();
     EXPECT_TRUE(SameCamera(view->Camera(), after)) << "stops at release";
-}
 
-// The middle button turns only about the vertical axis, the right one only tilts; a second
-// button neither starts nor ends a drag.
-TEST_F(ViewsTest, ButtonsLockAxesAndASecondButtonIsIgnored) {
-    KLSceneView* view = gnome->mixScene;
     for (int button : {2, 3}) {
-        const KLCamera start = view->Camera();
+        const KLCamera before = gnome->mixScene->Camera();
         guitest::MoveTo(W("mixVuTumble"));
         guitest::Press(button);
         ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 1; }));
         PointerAt(gnome->anchorX + 50, gnome->anchorY + 50);
-        ASSERT_TRUE(Steps(view, 5));
-        if (button == 2) {
-            EXPECT_NE(view->Camera().yaw, start.yaw);
-            EXPECT_EQ(view->Camera().pitch, start.pitch);
-        } else {
-            EXPECT_EQ(view->Camera().yaw, start.yaw);
-            EXPECT_NE(view->Camera().pitch, start.pitch);
-        }
+        ASSERT_TRUE(Steps(gnome->mixScene, 5));
+        const KLCamera& now = gnome->mixScene->Camera();
+        EXPECT_EQ(now.yaw != before.yaw, button == 2);
+        EXPECT_EQ(now.pitch != before.pitch, button == 3);
         guitest::Press(1);
         guitest::Release(1);
         guitest::Settle();
@@ -136,65 +114,17 @@ TEST_F(ViewsTest, ButtonsLockAxesAndASecondButtonIsIgnored) {
         guitest::Release(button);
         ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 0; }));
     }
-}
-
-// While sound plays the arm adds no work procedure: the camera does not move.
-TEST_F(ViewsTest, NoDragWhileSoundPlays) {
-    KLSceneView* view = gnome->keyScene;
-    const KLCamera start = view->Camera();
+    const KLCamera still = view->Camera();
     gnome->soundPlaying = 1;
     guitest::MoveTo(W("keyVuZoom"));
     guitest::Press(1);
     ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 1; }));
     PointerAt(gnome->anchorX + 80, gnome->anchorY);
-    guitest::Settle();
     guitest::Release(1);
     ASSERT_TRUE(guitest::WaitFor([&] { return gnome->dragging == 0; }));
     gnome->soundPlaying = 0;
-    EXPECT_TRUE(SameCamera(view->Camera(), start));
-}
+    EXPECT_TRUE(SameCamera(view->Camera(), still));
 
-// The four feedback toggles are one radio group setting the workspace's style; each style
-// draws differently.
-TEST_F(ViewsTest, FeedbackTogglesAreOneRadioGroup) {
-    const char* names[] = {"points", "lines", "polygons", "polygonsboth"};
-    std::unique_ptr<KLImageSGI> pictures[4];
-    for (int style : {1, 0, 3, 2}) {
-        XmToggleButtonSetState(W(names[style]), True, True);
-        for (int i = 0; i < 4; i++)
-            EXPECT_EQ(XmToggleButtonGetState(W(names[i])), i == style) << names[i];
-        EXPECT_EQ(theImp.feedback, style);
-        EXPECT_EQ(theImp.scene->Feedback(), style);
-        EXPECT_FALSE(windowtest::Viewable(gnome->informationAlert->GetDialog()));
-        pictures[style] = gnome->mixScene->DrawPix(320, 240);
-        ASSERT_TRUE(pictures[style]);
-        if (style == 2 || style == 1) {
-            guitest::Settle();
-            guitest::Screenshot(std::string("window-views-") + names[style]);
-        }
-    }
-    EXPECT_FALSE(SamePixels(*pictures[0], *pictures[1]));
-    EXPECT_FALSE(SamePixels(*pictures[1], *pictures[2]));
-}
-
-// Turning loadGeometry informs once per run and only stores the flag.
-TEST_F(ViewsTest, LoadGeometryInformsOnce) {
-    KLAlert* alert = gnome->attentionAlert.get();
-    windowtest::AnswerScript script({
-        [&] { return alert->Waiting() && windowtest::ClickWhenViewable(alert->Button(0)); },
-    });
-    XmToggleButtonSetState(W("loadGeometry"), False, True);
-    EXPECT_TRUE(script.Finished());
-    EXPECT_EQ(theImp.loadGeometry, 0);
-    EXPECT_EQ(theImp.geometryActive, 1) << "not before the next load";
-    XmToggleButtonSetState(W("loadGeometry"), True, True);  // no question this time
-    EXPECT_EQ(theImp.loadGeometry, 1);
-    EXPECT_EQ(gnome->geometryInformed, 1);
-}
-
-// keyVuSet keeps the key view's camera for look-at; keyVuClear lets look-at frame again.
-TEST_F(ViewsTest, KeyViewCameraSetAndClear) {
-    KLSceneView* view = gnome->keyScene;
     for (int i = 0; i < 30; i++)
         view->CameraTumble(200, 50, 0);
     const KLCamera stored = view->Camera();
@@ -213,10 +143,65 @@ TEST_F(ViewsTest, KeyViewCameraSetAndClear) {
     EXPECT_GT(view->Camera().distance, zoomed * 1.5f);
 }
 
-// Every key shape of the active keyset has a 160 x 121 picture and an 80 x 60 icon, grabbed
-// from the key view (also while the key image view stands in its place); different shapes
-// give different pictures.
-TEST_F(ViewsTest, KeysetImagesAreGrabbedPerKeyShape) {
+// The four feedback toggles are one radio group setting the workspace's style; each style
+// draws differently. Turning loadGeometry informs once per run and only stores the flag.
+TEST_F(ViewsTest, FeedbackAndGeometryToggles) {
+    const char* names[] = {"points", "lines", "polygons", "polygonsboth"};
+    std::unique_ptr<KLImageSGI> pictures[4];
+    for (int style : {1, 0, 3, 2}) {
+        XmToggleButtonSetState(W(names[style]), True, True);
+        for (int i = 0; i < 4; i++)
+            EXPECT_EQ(XmToggleButtonGetState(W(names[i])), i == style) << names[i];
+        EXPECT_EQ(theImp.feedback, style);
+        EXPECT_EQ(theImp.scene->Feedback(), style);
+        EXPECT_FALSE(guitest::Viewable(gnome->informationAlert->GetDialog()));
+        pictures[style] = gnome->mixScene->DrawPix(320, 240);
+        ASSERT_TRUE(pictures[style]);
+        if (style == 2 || style == 1) {
+            guitest::Settle();
+            guitest::Screenshot(std::string("window-views-") + names[style]);
+        }
+    }
+    EXPECT_FALSE(SamePixels(*pictures[0], *pictures[1]));
+    EXPECT_FALSE(SamePixels(*pictures[1], *pictures[2]));
+
+    EXPECT_NE(
+        windowtest::AnswerAlerts(gnome->attentionAlert.get(),
+                                 [&] { XmToggleButtonSetState(W("loadGeometry"), False, True); }),
+        "");
+    EXPECT_EQ(theImp.loadGeometry, 0);
+    EXPECT_EQ(theImp.geometryActive, 1) << "not before the next load";
+    XmToggleButtonSetState(W("loadGeometry"), True, True);  // no question this time
+    EXPECT_EQ(theImp.loadGeometry, 1);
+}
+
+// Whichever alternative a view shows (key pictures, scene or blank), it fills the view's frame
+// rather than shrinking to a picture view with no picture yet. Every key shape of the active
+// keyset has a 160 x 121 picture and an 80 x 60 icon, grabbed from the key view (also while the
+// key image view stands in its place); different shapes give different pictures.
+TEST_F(ViewsTest, KeyImagesAndEveryViewChoiceFillTheirFrames) {
+    struct Choice {
+        int keyOn, keyMode, mixOn;
+        const char *key, *mix;
+    };
+    const Choice choices[] = {{1, 0, 1, "keyVu", "mixScn"},
+                              {1, 1, 0, "keyScn", "mixFake"},
+                              {0, 1, 1, "keyFake", "mixScn"},
+                              {1, 0, 0, "keyVu", "mixFake"}};
+    for (const Choice& c : choices) {
+        gnome->keyViewOn = c.keyOn;
+        gnome->keyViewMode = c.keyMode;
+        gnome->mixViewOn = c.mixOn;
+        gnome->SetViewStatus();
+        guitest::Settle();
+        for (const char* name : {c.key, c.mix}) {
+            ASSERT_TRUE(XtIsManaged(W(name))) << name;
+            Dimension width = 0, height = 0;
+            XtVaGetValues(W(name), XmNwidth, &width, XmNheight, &height, nullptr);
+            EXPECT_TRUE(width >= 300 && height >= 220)
+                << name << " " << width << "x" << height << " after " << c.key << "/" << c.mix;
+        }
+    }
     gnome->keyViewMode = 0;
     gnome->SetViewStatus();
     ASSERT_FALSE(XtIsManaged(gnome->keyScene->GetWidget()));
@@ -228,18 +213,17 @@ TEST_F(ViewsTest, KeysetImagesAreGrabbedPerKeyShape) {
     ASSERT_GE(set->keyShapeCount, 3);
     for (int i = 0; i < set->keyShapeCount; i++) {
         KLKey* key = set->GetKeyShape(i);
-        ASSERT_TRUE(key->image) << key->Name();
-        EXPECT_EQ(key->image->Width(), 160);
-        EXPECT_EQ(key->image->Height(), 121);
-        ASSERT_TRUE(key->GetIcon());
-        EXPECT_EQ(key->GetIcon()->Width(), 80);
-        EXPECT_EQ(key->GetIcon()->Height(), 60);
+        ASSERT_TRUE(key->image && key->GetIcon()) << key->Name();
+        EXPECT_EQ(std::pair(key->image->Width(), key->image->Height()), std::pair(160, 121));
+        EXPECT_EQ(std::pair(key->GetIcon()->Width(), key->GetIcon()->Height()), std::pair(80, 60));
     }
     EXPECT_FALSE(SamePixels(*set->GetKeyShape(0)->image, *set->GetKeyShape(1)->image));
     EXPECT_FALSE(SamePixels(*set->GetKeyShape(1)->image, *set->GetKeyShape(3)->image));
     EXPECT_EQ(set->imagesChanged, 1);
     EXPECT_FALSE(theImp.GetKeyTrack(gnome->GetActiveKeyset())->vuKeyFrames)
         << "the track is back on its events";
+    gnome->keyViewOn = gnome->keyViewMode = gnome->mixViewOn = 1;
+    gnome->SetViewStatus();
 }
 
 // The key view holds every keyset but the active one at its default shape; the mix view shows
@@ -267,60 +251,22 @@ TEST_F(ViewsTest, KeyViewHoldsOtherKeysetsStatic) {
     theImp.PrepareKeyFrames(-1);
 }
 
-// Whichever alternative a view shows (key pictures, scene or blank), it fills the view's frame:
-// the frame keeps its size and does not shrink to a picture view that has no picture yet.
-TEST_F(ViewsTest, EveryViewChoiceFillsItsFrame) {
-    struct Choice {
-        int keyOn, keyMode, mixOn;
-        const char *key, *mix;
-    };
-    const Choice choices[] = {{1, 0, 1, "keyVu", "mixScn"},
-                              {1, 1, 0, "keyScn", "mixFake"},
-                              {0, 1, 1, "keyFake", "mixScn"},
-                              {1, 0, 0, "keyVu", "mixFake"}};
-    for (const Choice& c : choices) {
-        gnome->keyViewOn = c.keyOn;
-        gnome->keyViewMode = c.keyMode;
-        gnome->mixViewOn = c.mixOn;
-        gnome->SetViewStatus();
-        guitest::Settle();
-        for (const char* name : {c.key, c.mix}) {
-            ASSERT_TRUE(XtIsManaged(W(name))) << name;
-            Dimension width = 0, height = 0;
-            XtVaGetValues(W(name), XmNwidth, &width, XmNheight, &height, nullptr);
-            EXPECT_GE(width, 300) << name << " after choice " << c.key << "/" << c.mix;
-            EXPECT_GE(height, 220) << name << " after choice " << c.key << "/" << c.mix;
-        }
-    }
-    gnome->keyViewOn = 1;
-    gnome->keyViewMode = 1;
-    gnome->mixViewOn = 1;
-    gnome->SetViewStatus();
-}
-
-// ClearViews leaves both views without a scene; showing the keyset gives it back.
-TEST_F(ViewsTest, ClearViewsAndShowAgain) {
-    gnome->ClearViews();
-    EXPECT_EQ(gnome->keyScene->GetScene(), nullptr);
-    EXPECT_EQ(gnome->mixScene->GetScene(), nullptr);
-    EXPECT_EQ(gnome->shownKeyset, nullptr);
-    gnome->SetActiveKeyset(0);
-    EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
-    EXPECT_EQ(gnome->mixScene->GetScene(), theImp.scene.get());
-}
-
-}  // namespace
-
-namespace {
-
-// Played forward to a playblast, each frame of the mix view becomes a playblast frame of the
-// view's size, shown in the reference view from the region's start.
-TEST_F(ViewsTest, PlayblastFramesAreTheMixViewsFrames) {
+// Keys edited on the active track show in both views at once, without a call to draw. Played
+// forward to a playblast, each frame of the mix view becomes a playblast frame of the view's
+// size, shown in the reference view from the region's start.
+TEST_F(ViewsTest, EditedKeysRedrawAndPlayblastFramesAreTheMixViews) {
+    for (KLSceneView* view : {gnome->keyScene, gnome->mixScene})
+        view->time = CueTime::FromFrames(11);
+    guitest::Settle();
+    const int keyDraws = gnome->keyScene->Draws(), mixDraws = gnome->mixScene->Draws();
     KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
     KLKeySet* set = gnome->shownKeyset;
     mouth->InsertKey(1, CueTime::FromFrames(10), set->GetKeyShape(1), KLKeyEvent::kLinear, 1.0f);
     mouth->InsertKey(3, CueTime::FromFrames(12), set->GetKeyShape(3), KLKeyEvent::kLinear, 1.0f);
-    theImp.PrepareKeyFrames(-1);
+    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
+    EXPECT_TRUE(guitest::WaitFor([&] {
+        return gnome->keyScene->Draws() > keyDraws && gnome->mixScene->Draws() > mixDraws;
+    }));
     theImp.playblastImages = std::make_unique<std::unique_ptr<KLImageSGI>[]>(3);
     theImp.playblastCount = 3;
     const CueTime start = CueTime::FromFrames(10);
@@ -333,50 +279,31 @@ TEST_F(ViewsTest, PlayblastFramesAreTheMixViewsFrames) {
     Dimension width = 0, height = 0;
     XtVaGetValues(gnome->mixScene->GetWidget(), XmNwidth, &width, XmNheight, &height, nullptr);
     for (int i = 0; i < 3; i++) {
-        ASSERT_TRUE(theImp.playblastImages[size_t(i)]);
-        EXPECT_EQ(theImp.playblastImages[size_t(i)]->Width(), int(width));
-        EXPECT_EQ(theImp.playblastImages[size_t(i)]->Height(), int(height));
+        const KLImageSGI* frame = theImp.playblastImages[size_t(i)].get();
+        ASSERT_TRUE(frame);
+        EXPECT_EQ(std::pair(frame->Width(), frame->Height()), std::pair(int(width), int(height)));
     }
     EXPECT_FALSE(SamePixels(*theImp.playblastImages[0], *theImp.playblastImages[2]))
         << "the mouth moved from one key shape to the other";
     EXPECT_EQ(gnome->playblastViewOn, 1);
     EXPECT_EQ(gnome->refViewOn, 0);
     EXPECT_EQ(theImp.GetPlayblast(start + CueTime::FromFrames(1)), theImp.playblastImages[1].get());
-    mouth->RemoveKey(CueTime::FromFrames(10));
-    mouth->RemoveKey(CueTime::FromFrames(12));
-    theImp.PrepareKeyFrames(-1);
     Gnome::toggle_ref_view_cb(nullptr, XtPointer(0), nullptr);
     gnome->DisplayReference(start);  // lets go of the playblast picture
     theImp.DeletePlayblast();
 }
 
-}  // namespace
-
-namespace {
-
-// A key edited on the active track shows in both views at once, without a call to draw.
-TEST_F(ViewsTest, EditedKeysRedrawBothViews) {
-    for (KLSceneView* view : {gnome->keyScene, gnome->mixScene})
-        view->time = CueTime::FromFrames(5);
-    guitest::Settle();
-    const int key = gnome->keyScene->Draws(), mix = gnome->mixScene->Draws();
-    KLKeyTrack* mouth = theImp.GetKeyTrack(gnome->GetActiveKeyset());
-    mouth->InsertKey(2, CueTime::FromFrames(5), gnome->shownKeyset->GetKeyShape(2),
-                     KLKeyEvent::kLinear, 1.0f);
-    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
-    EXPECT_TRUE(guitest::WaitFor(
-        [&] { return gnome->keyScene->Draws() > key && gnome->mixScene->Draws() > mix; }));
-    mouth->RemoveKey(CueTime::FromFrames(5));
-    theImp.PrepareKeyFrames(gnome->GetActiveKeyset());
-}
-
-}  // namespace
-
-namespace {
-
-// Loaded without geometry, the views get no scene and no key-shape pictures are grabbed;
-// loaded with it again, both come back.
-TEST_F(ViewsTest, WithoutGeometryTheViewsStayEmpty) {
+// ClearViews leaves both views without a scene, showing the keyset gives it back; loaded
+// without geometry, the views get no scene and no key-shape pictures are grabbed; loaded with
+// it again, both come back.
+TEST_F(ViewsTest, ClearedOrWithoutGeometryTheViewsStayEmpty) {
+    gnome->ClearViews();
+    EXPECT_EQ(gnome->keyScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->mixScene->GetScene(), nullptr);
+    EXPECT_EQ(gnome->shownKeyset, nullptr);
+    gnome->SetActiveKeyset(0);
+    EXPECT_EQ(gnome->keyScene->GetScene(), theImp.scene.get());
+    EXPECT_EQ(gnome->mixScene->GetScene(), theImp.scene.get());
     const std::string kset = windowtest::DemoProject() + "/misc_data/demo.kset";
     theImp.loadGeometry = 0;
     ASSERT_EQ(theImp.LoadKeyset(kset.c_str()), 1);

@@ -7,14 +7,26 @@
 #include <Xm/TextF.h>
 #include <Xm/Xm.h>
 
-#include <cstdlib>
-
+#include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
+#include "toolkit/xm/KLAlert.h"
 #include "window/FallbackResources.h"
 #include "window/Gnome.h"
 #include "workspace/Imp.h"
 
 namespace windowtest {
+
+Widget W(const char* name) {
+    return KLXmGnome::FindWidget(name);
+}
+
+std::string Label(Widget widget) {
+    return widget ? guitest::XmText(widget, XmNlabelString) : "<none>";
+}
+
+std::string Label(const char* name) {
+    return Label(W(name));
+}
 
 Gnome& TheWindow() {
     static Gnome* gnome = [] {
@@ -33,52 +45,48 @@ Gnome& TheWindow() {
     return *gnome;
 }
 
-AnswerScript::AnswerScript(std::vector<std::function<bool()>> steps) : steps_(std::move(steps)) {
-    timer_ = XtAppAddTimeOut(KLXmGnome::AppContext(), 20, tick, this);
-}
-
-AnswerScript::~AnswerScript() {
-    if (timer_)
-        XtRemoveTimeOut(timer_);
-}
-
-void AnswerScript::tick(XtPointer self, XtIntervalId*) {
-    auto* script = static_cast<AnswerScript*>(self);
-    script->timer_ = 0;
-    if (script->next_ < script->steps_.size() && script->steps_[script->next_]())
-        script->next_++;
-    if (script->next_ < script->steps_.size())
-        script->timer_ = XtAppAddTimeOut(KLXmGnome::AppContext(), 20, tick, self);
-}
-
-bool Viewable(Widget widget) {
-    if (!widget || !XtIsManaged(widget))
-        return false;
-    // Dialog buttons are gadgets: their window is their parent's.
-    Widget windowed = XtIsWidget(widget) ? widget : XtParent(widget);
-    if (!XtIsRealized(windowed))
-        return false;
-    XWindowAttributes attrs;
-    if (!XGetWindowAttributes(XtDisplay(windowed), XtWindow(windowed), &attrs))
-        return false;
-    return attrs.map_state == IsViewable;
-}
-
-bool ClickWhenViewable(Widget button) {
-    if (!Viewable(button))
-        return false;
-    guitest::Click(button);
-    return true;
+Gnome& TheDemoWindow(bool track) {
+    Gnome& gnome = TheWindow();
+    const std::string demo = DemoProject() + "/misc_data/demo.";
+    if (theImp.keysetCount == 0) {
+        EXPECT_EQ(theImp.LoadKeyset((demo + "kset").c_str()), 1);
+        if (track) {
+            EXPECT_EQ(theImp.LoadTrack((demo + "track").c_str()), 1);
+        }
+    }
+    return gnome;
 }
 
 bool ChooseInBrowser(Widget browser, const std::string& path) {
     Widget ok = XmFileSelectionBoxGetChild(browser, XmDIALOG_OK_BUTTON);
-    if (!Viewable(ok))
+    if (!guitest::Viewable(ok))
         return false;
     Widget text = XmFileSelectionBoxGetChild(browser, XmDIALOG_TEXT);
     XmTextFieldSetString(text, const_cast<char*>(path.c_str()));
     guitest::Click(ok);
     return true;
+}
+
+std::string AnswerAlerts(KLAlert* alert, const std::function<void()>& action, int button) {
+    std::string told;
+    auto answer = [&] {
+        if (!alert->Waiting() || !guitest::Viewable(alert->Button(button)))
+            return false;
+        told = guitest::XmText(alert->GetDialog(), XmNmessageString);
+        return guitest::ClickWhenViewable(alert->Button(button));
+    };
+    guitest::AnswerScript script({answer, answer, answer, answer});
+    action();
+    return told;
+}
+
+void ChooseOption(Widget optionMenu, int index) {
+    Widget pulldown = nullptr;
+    XtVaGetValues(optionMenu, XmNsubMenuId, &pulldown, nullptr);
+    ASSERT_NE(pulldown, nullptr);
+    const auto entries = guitest::Children(pulldown);
+    ASSERT_LT(size_t(index), entries.size());
+    XtCallCallbacks(entries[size_t(index)], XmNactivateCallback, nullptr);
 }
 
 }  // namespace windowtest
