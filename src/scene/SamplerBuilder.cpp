@@ -5,6 +5,7 @@
 
 #include "scene/ChannelCurve.h"
 #include "scene/EulerRotation.h"
+#include "scene/SampleReducer.h"
 
 namespace {
 // Stored floats: a negative zero is written as zero.
@@ -12,103 +13,10 @@ float stored(double v) {
     return float(v) + 0.0f;
 }
 
-// Few of the points 0..n-1 (first and last always among them) such that every point between
-// two kept ones fits the straight piece between them: `piece_fits(i, j)` says whether every
-// point strictly between i and j lies within tolerance of the piece from i to j. Each piece is
-// grown by doubling and then narrowed by bisection, so the cost is about n log n point checks
-// for long pieces, and one check per point where no point can be left out.
-template <class PieceFits>
-std::vector<size_t> reduce(size_t n, const PieceFits& piece_fits) {
-    std::vector<size_t> kept;
-    if (n == 0) {
-        return kept;
-    }
-    size_t i = 0;
-    kept.push_back(0);
-    while (i + 1 < n) {
-        size_t good = i + 1, step = 2;
-        size_t bad = n;  // first end known not to fit (n: none)
-        while (true) {
-            size_t j = std::min(n - 1, i + step);
-            if (j == good) {
-                break;
-            }
-            if (piece_fits(i, j)) {
-                good = j;
-                if (j == n - 1) {
-                    break;
-                }
-                step *= 2;
-            } else {
-                bad = j;
-                break;
-            }
-        }
-        while (bad < n && bad - good > 1) {
-            size_t mid = good + (bad - good) / 2;
-            if (piece_fits(i, mid)) {
-                good = mid;
-            } else {
-                bad = mid;
-            }
-        }
-        kept.push_back(good);
-        i = good;
-    }
-    return kept;
-}
-// Whether values[k] for i < k < j lie within `tolerance` of the straight line from i to j.
-bool line_fits(const std::vector<double>& times, const std::vector<double>& values, size_t i,
-               size_t j, double tolerance) {
-    double t0 = times[i], v0 = values[i];
-    double slope = (values[j] - v0) / (times[j] - t0);
-    for (size_t k = i + 1; k < j; ++k) {
-        if (std::fabs(v0 + slope * (times[k] - t0) - values[k]) > tolerance) {
-            return false;
-        }
-    }
-    return true;
-}
-
-// Whether q[k] for i < k < j lies within `chord` (the chord between unit quaternions of the
-// tolerance angle) of the spherical interpolation from q[i] to q[j], as players interpolate.
-bool slerp_fits(const std::vector<double>& times, const std::vector<EulerRotation::Quat>& q,
-                size_t i, size_t j, double chord) {
-    const EulerRotation::Quat& a = q[i];
-    const EulerRotation::Quat& b = q[j];
-    double dot = a[0] * b[0] + a[1] * b[1] + a[2] * b[2] + a[3] * b[3];
-    double sign = dot < 0 ? -1.0 : 1.0;
-    dot *= sign;
-    // Between quaternions less than 0.01 radians apart the normalised straight line misses the
-    // spherical one by under 1e-5 degrees, far inside the margin: no sines needed.
-    double angle = dot < 0.99995 ? std::acos(dot) : 0.0, s = angle > 0 ? std::sin(angle) : 0.0;
-    double limit = chord * chord;
-    for (size_t k = i + 1; k < j; ++k) {
-        double u = (times[k] - times[i]) / (times[j] - times[i]);
-        double wa = 1 - u, wb = u;
-        if (angle > 0) {
-            wa = std::sin((1 - u) * angle) / s;
-            wb = std::sin(u * angle) / s;
-        }
-        EulerRotation::Quat m;
-        double n = 0;
-        for (size_t c = 0; c < 4; ++c) {
-            m[c] = wa * a[c] + wb * sign * b[c];
-            n += m[c] * m[c];
-        }
-        n = 1 / std::sqrt(n);
-        double same = 0, opposite = 0;
-        for (size_t c = 0; c < 4; ++c) {
-            double x = m[c] * n;
-            same += (x - q[k][c]) * (x - q[k][c]);
-            opposite += (x + q[k][c]) * (x + q[k][c]);
-        }
-        if (std::min(same, opposite) > limit) {
-            return false;
-        }
-    }
-    return true;
-}
+// The share of a tolerance that the choice of samples may use; the rest is left for the
+// rounding of what is stored as floats (a quaternion moves by about 1e-5 degrees, a value by
+// one float step) and of the player's interpolation.
+constexpr double kFitShare = 0.9;
 }  // namespace
 
 SamplerBuilder::SamplerBuilder(const ChannelCurve* const curves[3], const double rest[3], int fps)
@@ -185,16 +93,18 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
         return false;
     }
     // An axis without a curve holds its rest value (its samples are not filled in).
-    auto fits = [&](size_t i, size_t j) {
-        for (int a = 0; a < 3; ++a) {
-            if (!axis[a].empty() && !line_fits(times, axis[a], i, j, kVectorTolerance * 0.5)) {
-                return false;
-            }
+    std::vector<const std::vector<double>*> moving;
+    for (int a = 0; a < 3; ++a) {
+        if (!axis[a].empty()) {
+            moving.push_back(&axis[a]);
         }
-        return true;
-    };
+    }
+    std::vector<size_t> kept =
+        SampleReducer(times, kVectorTolerance * kFitShare).Lines(moving, true, HUGE_VAL);
     out->interpolation = "LINEAR";
-    for (size_t k : reduce(times.size(), fits)) {
+    out->times.reserve(kept.size());
+    out->values.reserve(kept.size() * 3);
+    for (size_t k : kept) {
         out->times.push_back(stored(times[k]));
         for (int a = 0; a < 3; ++a) {
             out->values.push_back(stored(axis[a].empty() ? rest_[a] : axis[a][k]));
@@ -224,8 +134,7 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     }
     // An axis without a curve holds its rest value (its samples are not filled in).
     auto angle = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : axis[a][k]; };
-    // Float storage moves a quaternion by about 1e-5 degrees: well inside the margin.
-    const double tolerance = kRotationToleranceDegrees * 0.5;
+    const SampleReducer reducer(times, kRotationToleranceDegrees * kFitShare);
     const double halfRadians = 3.14159265358979323846 / 360;
     out->interpolation = "LINEAR";
     if (movingAxes <= 1) {
@@ -236,10 +145,7 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
         if (axis[a].empty()) {
             axis[a].assign(times.size(), rest_[a]);
         }
-        std::vector<size_t> kept = reduce(times.size(), [&](size_t i, size_t j) {
-            return std::fabs(axis[a][j] - axis[a][i]) < 180 &&
-                   line_fits(times, axis[a], i, j, tolerance);
-        });
+        std::vector<size_t> kept = reducer.Lines({&axis[a]}, false, 180);
         // The fixed axes' half-angle sines and cosines once; only the turning one per sample,
         // written straight out, each on the hemisphere of the one before (players take the
         // shortest way round).
@@ -278,9 +184,7 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     for (size_t k = 0; k < times.size(); ++k) {
         q[k] = EulerRotation::ToQuaternion({angle(0, k), angle(1, k), angle(2, k)});
     }
-    const double chord = 2 * std::sin(tolerance * 3.14159265358979323846 / 180 / 4);
-    std::vector<size_t> kept =
-        reduce(times.size(), [&](size_t i, size_t j) { return slerp_fits(times, q, i, j, chord); });
+    std::vector<size_t> kept = reducer.Slerps(q);
     out->times.resize(kept.size());
     out->values.resize(kept.size() * 4);
     float* v = out->values.data();

@@ -1,9 +1,11 @@
 #include "scene/SceneWriter.h"
 
 #include <algorithm>
+#include <atomic>
 #include <cstring>
 #include <map>
 #include <string_view>
+#include <thread>
 #include <unordered_map>
 
 #include "scene/EulerRotation.h"
@@ -14,6 +16,10 @@
 
 namespace {
 const char* const kPaths[3] = {"translation", "rotation", "scale"};
+// Samplers are built on more than one thread only when the curves hold this many keys per
+// thread: below it, starting a thread costs more than it saves.
+constexpr size_t kKeysPerThread = 20000;
+constexpr size_t kMaxHelperThreads = 7;
 
 int path_index(const std::string& path) {
     for (int p = 0; p < 3; ++p) {
@@ -54,28 +60,58 @@ bool SceneWriter::Write(const std::string& path, std::string* error) {
 
 bool SceneWriter::buildTargets(std::vector<Target>* targets, std::string* why) {
     int fps = CueTime::default_fps > 0 ? CueTime::default_fps : 30;
+    size_t keys = 0;  // how much work the samplers are, to decide whether to share it out
     for (int node = 0; node < doc_.NodeCount(); ++node) {
         for (int path = 0; doc_.Touched(node) && path < 3; ++path) {
             if (!doc_.TouchedPath(node, path)) {
                 continue;
             }
+            targets->push_back(Target{node, path, -1, {}});
+            for (int a = 0; a < 3; ++a) {
+                const ChannelCurve* c = doc_.Curve(node, path * 3 + a);
+                keys += c ? c->keys().size() : 0;
+            }
+        }
+    }
+    // Each path's sampler is built on its own from the document's curves (only read), so the
+    // paths are shared out among a few threads when there are enough keys to be worth it.
+    std::vector<std::string> reasons(targets->size());
+    std::vector<char> built(targets->size(), 0);
+    std::atomic<size_t> next{0};
+    auto work = [&]() {
+        for (size_t i = next++; i < targets->size(); i = next++) {
+            Target& t = (*targets)[i];
             const ChannelCurve* curves[3];
             double rest[3];
             for (int a = 0; a < 3; ++a) {
-                curves[a] = doc_.Curve(node, path * 3 + a);
-                rest[a] = doc_.RestValue(node, path * 3 + a);
+                curves[a] = doc_.Curve(t.node, t.path * 3 + a);
+                rest[a] = doc_.RestValue(t.node, t.path * 3 + a);
             }
             SamplerBuilder builder(curves, rest, fps);
-            Target t{node, path, -1, {}};
-            std::string reason;
-            bool ok = path == 1 ? builder.BuildRotation(&t.sampler, &reason)
-                                : builder.BuildVector(&t.sampler, &reason);
-            if (!ok) {
-                *why = "the " + std::string(kPaths[path]) + " of node [" + doc_.NodeName(node) +
-                       "] cannot be written: " + reason;
-                return false;
-            }
-            targets->push_back(std::move(t));
+            built[i] = t.path == 1 ? builder.BuildRotation(&t.sampler, &reasons[i])
+                                   : builder.BuildVector(&t.sampler, &reasons[i]);
+        }
+    };
+    const size_t helpers =
+        keys < kKeysPerThread
+            ? 0
+            : std::min<size_t>({std::max(1u, std::thread::hardware_concurrency()) - 1,
+                                keys / kKeysPerThread, kMaxHelperThreads});
+    std::vector<std::thread> threads;
+    for (size_t h = 0; h < helpers; ++h) {
+        threads.emplace_back(work);
+    }
+    work();
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    for (size_t i = 0; i < targets->size(); ++i) {
+        if (!built[i]) {
+            const Target& t = (*targets)[i];
+            *why = "the " + std::string(kPaths[t.path]) + " of node [" + doc_.NodeName(t.node) +
+                   "] cannot be written: " + reasons[i];
+            targets->clear();
+            return false;
         }
     }
     return true;
