@@ -6,6 +6,7 @@
 #include "scene/ChannelCurve.h"
 #include "scene/EulerRotation.h"
 #include "scene/SampleReducer.h"
+#include "scene/TurnSpline.h"
 
 namespace {
 // Stored floats: a negative zero is written as zero.
@@ -125,6 +126,11 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
             moving = a;
             ++movingAxes;
         }
+    }
+    if (movingAxes == 1 &&
+        TurnSpline(*curves_[moving], moving, rest_)
+            .Build(kRotationToleranceDegrees * kFitShare, kMaxSampledFrames, out)) {
+        return true;  // cubic pieces at the turning axis's keys
     }
     // With one turning axis a straight span of it is followed exactly (see below), as long as
     // it turns by less than half a turn, which a piece would go the other way round.
