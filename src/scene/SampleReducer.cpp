@@ -56,21 +56,23 @@ std::vector<size_t> grow_and_bisect(size_t n, const PieceFits& piece_fits) {
 }  // namespace
 
 std::vector<size_t> SampleReducer::Lines(const std::vector<const std::vector<double>*>& axes,
+                                         const std::vector<const std::vector<double>*>& ends,
                                          bool storedValues, double maxChange) const {
-    switch (axes.size()) {
+    switch (std::min(axes.size(), ends.size())) {
         case 1:
-            return lines<1>(axes.data(), storedValues, maxChange);
+            return lines<1>(axes.data(), ends.data(), storedValues, maxChange);
         case 2:
-            return lines<2>(axes.data(), storedValues, maxChange);
+            return lines<2>(axes.data(), ends.data(), storedValues, maxChange);
         case 3:
-            return lines<3>(axes.data(), storedValues, maxChange);
+            return lines<3>(axes.data(), ends.data(), storedValues, maxChange);
         default:
-            return lines<0>(axes.data(), storedValues, maxChange);
+            return lines<0>(axes.data(), ends.data(), storedValues, maxChange);
     }
 }
 
 template <size_t W>
-std::vector<size_t> SampleReducer::lines(const std::vector<double>* const* axes, bool storedValues,
+std::vector<size_t> SampleReducer::lines(const std::vector<double>* const* axes,
+                                         const std::vector<double>* const* ends, bool storedValues,
                                          double maxChange) const {
     const size_t n = times_.size();
     std::vector<size_t> kept;
@@ -91,9 +93,10 @@ std::vector<size_t> SampleReducer::lines(const std::vector<double>* const* axes,
         storedTimes[k] = as_stored(times_[k]);
     }
     constexpr size_t kSlots = W > 0 ? W : 1;
-    const double* v[kSlots];
+    const double *v[kSlots], *e[kSlots];
     for (size_t a = 0; a < W; ++a) {
         v[a] = axes[a]->data();
+        e[a] = ends[a]->data();
     }
     // Per axis: the anchor's written value, and the slopes from it that keep every point so far
     // within the tolerance.
@@ -105,7 +108,7 @@ std::vector<size_t> SampleReducer::lines(const std::vector<double>* const* axes,
         // The anchor's own exact time lies on this piece when it falls after the stored one.
         const double late = times_[i] - t0;
         for (size_t a = 0; a < W; ++a) {
-            start[a] = storedValues ? as_stored(v[a][i]) : v[a][i];
+            start[a] = storedValues ? as_stored(e[a][i]) : e[a][i];
             low[a] = late > 0 ? (v[a][i] - tol - start[a]) / late : -HUGE_VAL;
             high[a] = late > 0 ? (v[a][i] + tol - start[a]) / late : HUGE_VAL;
         }
@@ -117,7 +120,7 @@ std::vector<size_t> SampleReducer::lines(const std::vector<double>* const* axes,
             bool fits = true, open = true;
             for (size_t a = 0; a < W; ++a) {
                 const double value = v[a][k], rise = value - start[a];
-                const double end = storedValues ? as_stored(value) : value;
+                const double end = storedValues ? as_stored(e[a][k]) : e[a][k];
                 const double slope = (end - start[a]) * perSpan;
                 // As the end: within the slopes the points before allow, and the point itself
                 // within the tolerance at its exact time when that is still on this piece.
@@ -142,19 +145,21 @@ std::vector<size_t> SampleReducer::lines(const std::vector<double>* const* axes,
     return kept;
 }
 
-std::vector<size_t> SampleReducer::Slerps(const std::vector<EulerRotation::Quat>& q) const {
+std::vector<size_t> SampleReducer::Slerps(const std::vector<EulerRotation::Quat>& q,
+                                          const std::vector<EulerRotation::Quat>& ends) const {
     const double chord = 2 * std::sin(tolerance_ * 3.14159265358979323846 / 180 / 4);
     return grow_and_bisect(times_.size(),
-                           [&](size_t i, size_t j) { return slerpFits(q, i, j, chord); });
+                           [&](size_t i, size_t j) { return slerpFits(q, ends, i, j, chord); });
 }
 
 // Whether q[k] for every point from i to j that the piece holds lies within `chord` (the chord
 // between unit quaternions of the tolerance angle) of the spherical interpolation from q[i] to
 // q[j] between their stored times.
-bool SampleReducer::slerpFits(const std::vector<EulerRotation::Quat>& q, size_t i, size_t j,
+bool SampleReducer::slerpFits(const std::vector<EulerRotation::Quat>& q,
+                              const std::vector<EulerRotation::Quat>& ends, size_t i, size_t j,
                               double chord) const {
-    const EulerRotation::Quat& a = q[i];
-    const EulerRotation::Quat& b = q[j];
+    const EulerRotation::Quat& a = ends[i];
+    const EulerRotation::Quat& b = ends[j];
     double dot = a[0] * b[0] + a[1] * b[1] + a[2] * b[2] + a[3] * b[3];
     double sign = dot < 0 ? -1.0 : 1.0;
     dot *= sign;

@@ -16,22 +16,28 @@ class SampleReducer {
         : times_(times), tolerance_(tolerance) {}
 
     // Straight pieces through one or more axes at once (each `axes[a][k]` the value of axis a at
-    // point k): every point lies within the tolerance of the pieces on every axis. With
+    // point k's exact time, `ends[a][k]` its value at the stored time, which a piece ending
+    // there carries): every point lies within the tolerance of the pieces on every axis. With
     // `storedValues` the ends carry their values rounded to floats, as they are written; a piece
     // never changes an axis by `maxChange` or more. Greedy: each piece reaches the farthest point
     // that fits, found in one pass over the points it covers (the slopes that keep every point
     // so far within the tolerance narrow to an interval as the piece grows).
     std::vector<size_t> Lines(const std::vector<const std::vector<double>*>& axes,
+                              const std::vector<const std::vector<double>*>& ends,
                               bool storedValues, double maxChange) const;
     // Spherical pieces between unit quaternions (as players interpolate rotations), the
     // tolerance being the angle in degrees between the written rotation and each point's.
-    std::vector<size_t> Slerps(const std::vector<EulerRotation::Quat>& q) const;
+    // `q` at each point's exact time, `ends` at its stored time.
+    std::vector<size_t> Slerps(const std::vector<EulerRotation::Quat>& q,
+                               const std::vector<EulerRotation::Quat>& ends) const;
 
   private:
     template <size_t W>
-    std::vector<size_t> lines(const std::vector<double>* const* axes, bool storedValues,
+    std::vector<size_t> lines(const std::vector<double>* const* axes,
+                              const std::vector<double>* const* ends, bool storedValues,
                               double maxChange) const;
-    bool slerpFits(const std::vector<EulerRotation::Quat>& q, size_t i, size_t j,
+    bool slerpFits(const std::vector<EulerRotation::Quat>& q,
+                   const std::vector<EulerRotation::Quat>& ends, size_t i, size_t j,
                    double chord) const;
 
     const std::vector<double>& times_;

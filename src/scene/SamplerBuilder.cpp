@@ -89,26 +89,27 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
         unionCubic(out);
         return true;
     }
-    std::vector<double> times, axis[3];
-    if (!sampleCandidates(&times, axis, HUGE_VAL, why)) {
+    std::vector<double> times, axis[3], atStored[3];
+    if (!sampleCandidates(&times, axis, atStored, HUGE_VAL, why)) {
         return false;
     }
     // An axis without a curve holds its rest value (its samples are not filled in).
-    std::vector<const std::vector<double>*> moving;
+    std::vector<const std::vector<double>*> moving, ends;
     for (int a = 0; a < 3; ++a) {
         if (!axis[a].empty()) {
             moving.push_back(&axis[a]);
+            ends.push_back(&atStored[a]);
         }
     }
     std::vector<size_t> kept =
-        SampleReducer(times, kVectorTolerance * kFitShare).Lines(moving, true, HUGE_VAL);
+        SampleReducer(times, kVectorTolerance * kFitShare).Lines(moving, ends, true, HUGE_VAL);
     out->interpolation = "LINEAR";
     out->times.reserve(kept.size());
     out->values.reserve(kept.size() * 3);
     for (size_t k : kept) {
         out->times.push_back(stored(times[k]));
         for (int a = 0; a < 3; ++a) {
-            out->values.push_back(stored(axis[a].empty() ? rest_[a] : axis[a][k]));
+            out->values.push_back(stored(axis[a].empty() ? rest_[a] : atStored[a][k]));
         }
     }
     return true;
@@ -134,12 +135,13 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     }
     // With one turning axis a straight span of it is followed exactly (see below), as long as
     // it turns by less than half a turn, which a piece would go the other way round.
-    std::vector<double> times, axis[3];
-    if (!sampleCandidates(&times, axis, movingAxes <= 1 ? 90.0 : 0.0, why)) {
+    std::vector<double> times, axis[3], atStored[3];
+    if (!sampleCandidates(&times, axis, atStored, movingAxes <= 1 ? 90.0 : 0.0, why)) {
         return false;
     }
     // An axis without a curve holds its rest value (its samples are not filled in).
     auto angle = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : axis[a][k]; };
+    auto end = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : atStored[a][k]; };
     const SampleReducer reducer(times, kRotationToleranceDegrees * kFitShare);
     const double halfRadians = 3.14159265358979323846 / 360;
     out->interpolation = "LINEAR";
@@ -150,8 +152,9 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
         int a = moving < 0 ? 0 : moving;
         if (axis[a].empty()) {
             axis[a].assign(times.size(), rest_[a]);
+            atStored[a] = axis[a];
         }
-        std::vector<size_t> kept = reducer.Lines({&axis[a]}, false, 180);
+        std::vector<size_t> kept = reducer.Lines({&axis[a]}, {&atStored[a]}, false, 180);
         // The fixed axes' half-angle sines and cosines once; only the turning one per sample,
         // written straight out, each on the hemisphere of the one before (players take the
         // shortest way round).
@@ -166,8 +169,8 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
         double previous[4] = {0, 0, 0, 1};
         for (size_t n = 0; n < kept.size(); ++n, v += 4) {
             const size_t k = kept[n];
-            c[a] = std::cos(axis[a][k] * halfRadians);
-            sn[a] = std::sin(axis[a][k] * halfRadians);
+            c[a] = std::cos(atStored[a][k] * halfRadians);
+            sn[a] = std::sin(atStored[a][k] * halfRadians);
             // qz * qy * qx, as EulerRotation::ToQuaternion
             double q[4] = {sn[0] * c[1] * c[2] - c[0] * sn[1] * sn[2],
                            c[0] * sn[1] * c[2] + sn[0] * c[1] * sn[2],
@@ -186,18 +189,19 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
         }
         return true;
     }
-    std::vector<EulerRotation::Quat> q(times.size());
+    std::vector<EulerRotation::Quat> q(times.size()), ends(times.size());
     for (size_t k = 0; k < times.size(); ++k) {
         q[k] = EulerRotation::ToQuaternion({angle(0, k), angle(1, k), angle(2, k)});
+        ends[k] = EulerRotation::ToQuaternion({end(0, k), end(1, k), end(2, k)});
     }
-    std::vector<size_t> kept = reducer.Slerps(q);
+    std::vector<size_t> kept = reducer.Slerps(q, ends);
     out->times.resize(kept.size());
     out->values.resize(kept.size() * 4);
     float* v = out->values.data();
     EulerRotation::Quat previous = {0, 0, 0, 1};
     for (size_t n = 0; n < kept.size(); ++n, v += 4) {
         // Each sample on the hemisphere of the one before: players take the shortest way round.
-        EulerRotation::Quat r = q[kept[n]];
+        EulerRotation::Quat r = ends[kept[n]];
         if (n > 0 &&
             r[0] * previous[0] + r[1] * previous[1] + r[2] * previous[2] + r[3] * previous[3] < 0) {
             for (double& x : r) {
@@ -355,11 +359,18 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, double straightUpT
 }
 
 bool SamplerBuilder::sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
-                                      double straightUpTo, std::string* why) const {
+                                      std::vector<double> atStored[3], double straightUpTo,
+                                      std::string* why) const {
     if (!candidateTimes(times, straightUpTo, why)) {
         return false;
     }
     evaluate(*times, axis);
+    // A written sample sits at its time as a float: its value is the curve's there.
+    std::vector<double> storedTimes(times->size());
+    for (size_t k = 0; k < times->size(); ++k) {
+        storedTimes[k] = double(float((*times)[k]));
+    }
+    evaluate(storedTimes, atStored);
     return true;
 }
 

@@ -60,10 +60,12 @@ class SamplerBuilder {
     // samples inside: every axis holds still across it or runs in a straight line that changes
     // by less than `straightUpTo` (0 where the written pieces do not follow straight lines).
     std::vector<char> plainSpans(const std::vector<double>& keys, double straightUpTo) const;
-    // The candidate times and each animated axis's value at each of them (an axis without a
-    // curve is left empty: it holds its rest value).
+    // The candidate times and each animated axis's value at each of them, and at each of them
+    // rounded to a float as it is stored (an axis without a curve is left empty: it holds its
+    // rest value).
     bool sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
-                          double straightUpTo, std::string* why) const;
+                          std::vector<double> atStored[3], double straightUpTo,
+                          std::string* why) const;
     void evaluate(const std::vector<double>& times, std::vector<double> axis[3]) const;
 
     const ChannelCurve* curves_[3];
