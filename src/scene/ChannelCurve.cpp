@@ -55,6 +55,49 @@ double ChannelCurve::InSlope(size_t i) const {
     return 0.0;
 }
 
+void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) const {
+    const size_t n = keys_.size();
+    in->resize(n);
+    out->resize(n);
+    double before = 0.0;  // the slope of the segment arriving at key i
+    for (size_t i = 0; i < n; ++i) {
+        const Key& k = keys_[i];
+        const double after = i + 1 < n ? segmentSlope(i) : 0.0;
+        const double smooth = k.in == kSmooth || k.out == kSmooth ? smoothSlope(i) : 0.0;
+        switch (k.in) {
+            case kSmooth:
+                (*in)[i] = smooth;
+                break;
+            case kLinear:
+                (*in)[i] = before;
+                break;
+            case kExplicit:
+                (*in)[i] = k.inSlope;
+                break;
+            case kFlat:
+            case kStep:
+                (*in)[i] = 0.0;
+                break;
+        }
+        switch (k.out) {
+            case kSmooth:
+                (*out)[i] = smooth;
+                break;
+            case kLinear:
+                (*out)[i] = after;
+                break;
+            case kExplicit:
+                (*out)[i] = k.outSlope;
+                break;
+            case kFlat:
+            case kStep:
+                (*out)[i] = 0.0;
+                break;
+        }
+        before = after;
+    }
+}
+
 double ChannelCurve::Evaluate(double seconds) const {
     if (keys_.empty()) {
         return 0.0;

@@ -48,6 +48,8 @@ class ChannelCurve : public OrChannel {
     // (in), resolved from the tangent kinds; a step leaves with slope 0.
     double OutSlope(size_t i) const;
     double InSlope(size_t i) const;
+    // InSlope and OutSlope of every key, in one pass (each segment's slope worked out once).
+    void Slopes(std::vector<double>* in, std::vector<double>* out) const;
     // The curve's derivative (units per second) at `seconds`, from the right (`outgoing`) or
     // from the left; zero where the curve holds, and at a step.
     double SlopeAt(double seconds, bool outgoing) const;

@@ -227,14 +227,18 @@ void SamplerBuilder::keysExact(BuiltSampler* out) const {
         out->times[k] = stored(lead[k].time);
     }
     // Axis by axis into the interleaved values: in-tangents, values, out-tangents of each key.
+    std::vector<double> in, leave;
     for (int a = 0; a < 3; ++a) {
         const ChannelCurve* c = curves_[a];
+        if (c && cubic) {
+            c->Slopes(&in, &leave);
+        }
         float* v = out->values.data() + (cubic ? 3 : 0) + a;
         for (size_t k = 0; k < n; ++k, v += stride) {
             v[0] = stored(c ? c->keys()[k].value : rest_[a]);
             if (cubic) {
-                v[-3] = c ? stored(c->InSlope(k)) : 0.0f;
-                v[3] = c ? stored(c->OutSlope(k)) : 0.0f;
+                v[-3] = c ? stored(in[k]) : 0.0f;
+                v[3] = c ? stored(leave[k]) : 0.0f;
             }
         }
     }

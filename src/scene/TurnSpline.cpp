@@ -80,12 +80,13 @@ bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* o
     }
     const double allowed = toleranceDegrees * kPi / 180;
     // Each key's slopes, in half-angle radians per second, and each piece's number of parts.
-    std::vector<double> in(n), leave(n);
+    std::vector<double> in, leave;
     std::vector<int> parts(n - 1);
     size_t knots = 1;
+    curve_.Slopes(&in, &leave);
     for (size_t i = 0; i < n; ++i) {
-        in[i] = curve_.InSlope(i) * kHalfRadians;
-        leave[i] = curve_.OutSlope(i) * kHalfRadians;
+        in[i] *= kHalfRadians;
+        leave[i] *= kHalfRadians;
     }
     for (size_t i = 0; i + 1 < n; ++i) {
         if (keys[i].out == ChannelCurve::kStep) {

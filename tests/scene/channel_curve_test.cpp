@@ -69,6 +69,14 @@ TEST_P(CurveEvaluate, OnePassSamplingMatchesPointwise) {
     std::vector<double> only;
     c.EvaluateSorted(times, &only);
     EXPECT_EQ(only, values);
+    // The slopes of every key at once are the ones asked key by key.
+    std::vector<double> in, out;
+    c.Slopes(&in, &out);
+    ASSERT_EQ(in.size(), c.keys().size());
+    for (size_t k = 0; k < c.keys().size(); ++k) {
+        EXPECT_EQ(in[k], c.InSlope(k)) << "key " << k;
+        EXPECT_EQ(out[k], c.OutSlope(k)) << "key " << k;
+    }
 }
 
 INSTANTIATE_TEST_SUITE_P(
