@@ -98,6 +98,32 @@ void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) con
     }
 }
 
+double ChannelCurve::MaxSlope() const {
+    std::vector<double> in, out;
+    Slopes(&in, &out);
+    double most = 0;
+    for (size_t i = 0; i + 1 < keys_.size(); ++i) {
+        if (keys_[i].out == kStep) {
+            continue;
+        }
+        // The segment's cubic in u = 0..1: its slope m0 + 2bu + 3au^2 peaks at an end or at
+        // u = -b / 3a.
+        const double dt = keys_[i + 1].time - keys_[i].time;
+        const double m0 = out[i] * dt, m1 = in[i + 1] * dt,
+                     dv = keys_[i + 1].value - keys_[i].value;
+        const double b = 3 * dv - 2 * m0 - m1, a = -2 * dv + m0 + m1;
+        double peak = std::max(std::fabs(m0), std::fabs(m1));
+        const double u = a != 0 ? -b / (3 * a) : -1;
+        if (u > 0 && u < 1) {
+            peak = std::max(peak, std::fabs(m0 + 2 * b * u + 3 * a * u * u));
+        }
+        if (dt > 0) {
+            most = std::max(most, peak / dt);
+        }
+    }
+    return most;
+}
+
 double ChannelCurve::Evaluate(double seconds) const {
     if (keys_.empty()) {
         return 0.0;

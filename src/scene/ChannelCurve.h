@@ -50,6 +50,8 @@ class ChannelCurve : public OrChannel {
     double InSlope(size_t i) const;
     // InSlope and OutSlope of every key, in one pass (each segment's slope worked out once).
     void Slopes(std::vector<double>* in, std::vector<double>* out) const;
+    // A bound on the size of the curve's slope anywhere (units per second).
+    double MaxSlope() const;
     // The curve's derivative (units per second) at `seconds`, from the right (`outgoing`) or
     // from the left; zero where the curve holds, and at a step.
     double SlopeAt(double seconds, bool outgoing) const;

@@ -18,6 +18,9 @@ float stored(double v) {
 // rounding of what is stored as floats (a quaternion moves by about 1e-5 degrees, a value by
 // one float step) and of the player's interpolation.
 constexpr double kFitShare = 0.9;
+// The largest share of the tolerance that float times may move a sample by before samples are
+// valued at their stored times.
+constexpr double kDriftShare = 0.25;
 }  // namespace
 
 SamplerBuilder::SamplerBuilder(const ChannelCurve* const curves[3], const double rest[3], int fps)
@@ -90,7 +93,10 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
         return true;
     }
     std::vector<double> times, axis[3], atStored[3];
-    if (!sampleCandidates(&times, axis, atStored, HUGE_VAL, why)) {
+    double drift = 0;
+    bool ownTimes = false;
+    if (!sampleCandidates(&times, axis, atStored, HUGE_VAL, kVectorTolerance, false, &drift,
+                          &ownTimes, why)) {
         return false;
     }
     // An axis without a curve holds its rest value (its samples are not filled in).
@@ -101,8 +107,8 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
             ends.push_back(&atStored[a]);
         }
     }
-    std::vector<size_t> kept =
-        SampleReducer(times, kVectorTolerance * kFitShare).Lines(moving, ends, true, HUGE_VAL);
+    std::vector<size_t> kept = SampleReducer(times, kVectorTolerance * kFitShare - drift)
+                                   .Lines(moving, ends, true, HUGE_VAL);
     out->interpolation = "LINEAR";
     out->times.reserve(kept.size());
     out->values.reserve(kept.size() * 3);
@@ -136,13 +142,16 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     // With one turning axis a straight span of it is followed exactly (see below), as long as
     // it turns by less than half a turn, which a piece would go the other way round.
     std::vector<double> times, axis[3], atStored[3];
-    if (!sampleCandidates(&times, axis, atStored, movingAxes <= 1 ? 90.0 : 0.0, why)) {
+    double drift = 0;
+    bool ownTimes = false;
+    if (!sampleCandidates(&times, axis, atStored, movingAxes <= 1 ? 90.0 : 0.0,
+                          kRotationToleranceDegrees, true, &drift, &ownTimes, why)) {
         return false;
     }
     // An axis without a curve holds its rest value (its samples are not filled in).
     auto angle = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : axis[a][k]; };
     auto end = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : atStored[a][k]; };
-    const SampleReducer reducer(times, kRotationToleranceDegrees * kFitShare);
+    const SampleReducer reducer(times, kRotationToleranceDegrees * kFitShare - drift);
     const double halfRadians = 3.14159265358979323846 / 360;
     out->interpolation = "LINEAR";
     if (movingAxes <= 1) {
@@ -192,7 +201,7 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     std::vector<EulerRotation::Quat> q(times.size()), ends(times.size());
     for (size_t k = 0; k < times.size(); ++k) {
         q[k] = EulerRotation::ToQuaternion({angle(0, k), angle(1, k), angle(2, k)});
-        ends[k] = EulerRotation::ToQuaternion({end(0, k), end(1, k), end(2, k)});
+        ends[k] = ownTimes ? q[k] : EulerRotation::ToQuaternion({end(0, k), end(1, k), end(2, k)});
     }
     std::vector<size_t> kept = reducer.Slerps(q, ends);
     out->times.resize(kept.size());
@@ -364,12 +373,30 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, double straightUpT
 
 bool SamplerBuilder::sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
                                       std::vector<double> atStored[3], double straightUpTo,
+                                      double tolerance, bool sumAxes, double* drift, bool* ownTimes,
                                       std::string* why) const {
     if (!candidateTimes(times, straightUpTo, why)) {
         return false;
     }
     evaluate(*times, axis);
-    // A written sample sits at its time as a float: its value is the curve's there.
+    // A written sample sits at its time as a float, up to half a float step from its own: its
+    // value is the curve's there. Where the curves cannot move by more than a small part of the
+    // tolerance in that step, the samples keep the values at their own times and the pieces are
+    // fitted within the tolerance less that part.
+    *drift = 0;
+    const double halfStep = (times->empty() ? 0.0 : std::fabs(times->back())) / (1 << 24);
+    for (int a = 0; a < 3; ++a) {
+        const double moved = axis[a].empty() ? 0.0 : curves_[a]->MaxSlope() * halfStep;
+        *drift = sumAxes ? *drift + moved : std::max(*drift, moved);
+    }
+    *ownTimes = *drift <= tolerance * kDriftShare;
+    if (*ownTimes) {
+        for (int a = 0; a < 3; ++a) {
+            atStored[a] = axis[a];
+        }
+        return true;
+    }
+    *drift = 0;
     std::vector<double> storedTimes(times->size());
     for (size_t k = 0; k < times->size(); ++k) {
         storedTimes[k] = double(float((*times)[k]));

@@ -62,10 +62,13 @@ class SamplerBuilder {
     std::vector<char> plainSpans(const std::vector<double>& keys, double straightUpTo) const;
     // The candidate times and each animated axis's value at each of them, and at each of them
     // rounded to a float as it is stored (an axis without a curve is left empty: it holds its
-    // rest value).
+    // rest value). When float times can move a sample by at most a quarter of `tolerance` (the
+    // axes' movements summed with `sumAxes`, else the largest), the samples keep the values at
+    // their own times (`ownTimes`, `atStored` a copy of `axis`) and `drift` is that movement,
+    // which the pieces must leave room for; otherwise `drift` is 0.
     bool sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
-                          std::vector<double> atStored[3], double straightUpTo,
-                          std::string* why) const;
+                          std::vector<double> atStored[3], double straightUpTo, double tolerance,
+                          bool sumAxes, double* drift, bool* ownTimes, std::string* why) const;
     void evaluate(const std::vector<double>& times, std::vector<double> axis[3]) const;
 
     const ChannelCurve* curves_[3];
