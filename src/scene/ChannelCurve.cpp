@@ -62,8 +62,19 @@ void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) con
     double before = 0.0;  // the slope of the segment arriving at key i
     for (size_t i = 0; i < n; ++i) {
         const Key& k = keys_[i];
-        const double after = i + 1 < n ? segmentSlope(i) : 0.0;
-        const double smooth = k.in == kSmooth || k.out == kSmooth ? smoothSlope(i) : 0.0;
+        // As segmentSlope(i) and smoothSlope(i), written out so that they are inlined.
+        double after = 0.0;
+        if (i + 1 < n) {
+            const double dt = keys_[i + 1].time - k.time;
+            after = dt > 0 ? (keys_[i + 1].value - k.value) / dt : 0.0;
+        }
+        double smooth = 0.0;
+        if ((k.in == kSmooth || k.out == kSmooth) && n >= 2) {
+            const Key& lo = keys_[i == 0 ? 0 : i - 1];
+            const Key& hi = keys_[i + 1 < n ? i + 1 : n - 1];
+            const double dt = hi.time - lo.time;
+            smooth = dt > 0 ? (hi.value - lo.value) / dt : 0.0;
+        }
         switch (k.in) {
             case kSmooth:
                 (*in)[i] = smooth;

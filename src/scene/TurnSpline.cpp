@@ -10,6 +10,8 @@ namespace {
 constexpr double kPi = 3.14159265358979323846;
 constexpr double kHalfRadians = kPi / 360;          // half-angle radians per degree
 constexpr double kHalfFloatStep = 1.0 / (1 << 24);  // of a float, relative to its size
+constexpr double kBy384 = 1.0 / 384;
+constexpr double kRoot2 = 1.4142135623730951;
 
 // Stored floats: a negative zero is written as zero.
 float stored(double v) {
@@ -44,11 +46,10 @@ int TurnSpline::partsFor(double t0, double t1, double p0, double p1, double m0, 
     const double b = 3 * (p1 - p0) - 2 * m0 - m1, a = 2 * (p0 - p1) + m0 + m1;
     // Bounds on the first three derivatives (by u) of the half-angle over the piece.
     double first = std::max(std::fabs(m0), std::fabs(m1));
-    if (a != 0) {
+    if (b * (b + 3 * a) < 0) {
+        // The second derivative 2b + 6au changes sign inside: the first peaks there.
         const double u = -b / (3 * a);
-        if (u > 0 && u < 1) {
-            first = std::max(first, std::fabs(m0 + 2 * b * u + 3 * a * u * u));
-        }
+        first = std::max(first, std::fabs(m0 + 2 * b * u + 3 * a * u * u));
     }
     const double second = std::max(std::fabs(2 * b), std::fabs(2 * b + 6 * a));
     const double third = std::fabs(6 * a);
@@ -56,16 +57,19 @@ int TurnSpline::partsFor(double t0, double t1, double p0, double p1, double m0, 
     // moving what a player reads by the turning speed times that (and its tangents a little).
     const double drift = std::max(std::fabs(t0), std::fabs(t1)) * kHalfFloatStep * 2.6 * first / dt;
     for (int parts = 1; parts <= kMaxParts; ++parts) {
-        const double A = first / parts, B = second / (parts * parts),
-                     C = third / (parts * parts * parts);
+        const double A = parts == 1 ? first : first / parts,
+                     B = parts == 1 ? second : second / (parts * parts),
+                     C = parts == 1 ? third : third / (parts * parts * parts);
         // A cubic Hermite piece of z = exp(i h) misses by at most (du^4 / 384) |z''''| with
         // z'''' = (h'^4 - 3h''^2 - 4h'h''' - 6i h'^2 h'') z; only the part across z turns the
         // rotation (the rest is normalised away), and across z the real part is scaled by the
         // sine of how far h moves over the piece (at most A).
-        const double across = ((A * A * A * A + 3 * B * B + 4 * A * C) * A + 6 * A * A * B) / 384;
+        const double across =
+            ((A * A * A * A + 3 * B * B + 4 * A * C) * A + 6 * A * A * B) * kBy384;
         const double whole =
-            std::sqrt(2.0) * (A * A * A * A + 6 * A * A * B + 3 * B * B + 4 * A * C) / 384;
-        if (whole < 0.5 && 2 * (across / (1 - whole) + drift) <= allowedRadians) {
+            kRoot2 * (A * A * A * A + 6 * A * A * B + 3 * B * B + 4 * A * C) * kBy384;
+        // 2 (across / (1 - whole) + drift) <= allowedRadians, without dividing
+        if (whole < 0.5 && 2 * (across + drift * (1 - whole)) <= allowedRadians * (1 - whole)) {
             return parts;
         }
     }
@@ -104,27 +108,26 @@ bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* o
     BuiltSampler s;
     s.interpolation = "CUBICSPLINE";
     s.width = 4;
-    s.times.reserve(knots);
-    s.values.reserve(knots * 12);
+    s.times.resize(knots);
+    s.values.resize(knots * 12);
+    float* time = s.times.data();
+    float* v = s.values.data();
     // One knot: its time, the half-angle there and its slopes (half-angle radians per second).
     // The rotation is cos(h) P + sin(h) Q, its derivative by h -sin(h) P + cos(h) Q.
-    auto put = [&](double time, double half, double arrive, double depart) {
+    auto put = [&](double at, double half, double arrive, double depart) {
         const double ch = std::cos(half), sh = std::sin(half);
         double q[4], dq[4];
         for (int c = 0; c < 4; ++c) {
             q[c] = ch * p_[c] + sh * q_[c];
             dq[c] = ch * q_[c] - sh * p_[c];
         }
-        s.times.push_back(stored(time));
-        for (int c = 0; c < 4; ++c) {
-            s.values.push_back(stored(dq[c] * arrive));
+        *time++ = stored(at);
+        for (int c = 0; c < 4; ++c, ++v) {
+            v[0] = stored(dq[c] * arrive);
+            v[4] = stored(q[c]);
+            v[8] = stored(dq[c] * depart);
         }
-        for (int c = 0; c < 4; ++c) {
-            s.values.push_back(stored(q[c]));
-        }
-        for (int c = 0; c < 4; ++c) {
-            s.values.push_back(stored(dq[c] * depart));
-        }
+        v += 8;
     };
     for (size_t i = 0; i < n; ++i) {
         const double half = keys[i].value * kHalfRadians;
