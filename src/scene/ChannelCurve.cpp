@@ -405,18 +405,19 @@ bool ChannelCurve::FromApplyArrays(int count, const CueTime* times, const float*
     if (count < 0 || (count > 0 && (!times || !values))) {
         return false;
     }
-    keys->reserve(size_t(count));
     for (int i = 0; i < count; ++i) {
         if (!std::isfinite(values[i])) {
-            keys->clear();
             return false;
         }
-        Key k;
-        k.time = times[i].Seconds();
-        k.value = values[i];
-        k.in = KindFromCode(inTangents ? inTangents[i] : KLWire::kLinear);
-        k.out = KindFromCode(outTangents ? outTangents[i] : KLWire::kLinear);
-        keys->push_back(k);
+    }
+    // Filled in place, field by field: a curve of thousands of keys is written once.
+    keys->resize(size_t(count));
+    Key* k = keys->data();
+    for (int i = 0; i < count; ++i, ++k) {
+        k->time = times[i].Seconds();
+        k->value = values[i];
+        k->in = KindFromCode(inTangents ? inTangents[i] : KLWire::kLinear);
+        k->out = KindFromCode(outTangents ? outTangents[i] : KLWire::kLinear);
     }
     // Apply gives its keys in time order: sorting (which allocates) only when they are not.
     auto earlier = [](const Key& a, const Key& b) { return a.time < b.time; };
