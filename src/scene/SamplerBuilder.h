@@ -22,13 +22,18 @@ struct BuiltSampler {
 //     CUBICSPLINE with the keys' slopes (exact);
 //   - translation or scale whose axes are keyed at different times, without steps: CUBICSPLINE
 //     at the union of the key times, each piece cut from the axis's own cubic (exact);
-//   - rotation, and translation or scale mixing steps with axes keyed at different times:
-//     LINEAR samples taken from the keys and the whole frames between them, reduced to the
-//     fewest that keep the written curve within kVectorTolerance (units) or
-//     kRotationToleranceDegrees (the angle between the rotations) of the evaluated curve at
-//     every key and every frame. Spans where every axis holds still, or where the moving axes
-//     run in straight lines that the pieces follow exactly (translation and scale; a rotation
-//     turning about one axis by less than a quarter turn), get no samples inside.
+//   - rotation turning about one axis between fixed ones, without steps: CUBICSPLINE
+//     quaternions at that axis's keys, a piece cut into equal parts where a bound on its error
+//     exceeds kRotationToleranceDegrees (see TurnSpline);
+//   - any other rotation (and a turn that steps, or that float times would move too far), and
+//     translation or scale mixing steps with axes keyed at different times: LINEAR samples
+//     taken from the keys and the whole frames between them, reduced to few that keep the
+//     written curve within kVectorTolerance (units) or kRotationToleranceDegrees (the angle
+//     between the rotations) of the evaluated curve at every key and every frame, with the
+//     pieces running between the samples' stored (float) times. Spans where every axis holds
+//     still, or where the moving axes run in straight lines that the pieces follow exactly
+//     (translation and scale; a rotation turning about one axis by less than a quarter turn),
+//     get no samples inside.
 // A curve is never sampled before its first or after its last key; one whose keys would make it
 // need more than kMaxSampledFrames frames sampled is refused.
 class SamplerBuilder {
