@@ -166,32 +166,31 @@ bool SampleReducer::slerpFits(const std::vector<EulerRotation::Quat>& q,
     // Between quaternions less than 0.01 radians apart the normalised straight line misses the
     // spherical one by under 1e-5 degrees, far inside the margin: no sines needed.
     double angle = dot < 0.99995 ? std::acos(dot) : 0.0, s = angle > 0 ? std::sin(angle) : 0.0;
-    const double t0 = as_stored(times_[i]), t1 = as_stored(times_[j]);
-    const double limit = chord * chord;
+    const double t0 = as_stored(times_[i]), t1 = as_stored(times_[j]), per = 1 / (t1 - t0);
+    // For unit x and q, min(|x - q|^2, |x + q|^2) = 2 - 2|x.q| <= chord^2 is |x.q| >= cosine;
+    // with x = m / |m|, (m.q)^2 >= cosine^2 |m|^2: no square root or division per point.
+    const double cosine = 1 - chord * chord / 2, cosine2 = cosine * cosine;
+    double sb[4];
+    for (size_t c = 0; c < 4; ++c) {
+        sb[c] = sign * b[c];
+    }
     for (size_t k = i; k <= j; ++k) {
         if (times_[k] < t0 || times_[k] > t1) {
             continue;  // held by the piece before or after
         }
-        double u = (times_[k] - t0) / (t1 - t0);
+        const double u = (times_[k] - t0) * per;
         double wa = 1 - u, wb = u;
         if (angle > 0) {
             wa = std::sin((1 - u) * angle) / s;
             wb = std::sin(u * angle) / s;
         }
-        EulerRotation::Quat m;
-        double n = 0;
+        double mm = 0, mq = 0;
         for (size_t c = 0; c < 4; ++c) {
-            m[c] = wa * a[c] + wb * sign * b[c];
-            n += m[c] * m[c];
+            const double m = wa * a[c] + wb * sb[c];
+            mm += m * m;
+            mq += m * q[k][c];
         }
-        n = 1 / std::sqrt(n);
-        double same = 0, opposite = 0;
-        for (size_t c = 0; c < 4; ++c) {
-            double x = m[c] * n;
-            same += (x - q[k][c]) * (x - q[k][c]);
-            opposite += (x + q[k][c]) * (x + q[k][c]);
-        }
-        if (std::min(same, opposite) > limit) {
+        if (mq * mq < cosine2 * mm) {
             return false;
         }
     }
