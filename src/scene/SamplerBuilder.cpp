@@ -111,11 +111,11 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
                                    .Lines(moving, ends, true, HUGE_VAL);
     out->interpolation = "LINEAR";
     out->times.reserve(kept.size());
-    out->values.reserve(kept.size() * 3);
+    float* v = out->SizeValues(kept.size() * 3);
     for (size_t k : kept) {
         out->times.push_back(stored(times[k]));
         for (int a = 0; a < 3; ++a) {
-            out->values.push_back(stored(axis[a].empty() ? rest_[a] : atStored[a][k]));
+            *v++ = stored(axis[a].empty() ? rest_[a] : atStored[a][k]);
         }
     }
     return true;
@@ -173,8 +173,7 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
             sn[b] = std::sin(angle(b, 0) * halfRadians);
         }
         out->times.resize(kept.size());
-        out->values.resize(kept.size() * 4);
-        float* v = out->values.data();
+        float* v = out->SizeValues(kept.size() * 4);
         double previous[4] = {0, 0, 0, 1};
         for (size_t n = 0; n < kept.size(); ++n, v += 4) {
             const size_t k = kept[n];
@@ -205,8 +204,7 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     }
     std::vector<size_t> kept = reducer.Slerps(q, ends);
     out->times.resize(kept.size());
-    out->values.resize(kept.size() * 4);
-    float* v = out->values.data();
+    float* v = out->SizeValues(kept.size() * 4);
     EulerRotation::Quat previous = {0, 0, 0, 1};
     for (size_t n = 0; n < kept.size(); ++n, v += 4) {
         // Each sample on the hemisphere of the one before: players take the shortest way round.
@@ -231,7 +229,7 @@ void SamplerBuilder::keysExact(BuiltSampler* out) const {
     const auto& lead = lead_->keys();
     const size_t n = lead.size(), stride = cubic ? 9 : 3;
     out->times.resize(n);
-    out->values.resize(n * stride);
+    float* const values = out->SizeValues(n * stride);
     for (size_t k = 0; k < n; ++k) {
         out->times[k] = stored(lead[k].time);
     }
@@ -242,7 +240,7 @@ void SamplerBuilder::keysExact(BuiltSampler* out) const {
         if (c && cubic) {
             c->Slopes(&in, &leave);
         }
-        float* v = out->values.data() + (cubic ? 3 : 0) + a;
+        float* v = values + (cubic ? 3 : 0) + a;
         for (size_t k = 0; k < n; ++k, v += stride) {
             v[0] = stored(c ? c->keys()[k].value : rest_[a]);
             if (cubic) {
@@ -270,8 +268,7 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     }
     const size_t n = times.size();
     out->times.resize(n);
-    out->values.resize(n * 9);
-    float* v = out->values.data();
+    float* v = out->SizeValues(n * 9);
     for (size_t k = 0; k < n; ++k, v += 9) {
         out->times[k] = stored(times[k]);
         for (int a = 0; a < 3; ++a) {

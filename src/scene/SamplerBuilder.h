@@ -6,12 +6,21 @@
 class ChannelCurve;
 
 // One glTF animation sampler as it is written: key times in seconds and, per key, `width`
-// floats (three times as many for CUBICSPLINE: in-tangent, value, out-tangent).
+// floats (three times as many for CUBICSPLINE: in-tangent, value, out-tangent). The values are
+// held as bytes, so that a store can hand them to a buffer of the file without a copy.
 struct BuiltSampler {
     std::string interpolation = "LINEAR";
     std::vector<float> times;
-    std::vector<float> values;
+    std::vector<unsigned char> valueBytes;
     int width = 3;
+
+    // Makes room for `count` values and returns where they go.
+    float* SizeValues(size_t count) {
+        valueBytes.resize(count * sizeof(float));
+        return reinterpret_cast<float*>(valueBytes.data());
+    }
+    const float* Values() const { return reinterpret_cast<const float*>(valueBytes.data()); }
+    size_t ValueCount() const { return valueBytes.size() / sizeof(float); }
 };
 
 // Builds the sampler of one node path (translation, rotation or scale) from the key curves of

@@ -20,6 +20,9 @@ const char* const kPaths[3] = {"translation", "rotation", "scale"};
 // thread: below it, starting a thread costs more than it saves.
 constexpr size_t kKeysPerThread = 20000;
 constexpr size_t kMaxHelperThreads = 7;
+// Marks the buffers that each hold one path's values after a .glb store (see appendSamplers);
+// never written to a file.
+const char* const kPathBufferName = "chirrup path values";
 
 int path_index(const std::string& path) {
     for (int p = 0; p < 3; ++p) {
@@ -43,12 +46,14 @@ bool SceneWriter::Write(const std::string& path, std::string* error) {
     if (!targets.empty()) {
         ModelCompactor compactor(m_);
         compactor.RemoveUnusedAccessors(removeOldChannels(&targets));
-        appendSamplers(&targets);
+        appendSamplers(&targets, SceneSerializer::IsBinaryPath(path));
         compactor.RemoveUnusedBuffers();
         doc_.ClearTouched();
     }
     bool join = false;
-    if (SceneSerializer::IsBinaryPath(path)) {
+    if (!SceneSerializer::IsBinaryPath(path)) {
+        joinPathBuffers();
+    } else {
         // Every buffer goes into the binary chunk: joined as the file is written where the
         // serialiser can (no copy of the bytes), else moved into buffer 0 first.
         ModelCompactor compactor(m_);
@@ -162,7 +167,43 @@ std::set<int> SceneWriter::removeOldChannels(std::vector<Target>* targets) {
     return freed;
 }
 
-void SceneWriter::appendSamplers(std::vector<Target>* targets) {
+void SceneWriter::joinPathBuffers() {
+    // A .gltf carries the animation bytes of a store as one embedded buffer: the key times and
+    // the buffers of single paths' values that a .glb store left are joined into the first.
+    int into = -1;
+    std::vector<size_t> base(m_.buffers.size(), 0);
+    std::vector<char> joined(m_.buffers.size(), 0);
+    for (size_t b = 0; b < m_.buffers.size(); ++b) {
+        tinygltf::Buffer& buffer = m_.buffers[b];
+        if (buffer.name != kPathBufferName) {
+            continue;
+        }
+        buffer.name.clear();
+        if (into < 0) {
+            into = int(b);
+            continue;
+        }
+        std::vector<unsigned char>& data = m_.buffers[size_t(into)].data;
+        base[b] = (data.size() + 3) & ~size_t(3);
+        data.resize(base[b], 0);
+        data.insert(data.end(), buffer.data.begin(), buffer.data.end());
+        buffer.data.clear();
+        buffer.data.shrink_to_fit();
+        joined[b] = 1;
+    }
+    if (into < 0) {
+        return;
+    }
+    for (tinygltf::BufferView& v : m_.bufferViews) {
+        if (v.buffer >= 0 && joined[size_t(v.buffer)]) {
+            v.byteOffset += base[size_t(v.buffer)];
+            v.buffer = into;
+        }
+    }
+    ModelCompactor(m_).RemoveUnusedBuffers();
+}
+
+void SceneWriter::appendSamplers(std::vector<Target>* targets, bool binary) {
     bool any = false;
     for (Target& t : *targets) {
         if (t.sampler.times.empty()) {
@@ -191,15 +232,25 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets) {
             buffer_ = int(m_.buffers.size());
             m_.buffers.emplace_back();
         }
+        // For a .glb, each path's values become a buffer of their own, taken over without a
+        // copy and joined only as the file is written; the key times stay together here.
+        const bool pathBuffers = binary && buffer_ > 0;
         size_t bytes = 0;
         for (const Target& t : *targets) {
-            bytes += (t.sampler.times.size() + t.sampler.values.size()) * sizeof(float);
+            bytes += t.sampler.times.size() * sizeof(float) +
+                     (pathBuffers ? 0 : t.sampler.valueBytes.size());
         }
+        m_.buffers.reserve(m_.buffers.size() + (pathBuffers ? targets->size() : 0));
+        if (pathBuffers) {
+            m_.buffers[size_t(buffer_)].name = kPathBufferName;  // joined with them for a .gltf
+        }
+        m_.bufferViews.reserve(m_.bufferViews.size() + 1 + targets->size());
         std::vector<unsigned char>& data = m_.buffers[size_t(buffer_)].data;
         data.reserve(((data.size() + 3) & ~size_t(3)) + bytes);
         data.resize((data.size() + 3) & ~size_t(3), 0);
         view_ = int(m_.bufferViews.size());
         viewStart_ = data.size();
+        m_.bufferViews.emplace_back();  // filled in once its bytes are all there
         m_.accessors.reserve(m_.accessors.size() + 2 * targets->size());
         // Samplers with the same key times (the paths one keyset drives share them) share one
         // input accessor: found by a hash of the times, confirmed byte for byte.
@@ -224,12 +275,30 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets) {
                 }
             }
             if (sampler.input < 0) {
-                sampler.input = appendAccessor(s.times, TINYGLTF_TYPE_SCALAR, s.times.size(), true);
+                sampler.input = appendAccessor(s.times.data(), s.times.size(), TINYGLTF_TYPE_SCALAR,
+                                               s.times.size(), true);
                 inputs.emplace(hash, sampler.input);
             }
-            sampler.output =
-                appendAccessor(s.values, s.width == 4 ? TINYGLTF_TYPE_VEC4 : TINYGLTF_TYPE_VEC3,
-                               s.values.size() / size_t(s.width), false);
+            const int type = s.width == 4 ? TINYGLTF_TYPE_VEC4 : TINYGLTF_TYPE_VEC3;
+            const size_t count = s.ValueCount() / size_t(s.width);
+            if (pathBuffers) {
+                tinygltf::BufferView view;
+                view.buffer = int(m_.buffers.size());
+                view.byteLength = t.sampler.valueBytes.size();
+                tinygltf::Accessor a;
+                a.bufferView = int(m_.bufferViews.size());
+                a.componentType = TINYGLTF_COMPONENT_TYPE_FLOAT;
+                a.type = type;
+                a.count = count;
+                m_.buffers.emplace_back();
+                m_.buffers.back().name = kPathBufferName;
+                m_.buffers.back().data = std::move(t.sampler.valueBytes);
+                m_.bufferViews.push_back(view);
+                m_.accessors.push_back(std::move(a));
+                sampler.output = int(m_.accessors.size()) - 1;
+            } else {
+                sampler.output = appendAccessor(s.Values(), s.ValueCount(), type, count, false);
+            }
             sampler.interpolation = s.interpolation;
             tinygltf::Animation& anim = m_.animations[size_t(t.clip)];
             tinygltf::AnimationChannel channel;
@@ -240,11 +309,10 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets) {
             anim.channels.push_back(channel);
             t.sampler = BuiltSampler();  // its bytes are in the buffer now
         }
-        tinygltf::BufferView view;
+        tinygltf::BufferView& view = m_.bufferViews[size_t(view_)];
         view.buffer = buffer_;
         view.byteOffset = viewStart_;
-        view.byteLength = data.size() - viewStart_;
-        m_.bufferViews.push_back(view);
+        view.byteLength = m_.buffers[size_t(buffer_)].data.size() - viewStart_;
     }
     // A clip left without channels is no longer a valid animation.
     m_.animations.erase(
@@ -267,7 +335,7 @@ void SceneWriter::makeNodeTrs(int node) {
     n.scale.assign(s.begin(), s.end());
 }
 
-int SceneWriter::appendAccessor(const std::vector<float>& values, int type, size_t count,
+int SceneWriter::appendAccessor(const float* values, size_t floats, int type, size_t count,
                                 bool withMinMax) {
     std::vector<unsigned char>& data = m_.buffers[size_t(buffer_)].data;
     tinygltf::Accessor a;
@@ -276,13 +344,13 @@ int SceneWriter::appendAccessor(const std::vector<float>& values, int type, size
     a.componentType = TINYGLTF_COMPONENT_TYPE_FLOAT;
     a.type = type;
     a.count = count;
-    if (withMinMax && !values.empty()) {
-        auto mm = std::minmax_element(values.begin(), values.end());
+    if (withMinMax && floats > 0) {
+        auto mm = std::minmax_element(values, values + floats);
         a.minValues = {double(*mm.first) + 0.0};
         a.maxValues = {double(*mm.second) + 0.0};
     }
-    const unsigned char* bytes = reinterpret_cast<const unsigned char*>(values.data());
-    data.insert(data.end(), bytes, bytes + values.size() * sizeof(float));
+    const unsigned char* bytes = reinterpret_cast<const unsigned char*>(values);
+    data.insert(data.end(), bytes, bytes + floats * sizeof(float));
     m_.accessors.push_back(std::move(a));
     return int(m_.accessors.size()) - 1;
 }

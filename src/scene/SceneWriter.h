@@ -50,10 +50,14 @@ class SceneWriter {
     // Removes every channel on a rewritten path from every clip, choosing each path's clip
     // first; returns the accessors of the samplers that nothing uses any more.
     std::set<int> removeOldChannels(std::vector<Target>* targets);
-    void appendSamplers(std::vector<Target>* targets);
-    // Appends `values` to the new bytes' buffer (already reserved) as a float accessor of the
-    // new view.
-    int appendAccessor(const std::vector<float>& values, int type, size_t count, bool withMinMax);
+    // Appends the built samplers; for a `binary` file each path's values go into a buffer of
+    // their own (joined as the file is written).
+    void appendSamplers(std::vector<Target>* targets, bool binary);
+    // Joins the buffers of single paths' values into one (before writing a .gltf).
+    void joinPathBuffers();
+    // Appends `floats` values to the new bytes' buffer (already reserved) as a float accessor of
+    // the new view.
+    int appendAccessor(const float* values, size_t floats, int type, size_t count, bool withMinMax);
     void makeNodeTrs(int node);
 
     SceneDocument& doc_;

@@ -359,6 +359,45 @@ TEST_F(SceneWriterTest, AGlbHoldsEveryBufferAndImageInItsBinaryChunk) {
     ExpectValidGltf(out);
 }
 
+// The same open scene stored as .glb, again as .glb with other keys, then as .gltf with only
+// one node driven anew: each file is valid and holds the last applied values, a .glb one buffer,
+// and the .gltf the scene's own buffer, one with what the second store wrote for the nodes not
+// driven again, and one with the last store's bytes.
+TEST_F(SceneWriterTest, StoresInTurnKeepOneBufferForTheNewAnimation) {
+    ModelBuilder b;
+    for (const char* name : {"a", "b", "c"}) {
+        b.Node(name);
+    }
+    b.Channel(0, b.Node("d"), "scale", {0, 1}, {1, 1, 1, 2, 2, 2});  // the scene's own bytes
+    Open(b);
+    const size_t buffersRead = scene.source->document()->model().buffers.size();
+    const char* names[] = {"a", "b", "c"};
+    int last[3] = {0, 0, 0};  // the pass whose keys each node holds
+    for (int pass = 0; pass < 3; ++pass) {
+        for (int n = 0; n < (pass < 2 ? 3 : 1); ++n) {
+            Node node = scene.Fetch(names[n]);
+            for (int channel : {0, 1, 5}) {
+                ASSERT_EQ(StoreKeys(node.get(), channel,
+                                    {{0, float(pass + n), 0, 0},
+                                     {3000, float(pass + n + channel), 0, 2},
+                                     {6000, 1, 2, 0}}),
+                          1);
+            }
+            last[n] = pass;
+        }
+        auto back = StoreAndRead(pass < 2 ? "out.glb" : "out.gltf");
+        ASSERT_TRUE(back);
+        ExpectValidGltf(out);
+        EXPECT_EQ(back->model().buffers.size(), pass < 2 ? 1u : buffersRead + 2) << "pass " << pass;
+        for (int n = 0; n < 3; ++n) {
+            for (int channel : {0, 1, 5}) {
+                EXPECT_NEAR(back->Curve(n, channel)->Evaluate(0.5), last[n] + n + channel, 1e-3)
+                    << "pass " << pass << " node " << n << " channel " << channel;
+            }
+        }
+    }
+}
+
 // Keys before time 0 are cut off: the curve starts at 0 with its value there. No time or
 // minimum is written as -0.
 TEST_F(SceneWriterTest, CurvesStartAtZeroWithoutNegativeZeros) {
