@@ -387,17 +387,6 @@ size_t ChannelCurve::TrimBefore(double seconds) {
     return first;
 }
 
-ChannelCurve::Kind ChannelCurve::KindFromCode(int code) {
-    switch (code) {
-        case KLWire::kSmooth:
-            return kSmooth;
-        case KLWire::kFlat:
-            return kFlat;
-        default:
-            return kLinear;
-    }
-}
-
 bool ChannelCurve::FromApplyArrays(int count, const CueTime* times, const float* values,
                                    const int* inTangents, const int* outTangents,
                                    std::vector<Key>* keys) {

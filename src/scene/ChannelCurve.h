@@ -74,7 +74,9 @@ class ChannelCurve : public OrChannel {
     size_t TrimBefore(double seconds);
 
     // The curve kind of a scene tangent code (KLWire::Tangent); unknown codes are linear.
-    static Kind KindFromCode(int code);
+    static Kind KindFromCode(int code) {
+        return code == KLWire::kSmooth ? kSmooth : (code == KLWire::kFlat ? kFlat : kLinear);
+    }
     // The keys of `count` apply keys (times in ticks, values, tangent codes; null code arrays
     // mean linear), in time order; of two keys at one time the later given comes last. Null
     // when a value is not finite. KLWire::StoreChannel stores exactly these keys, and the
