@@ -21,8 +21,9 @@ const char* const kPaths[3] = {"translation", "rotation", "scale"};
 constexpr size_t kKeysPerThread = 20000;
 constexpr size_t kMaxHelperThreads = 7;
 // Marks the buffers that each hold one path's values after a .glb store (see appendSamplers);
-// never written to a file.
-const char* const kPathBufferName = "chirrup path values";
+// never written to a file. It starts with a control character, which no name a scene file
+// gives a buffer is likely to hold.
+const char* const kPathBufferName = "\x01chirrup path values";
 
 int path_index(const std::string& path) {
     for (int p = 0; p < 3; ++p) {
