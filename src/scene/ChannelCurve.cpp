@@ -55,6 +55,86 @@ double ChannelCurve::InSlope(size_t i) const {
     return 0.0;
 }
 
+void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) const {
+    const size_t n = keys_.size();
+    in->resize(n);
+    out->resize(n);
+    double before = 0.0;  // the slope of the segment arriving at key i
+    for (size_t i = 0; i < n; ++i) {
+        const Key& k = keys_[i];
+        // As segmentSlope(i) and smoothSlope(i), written out so that they are inlined.
+        double after = 0.0;
+        if (i + 1 < n) {
+            const double dt = keys_[i + 1].time - k.time;
+            after = dt > 0 ? (keys_[i + 1].value - k.value) / dt : 0.0;
+        }
+        double smooth = 0.0;
+        if ((k.in == kSmooth || k.out == kSmooth) && n >= 2) {
+            const Key& lo = keys_[i == 0 ? 0 : i - 1];
+            const Key& hi = keys_[i + 1 < n ? i + 1 : n - 1];
+            const double dt = hi.time - lo.time;
+            smooth = dt > 0 ? (hi.value - lo.value) / dt : 0.0;
+        }
+        switch (k.in) {
+            case kSmooth:
+                (*in)[i] = smooth;
+                break;
+            case kLinear:
+                (*in)[i] = before;
+                break;
+            case kExplicit:
+                (*in)[i] = k.inSlope;
+                break;
+            case kFlat:
+            case kStep:
+                (*in)[i] = 0.0;
+                break;
+        }
+        switch (k.out) {
+            case kSmooth:
+                (*out)[i] = smooth;
+                break;
+            case kLinear:
+                (*out)[i] = after;
+                break;
+            case kExplicit:
+                (*out)[i] = k.outSlope;
+                break;
+            case kFlat:
+            case kStep:
+                (*out)[i] = 0.0;
+                break;
+        }
+        before = after;
+    }
+}
+
+double ChannelCurve::MaxSlope() const {
+    std::vector<double> in, out;
+    Slopes(&in, &out);
+    double most = 0;
+    for (size_t i = 0; i + 1 < keys_.size(); ++i) {
+        if (keys_[i].out == kStep) {
+            continue;
+        }
+        // The segment's cubic in u = 0..1: its slope m0 + 2bu + 3au^2 peaks at an end or at
+        // u = -b / 3a.
+        const double dt = keys_[i + 1].time - keys_[i].time;
+        const double m0 = out[i] * dt, m1 = in[i + 1] * dt,
+                     dv = keys_[i + 1].value - keys_[i].value;
+        const double b = 3 * dv - 2 * m0 - m1, a = -2 * dv + m0 + m1;
+        double peak = std::max(std::fabs(m0), std::fabs(m1));
+        const double u = a != 0 ? -b / (3 * a) : -1;
+        if (u > 0 && u < 1) {
+            peak = std::max(peak, std::fabs(m0 + 2 * b * u + 3 * a * u * u));
+        }
+        if (dt > 0) {
+            most = std::max(most, peak / dt);
+        }
+    }
+    return most;
+}
+
 double ChannelCurve::Evaluate(double seconds) const {
     if (keys_.empty()) {
         return 0.0;
@@ -307,17 +387,6 @@ size_t ChannelCurve::TrimBefore(double seconds) {
     return first;
 }
 
-ChannelCurve::Kind ChannelCurve::KindFromCode(int code) {
-    switch (code) {
-        case KLWire::kSmooth:
-            return kSmooth;
-        case KLWire::kFlat:
-            return kFlat;
-        default:
-            return kLinear;
-    }
-}
-
 bool ChannelCurve::FromApplyArrays(int count, const CueTime* times, const float* values,
                                    const int* inTangents, const int* outTangents,
                                    std::vector<Key>* keys) {
@@ -325,18 +394,19 @@ bool ChannelCurve::FromApplyArrays(int count, const CueTime* times, const float*
     if (count < 0 || (count > 0 && (!times || !values))) {
         return false;
     }
-    keys->reserve(size_t(count));
     for (int i = 0; i < count; ++i) {
         if (!std::isfinite(values[i])) {
-            keys->clear();
             return false;
         }
-        Key k;
-        k.time = times[i].Seconds();
-        k.value = values[i];
-        k.in = KindFromCode(inTangents ? inTangents[i] : KLWire::kLinear);
-        k.out = KindFromCode(outTangents ? outTangents[i] : KLWire::kLinear);
-        keys->push_back(k);
+    }
+    // Filled in place, field by field: a curve of thousands of keys is written once.
+    keys->resize(size_t(count));
+    Key* k = keys->data();
+    for (int i = 0; i < count; ++i, ++k) {
+        k->time = times[i].Seconds();
+        k->value = values[i];
+        k->in = KindFromCode(inTangents ? inTangents[i] : KLWire::kLinear);
+        k->out = KindFromCode(outTangents ? outTangents[i] : KLWire::kLinear);
     }
     // Apply gives its keys in time order: sorting (which allocates) only when they are not.
     auto earlier = [](const Key& a, const Key& b) { return a.time < b.time; };

@@ -48,6 +48,10 @@ class ChannelCurve : public OrChannel {
     // (in), resolved from the tangent kinds; a step leaves with slope 0.
     double OutSlope(size_t i) const;
     double InSlope(size_t i) const;
+    // InSlope and OutSlope of every key, in one pass (each segment's slope worked out once).
+    void Slopes(std::vector<double>* in, std::vector<double>* out) const;
+    // A bound on the size of the curve's slope anywhere (units per second).
+    double MaxSlope() const;
     // The curve's derivative (units per second) at `seconds`, from the right (`outgoing`) or
     // from the left; zero where the curve holds, and at a step.
     double SlopeAt(double seconds, bool outgoing) const;
@@ -70,7 +74,9 @@ class ChannelCurve : public OrChannel {
     size_t TrimBefore(double seconds);
 
     // The curve kind of a scene tangent code (KLWire::Tangent); unknown codes are linear.
-    static Kind KindFromCode(int code);
+    static Kind KindFromCode(int code) {
+        return code == KLWire::kSmooth ? kSmooth : (code == KLWire::kFlat ? kFlat : kLinear);
+    }
     // The keys of `count` apply keys (times in ticks, values, tangent codes; null code arrays
     // mean linear), in time order; of two keys at one time the later given comes last. Null
     // when a value is not finite. KLWire::StoreChannel stores exactly these keys, and the

@@ -5,6 +5,8 @@
 
 #include "scene/ChannelCurve.h"
 #include "scene/EulerRotation.h"
+#include "scene/SampleReducer.h"
+#include "scene/TurnSpline.h"
 
 namespace {
 // Stored floats: a negative zero is written as zero.
@@ -12,103 +14,13 @@ float stored(double v) {
     return float(v) + 0.0f;
 }
 
-// Few of the points 0..n-1 (first and last always among them) such that every point between
-// two kept ones fits the straight piece between them: `piece_fits(i, j)` says whether every
-// point strictly between i and j lies within tolerance of the piece from i to j. Each piece is
-// grown by doubling and then narrowed by bisection, so the cost is about n log n point checks
-// for long pieces, and one check per point where no point can be left out.
-template <class PieceFits>
-std::vector<size_t> reduce(size_t n, const PieceFits& piece_fits) {
-    std::vector<size_t> kept;
-    if (n == 0) {
-        return kept;
-    }
-    size_t i = 0;
-    kept.push_back(0);
-    while (i + 1 < n) {
-        size_t good = i + 1, step = 2;
-        size_t bad = n;  // first end known not to fit (n: none)
-        while (true) {
-            size_t j = std::min(n - 1, i + step);
-            if (j == good) {
-                break;
-            }
-            if (piece_fits(i, j)) {
-                good = j;
-                if (j == n - 1) {
-                    break;
-                }
-                step *= 2;
-            } else {
-                bad = j;
-                break;
-            }
-        }
-        while (bad < n && bad - good > 1) {
-            size_t mid = good + (bad - good) / 2;
-            if (piece_fits(i, mid)) {
-                good = mid;
-            } else {
-                bad = mid;
-            }
-        }
-        kept.push_back(good);
-        i = good;
-    }
-    return kept;
-}
-// Whether values[k] for i < k < j lie within `tolerance` of the straight line from i to j.
-bool line_fits(const std::vector<double>& times, const std::vector<double>& values, size_t i,
-               size_t j, double tolerance) {
-    double t0 = times[i], v0 = values[i];
-    double slope = (values[j] - v0) / (times[j] - t0);
-    for (size_t k = i + 1; k < j; ++k) {
-        if (std::fabs(v0 + slope * (times[k] - t0) - values[k]) > tolerance) {
-            return false;
-        }
-    }
-    return true;
-}
-
-// Whether q[k] for i < k < j lies within `chord` (the chord between unit quaternions of the
-// tolerance angle) of the spherical interpolation from q[i] to q[j], as players interpolate.
-bool slerp_fits(const std::vector<double>& times, const std::vector<EulerRotation::Quat>& q,
-                size_t i, size_t j, double chord) {
-    const EulerRotation::Quat& a = q[i];
-    const EulerRotation::Quat& b = q[j];
-    double dot = a[0] * b[0] + a[1] * b[1] + a[2] * b[2] + a[3] * b[3];
-    double sign = dot < 0 ? -1.0 : 1.0;
-    dot *= sign;
-    // Between quaternions less than 0.01 radians apart the normalised straight line misses the
-    // spherical one by under 1e-5 degrees, far inside the margin: no sines needed.
-    double angle = dot < 0.99995 ? std::acos(dot) : 0.0, s = angle > 0 ? std::sin(angle) : 0.0;
-    double limit = chord * chord;
-    for (size_t k = i + 1; k < j; ++k) {
-        double u = (times[k] - times[i]) / (times[j] - times[i]);
-        double wa = 1 - u, wb = u;
-        if (angle > 0) {
-            wa = std::sin((1 - u) * angle) / s;
-            wb = std::sin(u * angle) / s;
-        }
-        EulerRotation::Quat m;
-        double n = 0;
-        for (size_t c = 0; c < 4; ++c) {
-            m[c] = wa * a[c] + wb * sign * b[c];
-            n += m[c] * m[c];
-        }
-        n = 1 / std::sqrt(n);
-        double same = 0, opposite = 0;
-        for (size_t c = 0; c < 4; ++c) {
-            double x = m[c] * n;
-            same += (x - q[k][c]) * (x - q[k][c]);
-            opposite += (x + q[k][c]) * (x + q[k][c]);
-        }
-        if (std::min(same, opposite) > limit) {
-            return false;
-        }
-    }
-    return true;
-}
+// The share of a tolerance that the choice of samples may use; the rest is left for the
+// rounding of what is stored as floats (a quaternion moves by about 1e-5 degrees, a value by
+// one float step) and of the player's interpolation.
+constexpr double kFitShare = 0.9;
+// The largest share of the tolerance that float times may move a sample by before samples are
+// valued at their stored times.
+constexpr double kDriftShare = 0.25;
 }  // namespace
 
 SamplerBuilder::SamplerBuilder(const ChannelCurve* const curves[3], const double rest[3], int fps)
@@ -180,24 +92,30 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
         unionCubic(out);
         return true;
     }
-    std::vector<double> times, axis[3];
-    if (!sampleCandidates(&times, axis, HUGE_VAL, why)) {
+    std::vector<double> times, axis[3], atStored[3];
+    double drift = 0;
+    bool ownTimes = false;
+    if (!sampleCandidates(&times, axis, atStored, HUGE_VAL, kVectorTolerance, false, &drift,
+                          &ownTimes, why)) {
         return false;
     }
     // An axis without a curve holds its rest value (its samples are not filled in).
-    auto fits = [&](size_t i, size_t j) {
-        for (int a = 0; a < 3; ++a) {
-            if (!axis[a].empty() && !line_fits(times, axis[a], i, j, kVectorTolerance * 0.5)) {
-                return false;
-            }
+    std::vector<const std::vector<double>*> moving, ends;
+    for (int a = 0; a < 3; ++a) {
+        if (!axis[a].empty()) {
+            moving.push_back(&axis[a]);
+            ends.push_back(&atStored[a]);
         }
-        return true;
-    };
+    }
+    std::vector<size_t> kept = SampleReducer(times, kVectorTolerance * kFitShare - drift)
+                                   .Lines(moving, ends, true, HUGE_VAL);
     out->interpolation = "LINEAR";
-    for (size_t k : reduce(times.size(), fits)) {
+    out->times.reserve(kept.size());
+    float* v = out->SizeValues(kept.size() * 3);
+    for (size_t k : kept) {
         out->times.push_back(stored(times[k]));
         for (int a = 0; a < 3; ++a) {
-            out->values.push_back(stored(axis[a].empty() ? rest_[a] : axis[a][k]));
+            *v++ = stored(axis[a].empty() ? rest_[a] : atStored[a][k]);
         }
     }
     return true;
@@ -216,16 +134,24 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
             ++movingAxes;
         }
     }
+    if (movingAxes == 1 &&
+        TurnSpline(*curves_[moving], moving, rest_)
+            .Build(kRotationToleranceDegrees * kFitShare, kMaxSampledFrames, out)) {
+        return true;  // cubic pieces at the turning axis's keys
+    }
     // With one turning axis a straight span of it is followed exactly (see below), as long as
     // it turns by less than half a turn, which a piece would go the other way round.
-    std::vector<double> times, axis[3];
-    if (!sampleCandidates(&times, axis, movingAxes <= 1 ? 90.0 : 0.0, why)) {
+    std::vector<double> times, axis[3], atStored[3];
+    double drift = 0;
+    bool ownTimes = false;
+    if (!sampleCandidates(&times, axis, atStored, movingAxes <= 1 ? 90.0 : 0.0,
+                          kRotationToleranceDegrees, true, &drift, &ownTimes, why)) {
         return false;
     }
     // An axis without a curve holds its rest value (its samples are not filled in).
     auto angle = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : axis[a][k]; };
-    // Float storage moves a quaternion by about 1e-5 degrees: well inside the margin.
-    const double tolerance = kRotationToleranceDegrees * 0.5;
+    auto end = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : atStored[a][k]; };
+    const SampleReducer reducer(times, kRotationToleranceDegrees * kFitShare - drift);
     const double halfRadians = 3.14159265358979323846 / 360;
     out->interpolation = "LINEAR";
     if (movingAxes <= 1) {
@@ -235,11 +161,9 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
         int a = moving < 0 ? 0 : moving;
         if (axis[a].empty()) {
             axis[a].assign(times.size(), rest_[a]);
+            atStored[a] = axis[a];
         }
-        std::vector<size_t> kept = reduce(times.size(), [&](size_t i, size_t j) {
-            return std::fabs(axis[a][j] - axis[a][i]) < 180 &&
-                   line_fits(times, axis[a], i, j, tolerance);
-        });
+        std::vector<size_t> kept = reducer.Lines({&axis[a]}, {&atStored[a]}, false, 180);
         // The fixed axes' half-angle sines and cosines once; only the turning one per sample,
         // written straight out, each on the hemisphere of the one before (players take the
         // shortest way round).
@@ -249,13 +173,12 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
             sn[b] = std::sin(angle(b, 0) * halfRadians);
         }
         out->times.resize(kept.size());
-        out->values.resize(kept.size() * 4);
-        float* v = out->values.data();
+        float* v = out->SizeValues(kept.size() * 4);
         double previous[4] = {0, 0, 0, 1};
         for (size_t n = 0; n < kept.size(); ++n, v += 4) {
             const size_t k = kept[n];
-            c[a] = std::cos(axis[a][k] * halfRadians);
-            sn[a] = std::sin(axis[a][k] * halfRadians);
+            c[a] = std::cos(atStored[a][k] * halfRadians);
+            sn[a] = std::sin(atStored[a][k] * halfRadians);
             // qz * qy * qx, as EulerRotation::ToQuaternion
             double q[4] = {sn[0] * c[1] * c[2] - c[0] * sn[1] * sn[2],
                            c[0] * sn[1] * c[2] + sn[0] * c[1] * sn[2],
@@ -274,20 +197,18 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
         }
         return true;
     }
-    std::vector<EulerRotation::Quat> q(times.size());
+    std::vector<EulerRotation::Quat> q(times.size()), ends(times.size());
     for (size_t k = 0; k < times.size(); ++k) {
         q[k] = EulerRotation::ToQuaternion({angle(0, k), angle(1, k), angle(2, k)});
+        ends[k] = ownTimes ? q[k] : EulerRotation::ToQuaternion({end(0, k), end(1, k), end(2, k)});
     }
-    const double chord = 2 * std::sin(tolerance * 3.14159265358979323846 / 180 / 4);
-    std::vector<size_t> kept =
-        reduce(times.size(), [&](size_t i, size_t j) { return slerp_fits(times, q, i, j, chord); });
+    std::vector<size_t> kept = reducer.Slerps(q, ends);
     out->times.resize(kept.size());
-    out->values.resize(kept.size() * 4);
-    float* v = out->values.data();
+    float* v = out->SizeValues(kept.size() * 4);
     EulerRotation::Quat previous = {0, 0, 0, 1};
     for (size_t n = 0; n < kept.size(); ++n, v += 4) {
         // Each sample on the hemisphere of the one before: players take the shortest way round.
-        EulerRotation::Quat r = q[kept[n]];
+        EulerRotation::Quat r = ends[kept[n]];
         if (n > 0 &&
             r[0] * previous[0] + r[1] * previous[1] + r[2] * previous[2] + r[3] * previous[3] < 0) {
             for (double& x : r) {
@@ -308,19 +229,23 @@ void SamplerBuilder::keysExact(BuiltSampler* out) const {
     const auto& lead = lead_->keys();
     const size_t n = lead.size(), stride = cubic ? 9 : 3;
     out->times.resize(n);
-    out->values.resize(n * stride);
+    float* const values = out->SizeValues(n * stride);
     for (size_t k = 0; k < n; ++k) {
         out->times[k] = stored(lead[k].time);
     }
     // Axis by axis into the interleaved values: in-tangents, values, out-tangents of each key.
+    std::vector<double> in, leave;
     for (int a = 0; a < 3; ++a) {
         const ChannelCurve* c = curves_[a];
-        float* v = out->values.data() + (cubic ? 3 : 0) + a;
+        if (c && cubic) {
+            c->Slopes(&in, &leave);
+        }
+        float* v = values + (cubic ? 3 : 0) + a;
         for (size_t k = 0; k < n; ++k, v += stride) {
             v[0] = stored(c ? c->keys()[k].value : rest_[a]);
             if (cubic) {
-                v[-3] = c ? stored(c->InSlope(k)) : 0.0f;
-                v[3] = c ? stored(c->OutSlope(k)) : 0.0f;
+                v[-3] = c ? stored(in[k]) : 0.0f;
+                v[3] = c ? stored(leave[k]) : 0.0f;
             }
         }
     }
@@ -343,8 +268,7 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     }
     const size_t n = times.size();
     out->times.resize(n);
-    out->values.resize(n * 9);
-    float* v = out->values.data();
+    float* v = out->SizeValues(n * 9);
     for (size_t k = 0; k < n; ++k, v += 9) {
         out->times[k] = stored(times[k]);
         for (int a = 0; a < 3; ++a) {
@@ -445,11 +369,36 @@ bool SamplerBuilder::candidateTimes(std::vector<double>* out, double straightUpT
 }
 
 bool SamplerBuilder::sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
-                                      double straightUpTo, std::string* why) const {
+                                      std::vector<double> atStored[3], double straightUpTo,
+                                      double tolerance, bool sumAxes, double* drift, bool* ownTimes,
+                                      std::string* why) const {
     if (!candidateTimes(times, straightUpTo, why)) {
         return false;
     }
     evaluate(*times, axis);
+    // A written sample sits at its time as a float, up to half a float step from its own: its
+    // value is the curve's there. Where the curves cannot move by more than a small part of the
+    // tolerance in that step, the samples keep the values at their own times and the pieces are
+    // fitted within the tolerance less that part.
+    *drift = 0;
+    const double halfStep = (times->empty() ? 0.0 : std::fabs(times->back())) / (1 << 24);
+    for (int a = 0; a < 3; ++a) {
+        const double moved = axis[a].empty() ? 0.0 : curves_[a]->MaxSlope() * halfStep;
+        *drift = sumAxes ? *drift + moved : std::max(*drift, moved);
+    }
+    *ownTimes = *drift <= tolerance * kDriftShare;
+    if (*ownTimes) {
+        for (int a = 0; a < 3; ++a) {
+            atStored[a] = axis[a];
+        }
+        return true;
+    }
+    *drift = 0;
+    std::vector<double> storedTimes(times->size());
+    for (size_t k = 0; k < times->size(); ++k) {
+        storedTimes[k] = double(float((*times)[k]));
+    }
+    evaluate(storedTimes, atStored);
     return true;
 }
 

@@ -6,12 +6,21 @@
 class ChannelCurve;
 
 // One glTF animation sampler as it is written: key times in seconds and, per key, `width`
-// floats (three times as many for CUBICSPLINE: in-tangent, value, out-tangent).
+// floats (three times as many for CUBICSPLINE: in-tangent, value, out-tangent). The values are
+// held as bytes, so that a store can hand them to a buffer of the file without a copy.
 struct BuiltSampler {
     std::string interpolation = "LINEAR";
     std::vector<float> times;
-    std::vector<float> values;
+    std::vector<unsigned char> valueBytes;
     int width = 3;
+
+    // Makes room for `count` values and returns where they go.
+    float* SizeValues(size_t count) {
+        valueBytes.resize(count * sizeof(float));
+        return reinterpret_cast<float*>(valueBytes.data());
+    }
+    const float* Values() const { return reinterpret_cast<const float*>(valueBytes.data()); }
+    size_t ValueCount() const { return valueBytes.size() / sizeof(float); }
 };
 
 // Builds the sampler of one node path (translation, rotation or scale) from the key curves of
@@ -22,13 +31,18 @@ struct BuiltSampler {
 //     CUBICSPLINE with the keys' slopes (exact);
 //   - translation or scale whose axes are keyed at different times, without steps: CUBICSPLINE
 //     at the union of the key times, each piece cut from the axis's own cubic (exact);
-//   - rotation, and translation or scale mixing steps with axes keyed at different times:
-//     LINEAR samples taken from the keys and the whole frames between them, reduced to the
-//     fewest that keep the written curve within kVectorTolerance (units) or
-//     kRotationToleranceDegrees (the angle between the rotations) of the evaluated curve at
-//     every key and every frame. Spans where every axis holds still, or where the moving axes
-//     run in straight lines that the pieces follow exactly (translation and scale; a rotation
-//     turning about one axis by less than a quarter turn), get no samples inside.
+//   - rotation turning about one axis between fixed ones, without steps: CUBICSPLINE
+//     quaternions at that axis's keys, a piece cut into equal parts where a bound on its error
+//     exceeds kRotationToleranceDegrees (see TurnSpline);
+//   - any other rotation (and a turn that steps, or that float times would move too far), and
+//     translation or scale mixing steps with axes keyed at different times: LINEAR samples
+//     taken from the keys and the whole frames between them, reduced to few that keep the
+//     written curve within kVectorTolerance (units) or kRotationToleranceDegrees (the angle
+//     between the rotations) of the evaluated curve at every key and every frame, with the
+//     pieces running between the samples' stored (float) times. Spans where every axis holds
+//     still, or where the moving axes run in straight lines that the pieces follow exactly
+//     (translation and scale; a rotation turning about one axis by less than a quarter turn),
+//     get no samples inside.
 // A curve is never sampled before its first or after its last key; one whose keys would make it
 // need more than kMaxSampledFrames frames sampled is refused.
 class SamplerBuilder {
@@ -60,10 +74,15 @@ class SamplerBuilder {
     // samples inside: every axis holds still across it or runs in a straight line that changes
     // by less than `straightUpTo` (0 where the written pieces do not follow straight lines).
     std::vector<char> plainSpans(const std::vector<double>& keys, double straightUpTo) const;
-    // The candidate times and each animated axis's value at each of them (an axis without a
-    // curve is left empty: it holds its rest value).
+    // The candidate times and each animated axis's value at each of them, and at each of them
+    // rounded to a float as it is stored (an axis without a curve is left empty: it holds its
+    // rest value). When float times can move a sample by at most a quarter of `tolerance` (the
+    // axes' movements summed with `sumAxes`, else the largest), the samples keep the values at
+    // their own times (`ownTimes`, `atStored` a copy of `axis`) and `drift` is that movement,
+    // which the pieces must leave room for; otherwise `drift` is 0.
     bool sampleCandidates(std::vector<double>* times, std::vector<double> axis[3],
-                          double straightUpTo, std::string* why) const;
+                          std::vector<double> atStored[3], double straightUpTo, double tolerance,
+                          bool sumAxes, double* drift, bool* ownTimes, std::string* why) const;
     void evaluate(const std::vector<double>& times, std::vector<double> axis[3]) const;
 
     const ChannelCurve* curves_[3];

@@ -22,8 +22,10 @@ class SceneDocument;
 // without views. A path whose three channels were all removed ends up unanimated. Key times
 // before 0 never reach the file (the document cuts every set curve at 0). How each path's
 // sampler is written (exact keys, cubic pieces, or samples within a tolerance) is described at
-// SamplerBuilder. The new animation bytes go into a buffer of their own; samplers whose key times
-// are the same share one input accessor. A .glb is written with
+// SamplerBuilder. The new animation bytes go into a buffer of their own (for a .glb, in memory, the
+// key times in one and each path's values in another, taken over from the builder without a
+// copy; a later .gltf store joins them back into one); samplers whose key times are the same
+// share one input accessor. A .glb is written with
 // every buffer and every embedded image in its binary chunk. The document's model is updated in
 // place to hold what was written (for a .glb its buffers may still be separate in memory,
 // joined only in the file).
@@ -50,10 +52,14 @@ class SceneWriter {
     // Removes every channel on a rewritten path from every clip, choosing each path's clip
     // first; returns the accessors of the samplers that nothing uses any more.
     std::set<int> removeOldChannels(std::vector<Target>* targets);
-    void appendSamplers(std::vector<Target>* targets);
-    // Appends `values` to the new bytes' buffer (already reserved) as a float accessor of the
-    // new view.
-    int appendAccessor(const std::vector<float>& values, int type, size_t count, bool withMinMax);
+    // Appends the built samplers; for a `binary` file each path's values go into a buffer of
+    // their own (joined as the file is written).
+    void appendSamplers(std::vector<Target>* targets, bool binary);
+    // Joins the buffers of single paths' values into one (before writing a .gltf).
+    void joinPathBuffers();
+    // Appends `floats` values to the new bytes' buffer (already reserved) as a float accessor of
+    // the new view.
+    int appendAccessor(const float* values, size_t floats, int type, size_t count, bool withMinMax);
     void makeNodeTrs(int node);
 
     SceneDocument& doc_;

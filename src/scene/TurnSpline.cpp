@@ -1,0 +1,156 @@
+#include "scene/TurnSpline.h"
+
+#include <algorithm>
+#include <cmath>
+
+#include "scene/ChannelCurve.h"
+#include "scene/SamplerBuilder.h"
+
+namespace {
+constexpr double kPi = 3.14159265358979323846;
+constexpr double kHalfRadians = kPi / 360;          // half-angle radians per degree
+constexpr double kHalfFloatStep = 1.0 / (1 << 24);  // of a float, relative to its size
+constexpr double kBy384 = 1.0 / 384;
+constexpr double kRoot2 = 1.4142135623730951;
+
+// Stored floats: a negative zero is written as zero.
+float stored(double v) {
+    return float(v) + 0.0f;
+}
+}  // namespace
+
+TurnSpline::TurnSpline(const ChannelCurve& curve, int axis, const double angles[3])
+    : curve_(curve) {
+    double c[3], s[3];
+    for (int a = 0; a < 3; ++a) {
+        c[a] = std::cos(angles[a] * kHalfRadians);
+        s[a] = std::sin(angles[a] * kHalfRadians);
+    }
+    // qz * qy * qx, as EulerRotation::ToQuaternion, with the turning axis at half-angle 0 (P)
+    // and at a quarter turn (Q): each term holds that axis's cosine or sine once, so the
+    // rotation at half-angle h is cos(h) P + sin(h) Q.
+    for (int pass = 0; pass < 2; ++pass) {
+        c[axis] = pass ? 0 : 1;
+        s[axis] = pass ? 1 : 0;
+        double* r = pass ? q_ : p_;
+        r[0] = s[0] * c[1] * c[2] - c[0] * s[1] * s[2];
+        r[1] = c[0] * s[1] * c[2] + s[0] * c[1] * s[2];
+        r[2] = c[0] * c[1] * s[2] - s[0] * s[1] * c[2];
+        r[3] = c[0] * c[1] * c[2] + s[0] * s[1] * s[2];
+    }
+}
+
+int TurnSpline::partsFor(double t0, double t1, double p0, double p1, double m0, double m1,
+                         double allowedRadians) {
+    const double dt = t1 - t0;
+    const double b = 3 * (p1 - p0) - 2 * m0 - m1, a = 2 * (p0 - p1) + m0 + m1;
+    // Bounds on the first three derivatives (by u) of the half-angle over the piece.
+    double first = std::max(std::fabs(m0), std::fabs(m1));
+    if (b * (b + 3 * a) < 0) {
+        // The second derivative 2b + 6au changes sign inside: the first peaks there.
+        const double u = -b / (3 * a);
+        first = std::max(first, std::fabs(m0 + 2 * b * u + 3 * a * u * u));
+    }
+    const double second = std::max(std::fabs(2 * b), std::fabs(2 * b + 6 * a));
+    const double third = std::fabs(6 * a);
+    // The knots' times are floats: a piece may sit up to half a float step off at either end,
+    // moving what a player reads by the turning speed times that (and its tangents a little).
+    const double drift = std::max(std::fabs(t0), std::fabs(t1)) * kHalfFloatStep * 2.6 * first / dt;
+    for (int parts = 1; parts <= kMaxParts; ++parts) {
+        const double A = parts == 1 ? first : first / parts,
+                     B = parts == 1 ? second : second / (parts * parts),
+                     C = parts == 1 ? third : third / (parts * parts * parts);
+        // A cubic Hermite piece of z = exp(i h) misses by at most (du^4 / 384) |z''''| with
+        // z'''' = (h'^4 - 3h''^2 - 4h'h''' - 6i h'^2 h'') z; only the part across z turns the
+        // rotation (the rest is normalised away), and across z the real part is scaled by the
+        // sine of how far h moves over the piece (at most A).
+        const double across =
+            ((A * A * A * A + 3 * B * B + 4 * A * C) * A + 6 * A * A * B) * kBy384;
+        const double whole =
+            kRoot2 * (A * A * A * A + 6 * A * A * B + 3 * B * B + 4 * A * C) * kBy384;
+        // 2 (across / (1 - whole) + drift) <= allowedRadians, without dividing
+        if (whole < 0.5 && 2 * (across + drift * (1 - whole)) <= allowedRadians * (1 - whole)) {
+            return parts;
+        }
+    }
+    return 0;
+}
+
+bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) const {
+    const auto& keys = curve_.keys();
+    const size_t n = keys.size();
+    if (n < 2) {
+        return false;
+    }
+    const double allowed = toleranceDegrees * kPi / 180;
+    // Each key's slopes, in half-angle radians per second, and each piece's number of parts.
+    std::vector<double> in, leave;
+    std::vector<int> parts(n - 1);
+    size_t knots = 1;
+    curve_.Slopes(&in, &leave);
+    for (size_t i = 0; i < n; ++i) {
+        in[i] *= kHalfRadians;
+        leave[i] *= kHalfRadians;
+    }
+    for (size_t i = 0; i + 1 < n; ++i) {
+        if (keys[i].out == ChannelCurve::kStep) {
+            return false;  // a jump at the next key, which a spline cannot make
+        }
+        const double dt = keys[i + 1].time - keys[i].time;
+        parts[i] =
+            partsFor(keys[i].time, keys[i + 1].time, keys[i].value * kHalfRadians,
+                     keys[i + 1].value * kHalfRadians, leave[i] * dt, in[i + 1] * dt, allowed);
+        knots += size_t(parts[i]);
+        if (parts[i] == 0 || knots > maxKnots) {
+            return false;
+        }
+    }
+    BuiltSampler s;
+    s.interpolation = "CUBICSPLINE";
+    s.width = 4;
+    s.times.resize(knots);
+    float* time = s.times.data();
+    float* v = s.SizeValues(knots * 12);
+    // One knot: its time, the half-angle there and its slopes (half-angle radians per second).
+    // The rotation is cos(h) P + sin(h) Q, its derivative by h -sin(h) P + cos(h) Q.
+    auto put = [&](double at, double half, double arrive, double depart) {
+        const double ch = std::cos(half), sh = std::sin(half);
+        double q[4], dq[4];
+        for (int c = 0; c < 4; ++c) {
+            q[c] = ch * p_[c] + sh * q_[c];
+            dq[c] = ch * q_[c] - sh * p_[c];
+        }
+        *time++ = stored(at);
+        for (int c = 0; c < 4; ++c, ++v) {
+            v[0] = stored(dq[c] * arrive);
+            v[4] = stored(q[c]);
+            v[8] = stored(dq[c] * depart);
+        }
+        v += 8;
+    };
+    for (size_t i = 0; i < n; ++i) {
+        const double half = keys[i].value * kHalfRadians;
+        put(keys[i].time, half, in[i], leave[i]);
+        if (i + 1 == n || parts[i] == 1) {
+            continue;
+        }
+        // The cut points of a piece cut into parts: on the piece's cubic in u = 0..1.
+        const double dt = keys[i + 1].time - keys[i].time;
+        const double p0 = half, p1 = keys[i + 1].value * kHalfRadians;
+        const double m0 = leave[i] * dt, m1 = in[i + 1] * dt;
+        const double b = 3 * (p1 - p0) - 2 * m0 - m1, a = 2 * (p0 - p1) + m0 + m1;
+        for (int j = 1; j < parts[i]; ++j) {
+            const double u = double(j) / parts[i];
+            const double h = p0 + u * (m0 + u * (b + u * a));
+            const double slope = (m0 + u * (2 * b + 3 * a * u)) / dt;
+            put(keys[i].time + u * dt, h, slope, slope);
+        }
+    }
+    for (size_t j = 1; j < knots; ++j) {
+        if (!(s.times[j] > s.times[j - 1])) {
+            return false;  // two knots on one float time
+        }
+    }
+    *out = std::move(s);
+    return true;
+}
