@@ -75,36 +75,24 @@ void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) con
             const double dt = hi.time - lo.time;
             smooth = dt > 0 ? (hi.value - lo.value) / dt : 0.0;
         }
-        switch (k.in) {
-            case kSmooth:
-                (*in)[i] = smooth;
-                break;
-            case kLinear:
-                (*in)[i] = before;
-                break;
-            case kExplicit:
-                (*in)[i] = k.inSlope;
-                break;
-            case kFlat:
-            case kStep:
-                (*in)[i] = 0.0;
-                break;
-        }
-        switch (k.out) {
-            case kSmooth:
-                (*out)[i] = smooth;
-                break;
-            case kLinear:
-                (*out)[i] = after;
-                break;
-            case kExplicit:
-                (*out)[i] = k.outSlope;
-                break;
-            case kFlat:
-            case kStep:
-                (*out)[i] = 0.0;
-                break;
-        }
+        // A side's slope by its kind: `linear` is the straight line to the neighbour on
+        // that side.
+        const auto slope = [smooth](Kind kind, double linear, double explicitSlope) {
+            switch (kind) {
+                case kSmooth:
+                    return smooth;
+                case kLinear:
+                    return linear;
+                case kExplicit:
+                    return explicitSlope;
+                case kFlat:
+                case kStep:
+                    break;
+            }
+            return 0.0;
+        };
+        (*in)[i] = slope(k.in, before, k.inSlope);
+        (*out)[i] = slope(k.out, after, k.outSlope);
         before = after;
     }
 }

@@ -27,15 +27,7 @@ namespace fs = std::filesystem;
 
 namespace {
 
-bool Viewable(Widget w) {
-    if (!w || !XtIsManaged(w))
-        return false;
-    Widget windowed = XtIsWidget(w) ? w : XtParent(w);
-    XWindowAttributes a;
-    return XtIsRealized(windowed) &&
-           XGetWindowAttributes(XtDisplay(windowed), XtWindow(windowed), &a) &&
-           a.map_state == IsViewable;
-}
+using guitest::Viewable;
 
 // Runs `step` every 20 ms, also inside modal loops, until it returns true.
 class Poll {
