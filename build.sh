@@ -39,8 +39,10 @@ bench)
     configure_release
     cmake --build build -j "$jobs"
     for b in build/bench/*_bench; do
-        if [ "$(basename "$b")" = views_bench ] && [ -z "${DISPLAY:-}" ]; then
-            # The views' benchmark draws: on a display of its own when there is none.
+        name=$(basename "$b")
+        if [[ "$name" == views_bench || "$name" == *_window_bench ]] && [ -z "${DISPLAY:-}" ]; then
+            # The views' and the window's benchmarks draw: on a display of their own when
+            # there is none.
             scripts/xvfb-fixture start build/bench-xvfb.display >/dev/null
             DISPLAY=$(cut -d' ' -f1 build/bench-xvfb.display) "$b" || status=$?
             scripts/xvfb-fixture stop build/bench-xvfb.display
