@@ -73,35 +73,36 @@ void option_cb(Widget w, XtPointer client, XtPointer) {
             record->optionCallback(record->recognizer, int(i));
 }
 
+// Runs one of the main window's plug-in operations; 0 when there is no window.
+template <typename... Params, typename... Args>
+int to_window(int (Gnome::*operation)(Params...), Args... args) {
+    Gnome* g = TheGnome();
+    return g ? (g->*operation)(args...) : 0;
+}
+
 // CueChirrup's host: the operations go to the one main window.
 class GnomeChirrupHost : public CueChirrupHost {
   public:
     int CreateFloatSlider(CueRecognizer* r, const char* name, float minimum, float maximum,
                           float value, FloatCallback callback) override {
-        Gnome* g = TheGnome();
-        return g ? g->CreateFloatSlider(r, name, minimum, maximum, value, callback) : 0;
+        return to_window(&Gnome::CreateFloatSlider, r, name, minimum, maximum, value, callback);
     }
     int SetFloatSlider(CueRecognizer* r, const char* name, float value) override {
-        Gnome* g = TheGnome();
-        return g ? g->SetFloatSlider(r, name, value) : 0;
+        return to_window(&Gnome::SetFloatSlider, r, name, value);
     }
     int CreateIntSlider(CueRecognizer* r, const char* name, int minimum, int maximum, int value,
                         IntCallback callback) override {
-        Gnome* g = TheGnome();
-        return g ? g->CreateIntSlider(r, name, minimum, maximum, value, callback) : 0;
+        return to_window(&Gnome::CreateIntSlider, r, name, minimum, maximum, value, callback);
     }
     int SetIntSlider(CueRecognizer* r, const char* name, int value) override {
-        Gnome* g = TheGnome();
-        return g ? g->SetIntSlider(r, name, value) : 0;
+        return to_window(&Gnome::SetIntSlider, r, name, value);
     }
     int CreateOption(CueRecognizer* r, const char* name, int count, const char* const* labels,
                      int value, OptionCallback callback) override {
-        Gnome* g = TheGnome();
-        return g ? g->CreateOption(r, name, count, labels, value, callback) : 0;
+        return to_window(&Gnome::CreateOption, r, name, count, labels, value, callback);
     }
     int SetOption(CueRecognizer* r, const char* name, int index) override {
-        Gnome* g = TheGnome();
-        return g ? g->SetOption(r, name, index) : 0;
+        return to_window(&Gnome::SetOption, r, name, index);
     }
     void Progress(CueRecognizer* r, float done) override {
         if (Gnome* g = TheGnome())
