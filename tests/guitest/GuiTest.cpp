@@ -205,7 +205,25 @@ unsigned long NamedPixel(const char* colourName) {
     return screen.pixel;
 }
 
+namespace {
+// Lets the application go idle once, as its main loop does between events: the work procedures
+// run (the status line's "Ready." among them) while a short timer keeps the wait bounded.
+void run_idle_work() {
+    XtAppContext context = KLXmGnome::AppContext();
+    if (!context)
+        return;
+    bool fired = false;
+    XtAppAddTimeOut(
+        context, 20, [](XtPointer done, XtIntervalId*) { *static_cast<bool*>(done) = true; },
+        &fired);
+    while (!fired)
+        XtAppProcessEvent(context, XtIMAll);
+}
+}  // namespace
+
 void Screenshot(const std::string& name) {
+    run_idle_work();
+    Settle();
     std::string dir = std::string(CHIRRUP_BINARY_DIR) + "/test-screens";
     std::string command = "mkdir -p '" + dir + "' && import -display " +
                           DisplayString(GetDisplay()) + " -window root '" + dir + "/" + name +
