@@ -23,36 +23,35 @@ double ChannelCurve::smoothSlope(size_t i) const {
     return dt > 0 ? (keys_[hi].value - keys_[lo].value) / dt : 0.0;
 }
 
-double ChannelCurve::OutSlope(size_t i) const {
-    const Key& k = keys_[i];
-    switch (k.out) {
-        case kSmooth:
-            return smoothSlope(i);
-        case kLinear:
-            return i + 1 < keys_.size() ? segmentSlope(i) : 0.0;
-        case kExplicit:
-            return k.outSlope;
-        case kFlat:
-        case kStep:
+namespace {
+// A key side's slope by its tangent kind: `smooth` the slope through the neighbouring keys,
+// `linear` the straight line to the neighbour on that side, `given` the explicit slope.
+double side_slope(ChannelCurve::Kind kind, double smooth, double linear, double given) {
+    switch (kind) {
+        case ChannelCurve::kSmooth:
+            return smooth;
+        case ChannelCurve::kLinear:
+            return linear;
+        case ChannelCurve::kExplicit:
+            return given;
+        case ChannelCurve::kFlat:
+        case ChannelCurve::kStep:
             break;
     }
     return 0.0;
 }
+}  // namespace
+
+double ChannelCurve::OutSlope(size_t i) const {
+    const Key& k = keys_[i];
+    return side_slope(k.out, k.out == kSmooth ? smoothSlope(i) : 0.0,
+                      k.out == kLinear && i + 1 < keys_.size() ? segmentSlope(i) : 0.0, k.outSlope);
+}
 
 double ChannelCurve::InSlope(size_t i) const {
     const Key& k = keys_[i];
-    switch (k.in) {
-        case kSmooth:
-            return smoothSlope(i);
-        case kLinear:
-            return i > 0 ? segmentSlope(i - 1) : 0.0;
-        case kExplicit:
-            return k.inSlope;
-        case kFlat:
-        case kStep:
-            break;
-    }
-    return 0.0;
+    return side_slope(k.in, k.in == kSmooth ? smoothSlope(i) : 0.0,
+                      k.in == kLinear && i > 0 ? segmentSlope(i - 1) : 0.0, k.inSlope);
 }
 
 void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) const {
@@ -75,24 +74,8 @@ void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) con
             const double dt = hi.time - lo.time;
             smooth = dt > 0 ? (hi.value - lo.value) / dt : 0.0;
         }
-        // A side's slope by its kind: `linear` is the straight line to the neighbour on
-        // that side.
-        const auto slope = [smooth](Kind kind, double linear, double explicitSlope) {
-            switch (kind) {
-                case kSmooth:
-                    return smooth;
-                case kLinear:
-                    return linear;
-                case kExplicit:
-                    return explicitSlope;
-                case kFlat:
-                case kStep:
-                    break;
-            }
-            return 0.0;
-        };
-        (*in)[i] = slope(k.in, before, k.inSlope);
-        (*out)[i] = slope(k.out, after, k.outSlope);
+        (*in)[i] = side_slope(k.in, smooth, before, k.inSlope);
+        (*out)[i] = side_slope(k.out, smooth, after, k.outSlope);
         before = after;
     }
 }
