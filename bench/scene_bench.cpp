@@ -19,6 +19,7 @@
 
 #include <tiny_gltf.h>
 
+#include "GltfModelBuilder.h"
 #include "scene/KLWire.h"
 #include "scene/KLWireSource.h"
 #include "scene/OrDagNode.h"
@@ -32,32 +33,6 @@ constexpr int kVertices = 700;
 constexpr int kKeys = 240;
 constexpr int kFaceNodes = 34;  // 34 nodes x 6 animated channels: about 200 channels
 
-int add_floats(tinygltf::Model* m, const std::vector<float>& v, int type, int width, bool minMax) {
-    tinygltf::Buffer& b = m->buffers[0];
-    tinygltf::BufferView view;
-    view.buffer = 0;
-    view.byteOffset = b.data.size();
-    view.byteLength = v.size() * 4;
-    const unsigned char* p = reinterpret_cast<const unsigned char*>(v.data());
-    b.data.insert(b.data.end(), p, p + v.size() * 4);
-    m->bufferViews.push_back(view);
-    tinygltf::Accessor a;
-    a.bufferView = int(m->bufferViews.size()) - 1;
-    a.componentType = TINYGLTF_COMPONENT_TYPE_FLOAT;
-    a.type = type;
-    a.count = v.size() / size_t(width);
-    if (minMax) {
-        a.minValues.assign(size_t(width), 1e30);
-        a.maxValues.assign(size_t(width), -1e30);
-        for (size_t i = 0; i < v.size(); ++i) {
-            a.minValues[i % size_t(width)] = std::min(a.minValues[i % size_t(width)], double(v[i]));
-            a.maxValues[i % size_t(width)] = std::max(a.maxValues[i % size_t(width)], double(v[i]));
-        }
-    }
-    m->accessors.push_back(a);
-    return int(m->accessors.size()) - 1;
-}
-
 // Writes the benchmark scene once per run; returns its path.
 const std::string& scene_path() {
     static std::string path;
@@ -65,7 +40,8 @@ const std::string& scene_path() {
         return path;
     }
     path = "/tmp/chirrup-scene-bench-" + std::to_string(getpid()) + ".glb";
-    tinygltf::Model m;
+    GltfModelBuilder builder;
+    tinygltf::Model& m = builder.m;
     m.asset.version = "2.0";
     m.buffers.emplace_back();
     m.scenes.emplace_back();
@@ -76,7 +52,7 @@ const std::string& scene_path() {
     for (int k = 0; k < kKeys; ++k) {
         times.push_back(float(k) / 30.0f);
     }
-    int input = add_floats(&m, times, TINYGLTF_TYPE_SCALAR, 1, true);
+    int input = builder.Floats(times, 1, 0, true);
     for (int n = 0; n < kNodes; ++n) {
         std::vector<float> pos, nrm;
         for (int v = 0; v < kVertices; ++v) {
@@ -86,8 +62,8 @@ const std::string& scene_path() {
         }
         tinygltf::Primitive prim;
         prim.mode = TINYGLTF_MODE_POINTS;
-        prim.attributes["POSITION"] = add_floats(&m, pos, TINYGLTF_TYPE_VEC3, 3, true);
-        prim.attributes["NORMAL"] = add_floats(&m, nrm, TINYGLTF_TYPE_VEC3, 3, false);
+        prim.attributes["POSITION"] = builder.Floats(pos, 3, 0, true);
+        prim.attributes["NORMAL"] = builder.Floats(nrm, 3);
         tinygltf::Mesh mesh;
         mesh.primitives.push_back(prim);
         m.meshes.push_back(mesh);
@@ -111,8 +87,7 @@ const std::string& scene_path() {
             for (int p = 0; p < 2; ++p) {
                 tinygltf::AnimationSampler s;
                 s.input = input;
-                s.output = add_floats(&m, *values[p], p ? TINYGLTF_TYPE_VEC4 : TINYGLTF_TYPE_VEC3,
-                                      p ? 4 : 3, false);
+                s.output = builder.Floats(*values[p], p ? 4 : 3);
                 tinygltf::AnimationChannel c;
                 c.sampler = int(anim.samplers.size());
                 c.target_node = n;
