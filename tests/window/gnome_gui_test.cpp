@@ -54,8 +54,7 @@ int OptionIndex(const char* name) {
 
 TEST(WindowTest, BuiltFromTheTableAndTheResourceFile) {
     windowtest::TheWindow();
-    ASSERT_EQ(widget_spec_rows, 166);
-    EXPECT_EQ(widget_spec[166].name, nullptr);
+    EXPECT_EQ(widget_spec[widget_spec_rows].name, nullptr);
     for (int i = 0; i < widget_spec_rows; i++)
         EXPECT_NE(W(widget_spec[i].name), nullptr) << "row " << i + 1 << " " << widget_spec[i].name;
     // Parents by depth; pulldowns hang on the menu bar, attached to their cascades.
@@ -72,7 +71,6 @@ TEST(WindowTest, BuiltFromTheTableAndTheResourceFile) {
     EXPECT_EQ(Label("openTrack"), "Open Track...");
     EXPECT_EQ(guitest::Children(SubMenu("speedMenu")).size(), 4u);
     EXPECT_TRUE(XmToggleButtonGadgetGetState(W("midpoint")));
-    EXPECT_FALSE(XmToggleButtonGadgetGetState(W("points")));
 }
 
 // Menu sensitivity by (keyset shown, geometry loaded), and exactly one alternative of each view
