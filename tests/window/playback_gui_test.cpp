@@ -177,22 +177,16 @@ TEST_F(PlaybackWindowTest, GoToTimeShowsTheKeyImagesByDisplayStyle) {
     KLImageSGI* a = set->GetKeyShape(1)->GetImage();
     KLImageSGI* b = set->GetKeyShape(2)->GetImage();
     KLImageView* view = gnome->keyImageView;
-    struct Case {
-        int style;
-        double frame;
-        KLImageSGI *first, *second;
-        float fade;
+    const auto at = [&](int style, double frame) {
+        gnome->displayStyle = style;
+        gnome->GoToTime(CueTime::FromFrames(frame));
+        return view->ImageA();
     };
-    for (Case c :
-         {Case{0, 6, b, nullptr, 0}, Case{1, 9, a, nullptr, 0}, Case{2, 2.5, a, b, 0.25f}}) {
-        gnome->displayStyle = c.style;
-        gnome->GoToTime(CueTime::FromFrames(c.frame));
-        EXPECT_EQ(view->ImageA(), c.first) << "style " << c.style << " frame " << c.frame;
-        if (c.second) {
-            EXPECT_EQ(view->ImageB(), c.second);
-            EXPECT_NEAR(view->Fade(), c.fade, 1e-3);
-        }
-    }
+    EXPECT_EQ(at(0, 6), b) << "midpoint: past the half, the next key";
+    EXPECT_EQ(at(1, 9), a) << "keyframe: the key before";
+    EXPECT_EQ(at(2, 2.5), a);
+    EXPECT_EQ(view->ImageB(), b) << "dissolve: into the next";
+    EXPECT_NEAR(view->Fade(), 0.25f, 1e-3);
     gnome->keyViewMode = savedMode;
     gnome->displayStyle = 0;
 }
