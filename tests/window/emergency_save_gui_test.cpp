@@ -26,7 +26,6 @@
 #include "toolkit/xm/KLSignalPipe.h"
 #include "toolkit/xm/KLXmGnome.h"
 #include "window/DemoProject.h"
-#include "window/Gnome.h"
 #include "window/WindowTestUtil.h"
 #include "workspace/Imp.h"
 
@@ -52,13 +51,10 @@ void report(const std::string& text) {
 
 // The save's first file opens: it takes the lock, as a save that mallocs takes malloc's.
 void take_the_lock(SafeFile::Stage stage) {
-    if (stage != SafeFile::Stage::Opened)
-        return;
-    if (pthread_mutex_lock(&theLock) != 0) {
+    if (stage == SafeFile::Stage::Opened && pthread_mutex_lock(&theLock) != 0)
         report("the save would deadlock;");
-        return;
-    }
-    pthread_mutex_unlock(&theLock);
+    else if (stage == SafeFile::Stage::Opened)
+        pthread_mutex_unlock(&theLock);
 }
 
 void send_inside_the_lock(XtPointer, XtIntervalId*) {

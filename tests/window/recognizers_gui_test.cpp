@@ -148,7 +148,6 @@ TEST_F(Recognizers, MenuAndPanelsComeFromThePlugins) {
         for (const char* label : {"Configure", "Recognize", "Dismiss"})
             EXPECT_EQ(Label(panel_item(name, label)), label);
     }
-    EXPECT_EQ(panel_item("Nobody", nullptr), nullptr);
 
     const size_t before = mouth->recognizers.size();
     EXPECT_EQ(windowtest::AnswerAlerts(
