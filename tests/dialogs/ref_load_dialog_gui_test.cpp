@@ -83,10 +83,8 @@ TEST_F(RefLoadDialogTest, FieldsHoldTheValues) {
     char* text = XmTextFieldGetString(KLXmGnome::FindWidget("refBy"));
     EXPECT_STREQ(text, "2");
     XtFree(text);
-    for (const char* typed : {"", "abc", " "}) {
-        XmTextFieldSetString(dialog->startField, const_cast<char*>(typed));
-        EXPECT_EQ(dialog->Start(), 0) << "\"" << typed << "\"";
-    }
+    XmTextFieldSetString(dialog->startField, const_cast<char*>("abc"));
+    EXPECT_EQ(dialog->Start(), 0);
     XmTextFieldSetString(dialog->endField, const_cast<char*>("42frames"));
     EXPECT_EQ(dialog->End(), 42);
 }

@@ -37,6 +37,29 @@ void sync_and_process() {
     KLXmGnome::ProcessPending();
 }
 
+void modifier_keys(unsigned int modifiers, bool press) {
+    Display* d = GetDisplay();
+    const std::pair<unsigned int, KeySym> keys[] = {
+        {ShiftMask, XK_Shift_L}, {ControlMask, XK_Control_L}, {Mod1Mask, XK_Alt_L}};
+    for (auto& [mask, sym] : keys)
+        if (modifiers & mask)
+            XTestFakeKeyEvent(d, XKeysymToKeycode(d, sym), press, CurrentTime);
+}
+
+// Lets the application go idle once, as its main loop does between events: the work procedures
+// run (the status line's "Ready." among them) while a short timer keeps the wait bounded.
+void run_idle_work() {
+    XtAppContext context = KLXmGnome::AppContext();
+    if (!context)
+        return;
+    bool fired = false;
+    XtAppAddTimeOut(
+        context, 20, [](XtPointer done, XtIntervalId*) { *static_cast<bool*>(done) = true; },
+        &fired);
+    while (!fired)
+        XtAppProcessEvent(context, XtIMAll);
+}
+
 }  // namespace
 
 Widget Shell(const char* const* fallbackResources) {
@@ -67,11 +90,10 @@ bool WaitFor(const std::function<bool()>& done, double seconds) {
             return done();
         if (GetDisplay())
             XFlush(GetDisplay());
-        if (context && XtAppPending(context)) {
+        if (context && XtAppPending(context))
             XtAppProcessEvent(context, XtIMAll);
-        } else {
+        else
             std::this_thread::sleep_for(std::chrono::milliseconds(2));
-        }
     }
 }
 
@@ -107,26 +129,12 @@ std::vector<Widget> Children(Widget widget) {
 void MoveTo(Widget widget, int x, int y) {
     Dimension width = 0, height = 0;
     XtVaGetValues(widget, XmNwidth, &width, XmNheight, &height, nullptr);
-    if (x < 0)
-        x = width / 2;
-    if (y < 0)
-        y = height / 2;
     Position rootX = 0, rootY = 0;
-    XtTranslateCoords(widget, static_cast<Position>(x), static_cast<Position>(y), &rootX, &rootY);
+    XtTranslateCoords(widget, Position(x < 0 ? width / 2 : x), Position(y < 0 ? height / 2 : y),
+                      &rootX, &rootY);
     XTestFakeMotionEvent(GetDisplay(), -1, rootX, rootY, CurrentTime);
     Settle();
 }
-
-namespace {
-void modifier_keys(unsigned int modifiers, bool press) {
-    Display* d = GetDisplay();
-    const std::pair<unsigned int, KeySym> keys[] = {
-        {ShiftMask, XK_Shift_L}, {ControlMask, XK_Control_L}, {Mod1Mask, XK_Alt_L}};
-    for (auto& [mask, sym] : keys)
-        if (modifiers & mask)
-            XTestFakeKeyEvent(d, XKeysymToKeycode(d, sym), press, CurrentTime);
-}
-}  // namespace
 
 void Press(int button, unsigned int modifiers) {
     modifier_keys(modifiers, true);
@@ -204,22 +212,6 @@ unsigned long NamedPixel(const char* colourName) {
         return ~0ul;
     return screen.pixel;
 }
-
-namespace {
-// Lets the application go idle once, as its main loop does between events: the work procedures
-// run (the status line's "Ready." among them) while a short timer keeps the wait bounded.
-void run_idle_work() {
-    XtAppContext context = KLXmGnome::AppContext();
-    if (!context)
-        return;
-    bool fired = false;
-    XtAppAddTimeOut(
-        context, 20, [](XtPointer done, XtIntervalId*) { *static_cast<bool*>(done) = true; },
-        &fired);
-    while (!fired)
-        XtAppProcessEvent(context, XtIMAll);
-}
-}  // namespace
 
 void Screenshot(const std::string& name) {
     run_idle_work();
