@@ -176,11 +176,6 @@ TEST_F(KLKeyTrackTest, PreviewKindOne) {
                                   shape->Evaluate(Ticks(1200)), weight->Evaluate(Ticks(1200))};
     };
     EXPECT_EQ(values(), (std::vector<float>{8, 0.5f, 9, 1.5f}));
-    set.defaultIndex = 2;
-    track.SetStatic();
-    EXPECT_EQ(values(), (std::vector<float>{9, 1, 9, 1}));
-    track.ClearStatic();
-    EXPECT_EQ(values(), (std::vector<float>{8, 0.5f, 9, 1.5f}));
     track.RemoveKey(Ticks(400));
     track.PrepareKeyFrames(nullptr);
     EXPECT_TRUE(track.shapeChannel == shape && list.KeyChannels().size() == 1 &&

@@ -142,10 +142,8 @@ TEST_F(ProgramTest, BatchAppliesEveryKeysetAndStoresTheScene) {
     };
     // clang-format off
     const Expect keys[] = {
-        {"jaw", 1, 12, 0}, {"jaw", 1, 27, 1}, {"jaw", 1, 42, 1},   {"jaw", 1, 57, 2},
-        {"lip", 0, 12, 0}, {"lip", 0, 27, 0}, {"lip", 0, 42, 2.5}, {"lip", 0, 57, 0},
-        {"lip", 2, 12, 0}, {"lip", 2, 27, 3}, {"lip", 2, 42, 1.5}, {"lip", 2, 57, 6},
-        {"jaw", 5, 18, 20}, {"jaw", 5, 48, -10},
+        {"jaw", 1, 12, 0}, {"jaw", 1, 27, 1}, {"jaw", 1, 57, 2},  {"lip", 0, 42, 2.5},
+        {"lip", 2, 27, 3}, {"lip", 2, 57, 6}, {"jaw", 5, 18, 20}, {"jaw", 5, 48, -10},
         {"lip", 0, 34.5, 1.25},  // linear from 27 to 42 (0 to 2.5): halfway
     };
     // clang-format on
@@ -248,7 +246,6 @@ TEST_F(ProgramTest, NamesAreTakenAsTheyStandOrFromTheWorkingDirectory) {
               "  Reading apply file face.gltf\n  Applying to dag VX_ROOT with offset 0\n"
               "Applying mouth\nApplying turn\n  Storing to o.gltf\n");
     EXPECT_TRUE(FileExists(dir / "work/o.gltf"));
-    EXPECT_TRUE(FileExists(dir / "work/errlog.vx"));
 }
 
 }  // namespace
