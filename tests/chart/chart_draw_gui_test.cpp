@@ -40,7 +40,8 @@ TEST_F(ChartDraw, SticksLettersAndTheActiveKeyAndMark) {
         EXPECT_EQ(Pixel(x, 170), chart->keyColor) << x;
         EXPECT_EQ(Pixel(x - 1, 230), chart->keyColor) << x;  // three pixels wide
         EXPECT_EQ(Pixel(x + 1, 230), chart->keyColor) << x;
-        EXPECT_NE(Pixel(x + 3, 170), chart->keyColor) << x;
+        EXPECT_NE(Pixel(x + 2, 170), chart->keyColor) << x;
+        EXPECT_NE(Pixel(x - 2, 230), chart->keyColor) << x;
     }
     // The ticks: value 1 halfway up, value 2 at the top plus one pixel, 4 left and 5 right.
     EXPECT_EQ(Pixel(120 - 4, chart->geometry.TickRow(1.0f)), chart->keyColor);
