@@ -37,15 +37,13 @@ namespace charttest {
 // Destroying the window deletes the chart.
 class ChartWindow {
   public:
-    ChartWindow(const char* name, int width, int height, bool map = true) {
+    ChartWindow(const char* name, int width, int height) {
         shell = XtVaCreatePopupShell("chartTestShell", topLevelShellWidgetClass, guitest::Shell(),
                                      XmNallowShellResize, True, nullptr);
         Widget top = KLSyncChart::Create(shell, const_cast<char*>(name), nullptr, 0);
         chart = static_cast<KLSyncChart*>(KLFiend::FromWidget(top));
         XtVaSetValues(chart->drawingArea, XmNwidth, width, XmNheight, height, nullptr);
         XtManageChild(top);
-        if (!map)
-            return;
         XtPopup(shell, XtGrabNone);
         guitest::WaitMapped(shell);
         // The drawing area is never narrower than the zoom and pan bar under it.

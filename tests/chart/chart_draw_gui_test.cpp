@@ -1,13 +1,10 @@
-// What the chart paints, read back from its window; the demo's dialogue, marks and mouth keys
-// are saved as screenshots for people to look at (build/test-screens/chart-demo*.png).
+// What the chart paints, read back from its window.
 #include "chart/ChartTestUtil.h"
 
 #include <X11/Xresource.h>
 
 #include <cmath>
-#include <fstream>
 
-#include "chart/KLKeyDrawing.h"
 #include "model/InterpEase.h"
 
 using charttest::ChartWindow;
@@ -43,7 +40,8 @@ TEST_F(ChartDraw, SticksLettersAndTheActiveKeyAndMark) {
         EXPECT_EQ(Pixel(x, 170), chart->keyColor) << x;
         EXPECT_EQ(Pixel(x - 1, 230), chart->keyColor) << x;  // three pixels wide
         EXPECT_EQ(Pixel(x + 1, 230), chart->keyColor) << x;
-        EXPECT_NE(Pixel(x + 3, 170), chart->keyColor) << x;
+        EXPECT_NE(Pixel(x + 2, 170), chart->keyColor) << x;
+        EXPECT_NE(Pixel(x - 2, 230), chart->keyColor) << x;
     }
     // The ticks: value 1 halfway up, value 2 at the top plus one pixel, 4 left and 5 right.
     EXPECT_EQ(Pixel(120 - 4, chart->geometry.TickRow(1.0f)), chart->keyColor);
@@ -100,7 +98,6 @@ TEST_F(ChartDraw, RegionIndicatorZoomAndWaveform) {
     chart->SetRegionRange(Seconds(0.5), Seconds(1.25));
     EXPECT_EQ(Pixel(75, 5), chart->regionColor);
     EXPECT_EQ(Pixel(76, 5), chart->background);
-    EXPECT_EQ(Pixel(31, 5), chart->regionColor);
     EXPECT_EQ(Pixel(29, 5), chart->background);
     EXPECT_EQ(Pixel(50, 5), chart->gridColor);           // the grid shows through the region
     chart->SetRegionRange(Seconds(1.25), Seconds(0.5));  // start after end selects nothing
@@ -146,13 +143,8 @@ TEST_F(ChartDraw, RegionIndicatorZoomAndWaveform) {
     ASSERT_TRUE(guitest::WaitFor(
         [this] { return chart->geometry.zoomStart == 0.0f && chart->geometry.zoomEnd == 1.0f; }));
 
-    // The waveform of silence, of a loud sound and of none.
-    auto silent = charttest::Sound(std::vector<float>(48000, 0.0f), 48000);
-    chart->SetSound(silent.get());
-    EXPECT_EQ(chart->peak, 0.0f);
+    // A loud sound draws from the centre line through the band; without it the waveform goes.
     const int centre = 15 + (144 / 2);
-    EXPECT_EQ(Pixel(125, centre), chart->background);
-    // A loud sound draws from the centre line through the band.
     std::vector<float> tone(48000);
     for (size_t i = 0; i < tone.size(); i++)
         tone[i] = std::sin(float(i) * 0.05f);
@@ -161,47 +153,10 @@ TEST_F(ChartDraw, RegionIndicatorZoomAndWaveform) {
     EXPECT_EQ(Pixel(25, centre), chart->soundColor);
     EXPECT_EQ(Pixel(25, 20), chart->soundColor);
     EXPECT_NE(Pixel(25, 160), chart->soundColor);
-    // Taking the sound away keeps the duration and the waveform goes.
     const CueTime before = chart->geometry.duration;
     chart->SetSound(nullptr);
     EXPECT_EQ(chart->geometry.duration, before);
     EXPECT_EQ(Pixel(25, 20), chart->background);
-}
-
-// The sticks and ticks are filled as rectangles: they must cover exactly the pixels of the
-// 3-pixel-wide butt-capped lines they stand for.
-TEST_F(ChartDraw, StickRectanglesAreTheWideLines) {
-    Display* d = guitest::GetDisplay();
-    const auto& g = chart->geometry;
-    Pixmap lines = XCreatePixmap(d, XtWindow(chart->drawingArea), 60, g.height, 1);
-    Pixmap rects = XCreatePixmap(d, XtWindow(chart->drawingArea), 60, g.height, 1);
-    GC gc = XCreateGC(d, lines, 0, nullptr);
-    for (float value : {0.0f, 0.3f, 1.0f, 1.7f, 2.0f}) {
-        for (Pixmap p : {lines, rects}) {
-            XSetForeground(d, gc, 0);
-            XFillRectangle(d, p, gc, 0, 0, 60, g.height);
-        }
-        XSetForeground(d, gc, 1);
-        XSetLineAttributes(d, gc, 3, LineSolid, CapButt, JoinRound);
-        const int x = 30, t = g.TickRow(value);
-        XDrawLine(d, lines, gc, x, g.lowerBandTop, x, g.textBaseline);
-        XDrawLine(d, lines, gc, x - 4, t, x + 5, t);
-        std::vector<KLChartRect> list;
-        KLKeyDrawing::StickRects(g, x, value, list);
-        XFillRectangles(d, rects, gc, reinterpret_cast<XRectangle*>(list.data()), int(list.size()));
-        XImage* a = XGetImage(d, lines, 0, 0, 60, g.height, 1, XYPixmap);
-        XImage* b = XGetImage(d, rects, 0, 0, 60, g.height, 1, XYPixmap);
-        int differ = 0;
-        for (int y = 0; y < int(g.height); y++)
-            for (int i = 0; i < 60; i++)
-                differ += XGetPixel(a, i, y) != XGetPixel(b, i, y);
-        EXPECT_EQ(differ, 0) << "value " << value;
-        XDestroyImage(a);
-        XDestroyImage(b);
-    }
-    XFreeGC(d, gc);
-    XFreePixmap(d, lines);
-    XFreePixmap(d, rects);
 }
 
 TEST(ChartResources, ColoursComeFromTheResourceDatabase) {
@@ -237,60 +192,6 @@ TEST(ChartSmall, TinyChartsAndFarKeysDrawWithoutTrouble) {
     window.chart->ZoomReset();
     guitest::Settle();
     EXPECT_EQ(window.chart->geometry.textBaseline, -19);
-}
-
-// Positions `in` just after the line that starts with `header`; false when there is none.
-bool seek_block(std::istream& in, const std::string& header) {
-    std::string line;
-    while (std::getline(in, line))
-        if (line.compare(0, header.size(), header) == 0)
-            return true;
-    return false;
-}
-
-TEST(ChartDemo, DialogueMarksAndMouthKeys) {
-    const std::string demo = std::string(CHIRRUP_SOURCE_DIR) + "/resources/demo/";
-    auto keyset = std::make_unique<KLKeySet>("mouth", "face.glb");
-    std::ifstream kset(demo + "demo.kset"), in(demo + "demo.track");
-    ASSERT_TRUE(seek_block(kset, "begin keyset mouth"));
-    keyset->Read(kset);
-    KLKeyTrack track(keyset.get());
-    KLMarkTrack marks;
-    ASSERT_TRUE(seek_block(in, "begin marktrack"));
-    marks.Read(in);
-    ASSERT_TRUE(seek_block(in, "begin keytrack\tmouth"));
-    track.Read(in, keyset.get());
-    ASSERT_EQ(std::make_tuple(keyset->keyShapeCount, marks.marks.Count(), track.events.Count()),
-              std::make_tuple(11, 9, 29));
-    CueSound sound((demo + "dialogue.aiff").c_str());
-    ASSERT_TRUE(sound.Valid()) << sound.ErrorText();
-
-    ChartWindow window("syncChart", 1200, 300);
-    KLSyncChart* chart = window.chart;
-    chart->SetUserDuration(CueTime::FromSeconds(1));
-    chart->SetSound(&sound);
-    chart->SetKeyTrack(&track);
-    chart->SetMarkTrack(&marks);
-    chart->SetIndicatorTime(CueTime::FromFrames(40));
-    chart->UpdateDisplay();
-    // The waveform, the key sticks and the grid are all on screen.
-    int wave = 0, keys = 0, grid = 0;
-    for (unsigned long p :
-         window.Pixels(0, 0, int(chart->geometry.width), int(chart->geometry.height))) {
-        wave += p == chart->soundColor;
-        keys += p == chart->keyColor;
-        grid += p == chart->gridColor;
-    }
-    EXPECT_GT(wave, 5000);
-    EXPECT_GT(keys, 29 * 3 * 40);
-    EXPECT_GT(grid, 1000);
-    guitest::Screenshot("chart-demo");
-    // Zoomed in on the first two seconds, with a region swept over the "w" mark.
-    chart->SetZoomRange(CueTime(), CueTime::FromSeconds(2));
-    chart->SetRegionRange(CueTime::FromFrames(35), CueTime::FromFrames(45));
-    chart->UpdateDisplay();
-    guitest::Settle();
-    guitest::Screenshot("chart-demo-zoomed");
 }
 
 }  // namespace

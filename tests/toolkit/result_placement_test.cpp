@@ -45,7 +45,6 @@ INSTANTIATE_TEST_SUITE_P(
     Scripted, Placement,
     ::testing::Values(
         PlacementCase{"Empty", {}, 0, {}},
-        PlacementCase{"OneResult", script({4}), 0, {key(300, 4)}},
         PlacementCase{
             "OneShapeHeldThroughoutPlacesOnlyItsStart", script({2, 2, 2, 2}), 0, {key(300, 2)}},
         // 1 held three results, 2 held two, 3 to the end: each held shape gets a second key
@@ -67,7 +66,7 @@ INSTANTIATE_TEST_SUITE_P(
                       script({1, 1, -1, -1, 2, -1}),
                       0,
                       {key(300, 1), key(900, 1), key(2700, 2)}},
-        PlacementCase{"NothingLinkedPlacesNothing", script({-1, -1, -1}), 0, {}}),
+        PlacementCase{"NothingLinkedPlacesNothing", script({-1, -1}), 0, {}}),
     [](const auto& info) { return std::string(info.param.name); });
 
 TEST(PlacementProgress, CalledAfterEveryHundredResults) {

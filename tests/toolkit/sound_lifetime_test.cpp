@@ -1,10 +1,6 @@
-// The sound output's thread against everything the event loop does while it runs: sounds,
-// timers and scrub positions replaced and destroyed mid-pass, passes started and stopped in
-// quick succession, and the program ending while sound plays. Run under both of SDL's
-// device-less drivers: "dummy" (a buffer every ~10 ms, the thread mostly asleep) and "disk"
-// (buffers as fast as they are asked for, the thread always busy). The faults these look for
-// are use-after-free and double free, which the sanitizer build and valgrind report; a plain
-// build catches the ones that corrupt the heap badly enough to abort.
+// The sound thread against the event loop replacing and destroying what it reads mid-pass,
+// and the program ending while sound plays, under SDL's "dummy" (thread mostly asleep) and
+// "disk" (thread always busy) drivers. Use-after-free shows under the sanitizer build.
 
 #include <chrono>
 #include <cmath>
@@ -58,9 +54,7 @@ class SoundLifetimeTest : public ::testing::TestWithParam<const char*> {
     }
 };
 
-// What the transport, the link dialog's audition, the chart's scrubbing and a driver change
-// do to the output, in a random order: each step replaces or destroys something the sound thread
-// may be reading at that moment, with the device running in between.
+// Transport, audition, scrubbing and driver changes in a random order, the device running.
 TEST_P(SoundLifetimeTest, ReplacingAndDestroyingWhatPlaysWhileTheDeviceRuns) {
     std::mt19937 random(7);
     std::unique_ptr<CueSound> sound;
@@ -127,9 +121,8 @@ TEST_P(SoundLifetimeTest, ReplacingAndDestroyingWhatPlaysWhileTheDeviceRuns) {
     ASSERT_TRUE(wait_buffers(2));
 }
 
-// The program may end while a pass or an audition plays, with the sound and its timer held
-// in statics that are destroyed after the output's own state: the output's thread must be
-// gone before anything it reads is, and a sound destroyed then must not touch the output.
+// The program ends while sound plays, the sound and timer in statics destroyed after the
+// output's state: the output's thread must be gone first.
 std::unique_ptr<CueSound> theSoundAtExit;
 std::unique_ptr<KLTimer> theTimerAtExit;
 

