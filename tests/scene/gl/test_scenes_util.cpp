@@ -9,16 +9,6 @@
 namespace testscenes {
 namespace {
 
-// Appends `data` to buffer 0 as a new buffer view and accessor; returns the accessor.
-template <typename T>
-int add_accessor(GltfModelBuilder& b, const std::vector<T>& data, int componentType, int type,
-                 int target, bool minMax = false) {
-    const int per = tinygltf::GetNumComponentsInType(uint32_t(type));
-    const std::vector<float> bounds(data.begin(), data.end());
-    return b.Accessor(data.data(), data.size() / size_t(per), per, componentType, int(sizeof(T)), 0,
-                      std::max(target, 0), minMax ? &bounds : nullptr);
-}
-
 // A 2 x 2 PNG checker: red, blue / blue, red.
 const unsigned char kChecker[] = {
     0x89, 0x50, 0x4e, 0x47, 0x0d, 0x0a, 0x1a, 0x0a, 0x00, 0x00, 0x00, 0x0d, 0x49, 0x48, 0x44,
@@ -27,7 +17,6 @@ const unsigned char kChecker[] = {
     0xcf, 0xc0, 0x00, 0x42, 0x40, 0x0c, 0x24, 0x40, 0x2c, 0x00, 0x43, 0xce, 0x07, 0xf9, 0xe9,
     0x06, 0xd5, 0x19, 0x00, 0x00, 0x00, 0x00, 0x49, 0x45, 0x4e, 0x44, 0xae, 0x42, 0x60, 0x82};
 
-constexpr int kFloat = TINYGLTF_COMPONENT_TYPE_FLOAT;
 constexpr int kArray = TINYGLTF_TARGET_ARRAY_BUFFER;
 constexpr int kElements = TINYGLTF_TARGET_ELEMENT_ARRAY_BUFFER;
 
@@ -66,14 +55,14 @@ tinygltf::Primitive sheet_primitive(GltfModelBuilder& builder, const Sheet& s, f
     tinygltf::Primitive p;
     p.mode = TINYGLTF_MODE_TRIANGLES;
     p.material = 0;
-    p.attributes["POSITION"] = add_accessor(builder, pos, kFloat, TINYGLTF_TYPE_VEC3, kArray, true);
-    p.attributes["NORMAL"] = add_accessor(builder, nrm, kFloat, TINYGLTF_TYPE_VEC3, kArray);
-    p.attributes["TEXCOORD_0"] = add_accessor(builder, uv, kFloat, TINYGLTF_TYPE_VEC2, kArray);
+    p.attributes["POSITION"] = builder.Floats(pos, 3, 0, true, kArray);
+    p.attributes["NORMAL"] = builder.Floats(nrm, 3, 0, false, kArray);
+    p.attributes["TEXCOORD_0"] = builder.Floats(uv, 2, 0, false, kArray);
     if (skinned) {
-        p.attributes["JOINTS_0"] = add_accessor(
-            builder, joints, TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT, TINYGLTF_TYPE_VEC4, kArray);
-        p.attributes["WEIGHTS_0"] =
-            add_accessor(builder, weights, kFloat, TINYGLTF_TYPE_VEC4, kArray);
+        p.attributes["JOINTS_0"] =
+            builder.Accessor(joints.data(), joints.size() / 4, 4,
+                             TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT, 2, 0, kArray);
+        p.attributes["WEIGHTS_0"] = builder.Floats(weights, 4, 0, false, kArray);
     }
     if (morphed) {
         for (int k = 0; k < s.morphTargets; ++k) {
@@ -86,12 +75,11 @@ tinygltf::Primitive sheet_primitive(GltfModelBuilder& builder, const Sheet& s, f
                     delta[v + 2] = 0.5f;
                 }
             }
-            p.targets.push_back({{"POSITION", add_accessor(builder, delta, kFloat,
-                                                           TINYGLTF_TYPE_VEC3, kArray, true)}});
+            p.targets.push_back({{"POSITION", builder.Floats(delta, 3, 0, true, kArray)}});
         }
     }
-    p.indices = add_accessor(builder, idx, TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT,
-                             TINYGLTF_TYPE_SCALAR, kElements);
+    p.indices = builder.Accessor(idx.data(), idx.size(), 1, TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT, 4,
+                                 0, kElements);
     return p;
 }
 
@@ -160,7 +148,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
             const float mat[16] = {1, 0, 0, 0, 0, 1, 0, 0, 0, 0, 1, 0, -x, 0, 0, 1};
             inverse.insert(inverse.end(), mat, mat + 16);
         }
-        skin.inverseBindMatrices = add_accessor(builder, inverse, kFloat, TINYGLTF_TYPE_MAT4, -1);
+        skin.inverseBindMatrices = builder.Floats(inverse, 16);
         skin.skeleton = skin.joints[0];
         m.skins.push_back(skin);
         m.nodes[0].skin = 0;
@@ -172,7 +160,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
         for (int f = 0; f < s.animatedFrames; ++f) {
             times.push_back(float(f) / 30.0f);
         }
-        const int input = add_accessor(builder, times, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
+        const int input = builder.Floats(times, 1, 0, true);
         for (int j = 0; j < s.joints; ++j) {
             std::vector<float> quats;
             for (int f = 0; f < s.animatedFrames; ++f) {
@@ -181,7 +169,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
             }
             tinygltf::AnimationSampler sampler;
             sampler.input = input;
-            sampler.output = add_accessor(builder, quats, kFloat, TINYGLTF_TYPE_VEC4, -1);
+            sampler.output = builder.Floats(quats, 4);
             sampler.interpolation = "STEP";
             anim.samplers.push_back(sampler);
             tinygltf::AnimationChannel channel;
@@ -196,9 +184,8 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
         tinygltf::Animation anim;
         anim.name = "weights";
         tinygltf::AnimationSampler sampler;
-        sampler.input =
-            add_accessor(builder, s.weightTimes, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
-        sampler.output = add_accessor(builder, s.weightValues, kFloat, TINYGLTF_TYPE_SCALAR, -1);
+        sampler.input = builder.Floats(s.weightTimes, 1, 0, true);
+        sampler.output = builder.Floats(s.weightValues, 1);
         sampler.interpolation = "LINEAR";
         anim.samplers.push_back(sampler);
         tinygltf::AnimationChannel channel;
