@@ -1,8 +1,5 @@
-// How a stored rotation with one turning axis between fixed ones is written: cubic pieces at
-// the turning curve's keys (cut into parts where one piece would stray), or samples where a
-// spline cannot follow it (steps) or float times would move it too far (fast turns late in a
-// long scene). Whatever the form, the written rotation must stay within the tolerance at every
-// frame and every key, and the file must be valid.
+// A stored rotation with one turning axis between fixed ones, in each form it is written in
+// (cubic pieces, cut or not, or samples), stays within tolerance at every frame and key.
 #include <gtest/gtest.h>
 
 #include <string>

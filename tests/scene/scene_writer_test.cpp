@@ -1,6 +1,4 @@
-// What the scene writer writes: the sampler of each case (interpolation, key count, times),
-// the tolerance of sampled curves at every frame and key, which clip and buffer the new data
-// goes to, what it leaves alone, and the bounds on what a small scene can make it write.
+// What the scene writer writes: samplers, tolerances, clips and buffers, what it leaves alone.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -26,7 +24,6 @@ class SceneWriterTest : public ::testing::Test {
                                  name.size() > 4 && name.substr(name.size() - 4) == ".glb"));
         ASSERT_TRUE(scene.Open(dir + "/" + name));
     }
-    // Stores the open scene as `name`, checks the file is valid and reads it back.
     // A scene of one empty node "a", opened; the node.
     Node OneNode() {
         ModelBuilder b;
@@ -34,6 +31,7 @@ class SceneWriterTest : public ::testing::Test {
         Open(b);
         return scene.Fetch("a");
     }
+    // Stores the open scene as `name`, checks the file is valid and reads it back.
     std::shared_ptr<SceneDocument> StoreAndRead(const std::string& name = "out.gltf") {
         std::string error;
         out = dir + "/" + name;
@@ -170,8 +168,7 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
 }
 
 // Sampled curves (rotation; translation mixing steps with axes at other times) stay within
-// the stated tolerance at every frame and every key, with fewer samples than frames where the
-// curve allows it.
+// tolerance at every frame and key, with fewer samples than frames.
 TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
     Node a = OneNode();
     // A steady turn about X over 20 s (600 frames), a smooth swing about Y for the first 5 s,
@@ -325,10 +322,8 @@ TEST_F(SceneWriterTest, AGlbHoldsEveryBufferAndImageInItsBinaryChunk) {
     EXPECT_EQ(WrittenSampler(m, a, "scale").values, (std::vector<float>{1, 1, 1, 2, 2, 2}));
 }
 
-// The same open scene stored as .glb, again as .glb with other keys, then as .gltf with only
-// one node driven anew: each file is valid and holds the last applied values, a .glb one buffer,
-// and the .gltf the scene's own buffer, one with what the second store wrote for the nodes not
-// driven again, and one with the last store's bytes.
+// One open scene stored twice as .glb, then as .gltf with one node driven anew: each holds the
+// last applied values; a .glb one buffer, the .gltf the scene's, the second store's and its own.
 TEST_F(SceneWriterTest, StoresInTurnKeepOneBufferForTheNewAnimation) {
     ModelBuilder b;
     for (const char* name : {"a", "b", "c"}) {
@@ -386,9 +381,8 @@ TEST_F(SceneWriterTest, CurvesStartAtZeroWithoutNegativeZeros) {
     }
 }
 
-// A one-kilobyte scene with one rotation key at 359,000 s driven for one second stays small; a
-// rotation that really turns over those 100 hours is refused, naming the file and the node,
-// and nothing is written.
+// A small scene with one rotation key at 359,000 s stays small when driven; a rotation turning
+// over those 100 hours is refused, naming the file and node, and nothing is written.
 TEST_F(SceneWriterTest, AFarKeyCostsNothingAndATooLongCurveIsRefused) {
     ModelBuilder b;
     int a = b.Node("a");

@@ -5,7 +5,6 @@
 #include <filesystem>
 
 #include "guitest/GuiTest.h"
-#include "scene/KLPoseSource.h"
 #include "scene/KLScene.h"
 #include "scene/KLWireSource.h"
 #include "scene/gl/KLSceneView.h"
@@ -17,22 +16,6 @@
 namespace {
 
 constexpr int kWidth = 240, kHeight = 180;
-
-// Sets one channel of one node unless held (as a static hook holds it).
-class SwitchablePose : public KLPoseSource {
-  public:
-    SwitchablePose(int node, int channel, double value)
-        : node_(node), channel_(channel), value_(value) {}
-    void Pose(KLWireSource*, CueTime, ScenePose* pose) override {
-        if (!held)
-            pose->Set(node_, channel_, value_);
-    }
-    bool held = false;
-
-  private:
-    int node_, channel_;
-    double value_;
-};
 
 // Pixels of a picture that are not the views' background, and the box around them.
 struct Coverage {
@@ -86,7 +69,6 @@ class SceneViewTest : public ::testing::Test {
         for (KLSceneView* view : views) {
             view->SetScene(nullptr);
             view->ForgetCamera();
-            view->SetEvaluationHooks(nullptr, nullptr, nullptr);
             view->Draw();
         }
         if (!getenv("CHIRRUP_VIEW_TEST_DUMP"))
@@ -170,25 +152,6 @@ TEST_F(SceneViewTest, TexturesOnOffAndWhilePlaying) {
     };
     EXPECT_GT(texel(0.25, 0.25)[0], 2 * texel(0.25, 0.25)[2]) << "top left texel is red";
     EXPECT_GT(texel(0.75, 0.25)[2], 2 * texel(0.75, 0.25)[0]) << "top right texel is blue";
-}
-
-// The evaluation hooks run around every draw: a view whose hook holds the animation shows the
-// rest pose while the other view shows the animation.
-TEST_F(SceneViewTest, HooksHoldTheKeyViewAtRest) {
-    testscenes::Sheet sheet;
-    sheet.columns = 4;
-    sheet.joints = 2;
-    Show(sheet);
-    const auto rest = Grab(views[1]);
-    auto pose = std::make_unique<SwitchablePose>(2, 1, 0.6);
-    SwitchablePose* source = pose.get();
-    scene->SetPoseSource(std::move(pose));
-    views[0]->SetEvaluationHooks([](void* s) { static_cast<SwitchablePose*>(s)->held = true; },
-                                 [](void* s) { static_cast<SwitchablePose*>(s)->held = false; },
-                                 source);
-    EXPECT_TRUE(SamePixels(*rest, *Grab(views[0])));
-    EXPECT_FALSE(source->held) << "released after the draw";
-    EXPECT_FALSE(SamePixels(*rest, *Grab(views[1])));
 }
 
 // The demo face in both views, filled and as a wire frame: the face covers a good part of
