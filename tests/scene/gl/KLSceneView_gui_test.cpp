@@ -79,8 +79,7 @@ class SceneViewTest : public ::testing::Test {
         ASSERT_TRUE(testscenes::WriteSheet(dir + "/sheet.gltf", sheet));
         Show((dir + "/sheet.gltf").c_str());
     }
-    // `room`: the camera backs away by that much from the framed distance.
-    void Show(const char* path, float room = 1.5f) {
+    void Show(const char* path) {
         wire = std::make_unique<KLWireSource>(path);
         ASSERT_TRUE(wire->Valid()) << wire->ErrorText();
         scene = std::make_unique<KLScene>();
@@ -89,7 +88,6 @@ class SceneViewTest : public ::testing::Test {
             view->SetScene(nullptr);
             view->Camera() = KLCamera();
             view->SetScene(scene.get());
-            view->Camera().distance *= room;  // room for what the tests lift
         }
     }
     std::unique_ptr<KLImageSGI> Grab(KLSceneView* view = views[0]) {
@@ -107,9 +105,8 @@ class SceneViewTest : public ::testing::Test {
 };
 KLSceneView* SceneViewTest::views[2] = {nullptr, nullptr};
 
-// Seen from behind, a one-sided sheet is dots, a wire frame, nothing (back faces culled) and
-// a filled sheet (both sides) in the four styles; seen from the front the two filled styles
-// agree.
+// From behind, a one-sided sheet is dots, a wire frame, nothing (culled) and filled (both
+// sides) in the four styles; from the front the two filled styles agree.
 TEST_F(SceneViewTest, FeedbackStylesDiffer) {
     testscenes::Sheet sheet;
     sheet.columns = sheet.rows = 6;
@@ -157,7 +154,7 @@ TEST_F(SceneViewTest, TexturesOnOffAndWhilePlaying) {
 // The demo face in both views, filled and as a wire frame: the face covers a good part of
 // the view, and the styles differ. Screenshots for people to look at.
 TEST_F(SceneViewTest, DemoFaceInBothViews) {
-    Show(CHIRRUP_SOURCE_DIR "/resources/demo/face.glb", 1.0f);
+    Show(CHIRRUP_SOURCE_DIR "/resources/demo/face.glb");
     EXPECT_TRUE(scene->LoadMessages().empty()) << scene->LoadMessages()[0];
     const char* names[] = {"points", "lines", "polygons", "polygonsboth"};
     long covered[4];
