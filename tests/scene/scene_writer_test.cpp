@@ -1,12 +1,11 @@
-// What the scene writer writes: the sampler of each case (interpolation, key count, times),
-// the tolerance of sampled curves at every frame and key, which clip and buffer the new data
-// goes to, what it leaves alone, and the bounds on what a small scene can make it write.
+// What the scene writer writes: samplers, tolerances, clips and buffers, what it leaves alone.
 #include <gtest/gtest.h>
 
 #include <algorithm>
 #include <cmath>
 #include <filesystem>
 #include <map>
+#include <stdexcept>
 
 #include "scene/EulerRotation.h"
 #include "scene/SamplerBuilder.h"
@@ -19,39 +18,52 @@
 namespace {
 class SceneWriterTest : public ::testing::Test {
   protected:
-    void SetUp() override {
-        dir = MakeTempDir();
-        CueTime::default_fps = 30;
-    }
     // Opens `builder`'s model saved as `name`.
     void Open(ModelBuilder& builder, const std::string& name = "in.gltf") {
         ASSERT_TRUE(builder.Save(dir + "/" + name,
                                  name.size() > 4 && name.substr(name.size() - 4) == ".glb"));
         ASSERT_TRUE(scene.Open(dir + "/" + name));
     }
-    // Stores the open scene as `name` and reads the result back.
+    // A scene of one empty node "a", opened; the node.
+    Node OneNode() {
+        ModelBuilder b;
+        b.Node("a");
+        Open(b);
+        return scene.Fetch("a");
+    }
+    // Stores the open scene as `name`, checks the file is valid and reads it back.
     std::shared_ptr<SceneDocument> StoreAndRead(const std::string& name = "out.gltf") {
         std::string error;
         out = dir + "/" + name;
         EXPECT_EQ(scene.source->Store(out.c_str()), 1);
+        ExpectValidGltf(out);
         auto back = SceneDocument::Load(out, &error);
-        EXPECT_TRUE(back) << error;
+        if (!back)  // fails the test: every caller reads what was written
+            throw std::runtime_error("cannot read back " + out + ": " + error);
         return back;
     }
-    std::string dir, out;
-    OpenScene scene;
+    std::string dir = MakeTempDir(), out;
+    OpenScene scene;  // 30 frames a second
 };
 
 const float kQ90X[] = {0.70710678f, 0, 0, 0.70710678f};
+
+// Keys at (time, value) that each hold their value until the next.
+std::vector<ChannelCurve::Key> StepKeys(const std::vector<std::pair<double, double>>& at) {
+    std::vector<ChannelCurve::Key> keys(at.size());
+    for (size_t k = 0; k < at.size(); ++k) {
+        keys[k].time = at[k].first;
+        keys[k].value = at[k].second;
+        keys[k].out = k + 1 < at.size() ? ChannelCurve::kStep : keys[k].out;
+    }
+    return keys;
+}
 }  // namespace
 
 // Translation keyed on every axis at one set of times is written as those keys: LINEAR when
 // every piece is straight, STEP when every one steps, CUBICSPLINE otherwise.
 TEST_F(SceneWriterTest, SharedKeyTimesAreWrittenAsTheKeys) {
-    ModelBuilder b;
-    b.Node("a");
-    Open(b);
-    Node a = scene.Fetch("a");
+    Node a = OneNode();
     struct Case {
         int in, out;
         const char* interpolation;
@@ -70,18 +82,12 @@ TEST_F(SceneWriterTest, SharedKeyTimesAreWrittenAsTheKeys) {
         EXPECT_EQ(w.interpolation, c.interpolation);
         EXPECT_EQ(w.times, (std::vector<float>{0, 0.25f, 7000 / 6000.0f}));
         EXPECT_EQ(w.values.size(), 3 * c.floatsPerKey);
-        ExpectValidGltf(out);
         ASSERT_TRUE(scene.Open(out));
         a = scene.Fetch("a");
     }
     // Steps: the document has no step tangent code, so set one through the curve.
-    ChannelCurve::Key k0, k1;
-    k0.out = ChannelCurve::kStep;
-    k0.value = 1;
-    k1.time = 0.5;
-    k1.value = 2;
     for (int axis = 0; axis < 3; ++axis) {
-        scene.source->document()->SetCurve(0, axis, {k0, k1}, true);
+        scene.source->document()->SetCurve(0, axis, StepKeys({{0, 1}, {0.5, 2}}), true);
     }
     Written w = WrittenSampler(StoreAndRead()->model(), 0, "translation");
     EXPECT_EQ(w.interpolation, "STEP");
@@ -108,7 +114,6 @@ TEST_F(SceneWriterTest, PathsKeyedAtTheSameTimesShareTheirTimes) {
         }
     }
     auto back = StoreAndRead();
-    ASSERT_TRUE(back);
     const tinygltf::Model& m = back->model();
     std::map<std::string, int> input;  // node name and path to the sampler's input accessor
     for (const tinygltf::Animation& anim : m.animations) {
@@ -124,20 +129,15 @@ TEST_F(SceneWriterTest, PathsKeyedAtTheSameTimesShareTheirTimes) {
         EXPECT_NEAR(back->Curve(n, 0)->Evaluate(0.5 + shifts[n] / 6000.0), n + 1, 1e-6);
         EXPECT_NEAR(back->Curve(n, 4)->Evaluate(0.5 + shifts[n] / 6000.0), n + 1, 1e-3);
     }
-    ExpectValidGltf(out);
 }
 
 // Axes keyed at different times are cut at the union of the key times as cubic pieces: exact
 // at every frame, and no more keys than the union.
 TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) {
-    ModelBuilder b;
-    b.Node("a");
-    Open(b);
-    Node a = scene.Fetch("a");
+    Node a = OneNode();
     ASSERT_EQ(StoreKeys(a.get(), 0, {{0, 0, 0, 0}, {3000, 4, 0, 0}, {6000, 1, 0, 0}}), 1);
     ASSERT_EQ(StoreKeys(a.get(), 2, {{1000, 2, 1, 1}, {9000, -3, 1, 1}}), 1);
     auto back = StoreAndRead();
-    ASSERT_TRUE(back);
     Written w = WrittenSampler(back->model(), 0, "translation");
     EXPECT_EQ(w.interpolation, "CUBICSPLINE");
     EXPECT_EQ(w.times, (std::vector<float>{0, 1000 / 6000.0f, 0.5f, 1, 1.5f}));
@@ -149,7 +149,6 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
                 << "channel " << c << " frame " << f;
         }
     }
-    ExpectValidGltf(out);
     // An axis that holds one value at key times of its own adds none of them: the moving
     // axis's keys alone, exact, with the held axis at its value throughout.
     ASSERT_TRUE(scene.Open(out));
@@ -157,7 +156,6 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
     ASSERT_EQ(StoreKeys(a.get(), 0, {{0, 0, 0, 0}, {3000, 4, 0, 0}, {6000, 1, 0, 0}}), 1);
     ASSERT_EQ(StoreKeys(a.get(), 2, {{1000, 2, 1, 1}, {2500, 2, 2, 0}, {9000, 2, 0, 1}}), 1);
     back = StoreAndRead();
-    ASSERT_TRUE(back);
     w = WrittenSampler(back->model(), 0, "translation");
     EXPECT_EQ(w.interpolation, "CUBICSPLINE");
     EXPECT_EQ(w.times, (std::vector<float>{0, 0.5f, 1}));
@@ -167,33 +165,20 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
             << "frame " << f;
         ASSERT_NEAR(back->Curve(0, 2)->eval(f), 2, 1e-6) << "frame " << f;
     }
-    ExpectValidGltf(out);
 }
 
 // Sampled curves (rotation; translation mixing steps with axes at other times) stay within
-// the stated tolerance at every frame and every key, with fewer samples than frames where the
-// curve allows it.
+// tolerance at every frame and key, with fewer samples than frames.
 TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
-    ModelBuilder b;
-    b.Node("a");
-    Open(b);
-    Node a = scene.Fetch("a");
+    Node a = OneNode();
     // A steady turn about X over 20 s (600 frames), a smooth swing about Y for the first 5 s,
     // a quick one about Z in the first frame.
     ASSERT_EQ(StoreKeys(a.get(), 3, {{0, 0, 1, 1}, {120000, 170, 1, 1}}), 1);
     ASSERT_EQ(StoreKeys(a.get(), 4, {{0, 10, 0, 0}, {15000, 95, 0, 0}, {30000, 5, 0, 0}}), 1);
     ASSERT_EQ(StoreKeys(a.get(), 5, {{0, 0, 0, 2}, {100, 30, 2, 2}}), 1);
-    ChannelCurve::Key s0, s1, s2;
-    s0.out = ChannelCurve::kStep;
-    s1.time = 2.0;
-    s1.value = 5;
-    s2.time = 3.5;
-    s2.value = 1;
-    scene.source->document()->SetCurve(0, 0, {s0, s1, s2}, true);  // TX steps
+    scene.source->document()->SetCurve(0, 0, StepKeys({{0, 0}, {2, 5}, {3.5, 1}}), true);
     ASSERT_EQ(StoreKeys(a.get(), 1, {{0, 0, 0, 0}, {9000, 2, 0, 0}, {24000, -1, 0, 0}}), 1);
     auto back = StoreAndRead();
-    ASSERT_TRUE(back);
-    ExpectValidGltf(out);
     const SceneDocument& doc = *scene.source->document();
     Written rot = WrittenSampler(back->model(), 0, "rotation");
     Written pos = WrittenSampler(back->model(), 0, "translation");
@@ -204,8 +189,7 @@ TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
     // Every frame, and every key of the path's own axes.
     std::vector<double> checks[2];
     for (int f = 0; f <= 630; ++f) {
-        checks[0].push_back(f / 30.0);
-        checks[1].push_back(f / 30.0);
+        checks[0].push_back(f / 30.0), checks[1].push_back(f / 30.0);
     }
     for (int c : {0, 1, 3, 4, 5}) {
         for (const ChannelCurve::Key& k : doc.Curve(0, c)->keys()) {
@@ -246,22 +230,9 @@ TEST_F(SceneWriterTest, ABufferLeftEmptyIsRemoved) {
     tinygltf::Primitive prim;
     prim.attributes["POSITION"] = b.Floats({0, 0, 0, 1, 0, 0, 0, 1, 0}, 3, 0, true);
     prim.attributes["WEIGHTS_0"] = b.Floats({1, 0, 0, 0, 0, 1, 0, 0, 1, 0, 0, 0}, 4);
-    std::vector<unsigned short> joints = {0, 0, 0, 0, 0, 1, 0, 0, 0, 0, 0, 0};
-    std::vector<unsigned char>& data = b.m.buffers[0].data;
-    tinygltf::BufferView jv;
-    jv.buffer = 0;
-    jv.byteOffset = data.size();
-    jv.byteLength = joints.size() * 2;
-    const unsigned char* p = reinterpret_cast<const unsigned char*>(joints.data());
-    data.insert(data.end(), p, p + jv.byteLength);
-    b.m.bufferViews.push_back(jv);
-    tinygltf::Accessor ja;
-    ja.bufferView = int(b.m.bufferViews.size()) - 1;
-    ja.componentType = TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT;
-    ja.type = TINYGLTF_TYPE_VEC4;
-    ja.count = 3;
-    b.m.accessors.push_back(ja);
-    prim.attributes["JOINTS_0"] = int(b.m.accessors.size()) - 1;
+    const unsigned short joints[] = {0, 0, 0, 0, 0, 1, 0, 0, 0, 0, 0, 0};
+    prim.attributes["JOINTS_0"] =
+        b.Accessor(joints, 3, 4, TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT, 2);
     prim.mode = TINYGLTF_MODE_TRIANGLES;
     b.m.meshes.emplace_back();
     b.m.meshes[0].primitives.push_back(prim);
@@ -271,7 +242,6 @@ TEST_F(SceneWriterTest, ABufferLeftEmptyIsRemoved) {
     Open(b);
     ASSERT_EQ(StoreKeys(scene.Fetch("bone").get(), 3, {{0, 0, 1, 1}, {6000, 45, 1, 1}}), 1);
     auto back = StoreAndRead();
-    ASSERT_TRUE(back);
     // The old animation's buffer is gone; the scene's and the new animation's remain.
     ASSERT_EQ(back->model().buffers.size(), 2u);
     for (const tinygltf::Buffer& buffer : back->model().buffers) {
@@ -281,7 +251,6 @@ TEST_F(SceneWriterTest, ABufferLeftEmptyIsRemoved) {
     Written w = WrittenSampler(back->model(), bone, "rotation");
     ASSERT_EQ(w.channels, 1);
     EXPECT_NEAR(back->Curve(bone, 3)->Evaluate(1), 45, 1e-3);
-    ExpectValidGltf(out);
 }
 
 // A path animated in the second clip: the applied curve replaces it there, and the channel on
@@ -296,7 +265,6 @@ TEST_F(SceneWriterTest, ADrivenPathEndsInTheFirstClipThatAnimatedItAndNowhereEls
     Open(b);
     ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 1, {{0, 0, 1, 1}, {6000, 7, 1, 1}}), 1);
     auto back = StoreAndRead();
-    ASSERT_TRUE(back);
     const tinygltf::Model& m = back->model();
     Written w = WrittenSampler(m, a, "translation");
     EXPECT_EQ(w.channels, 1);
@@ -306,7 +274,6 @@ TEST_F(SceneWriterTest, ADrivenPathEndsInTheFirstClipThatAnimatedItAndNowhereEls
     EXPECT_EQ(WrittenSampler(m, c, "scale").values, (std::vector<float>{1, 1, 1, 2, 2, 2}));
     EXPECT_NEAR(back->Curve(a, 0)->Evaluate(1), 1, 1e-6);  // TX as clip1 had it
     EXPECT_NEAR(back->Curve(a, 1)->Evaluate(1), 7, 1e-6);
-    ExpectValidGltf(out);
 }
 
 // A chain driven in one axis of one path: its other paths are written back as they were read.
@@ -321,12 +288,10 @@ TEST_F(SceneWriterTest, PathsNotDrivenAreWrittenBackAsRead) {
     Open(b);
     ASSERT_EQ(StoreKeys(scene.Fetch("b3").get(), 2, {{0, 0, 1, 1}, {6000, 1, 1, 1}}), 1);
     auto back = StoreAndRead();
-    ASSERT_TRUE(back);
     Written rot = WrittenSampler(back->model(), bone, "rotation");
     EXPECT_EQ(rot.times, (std::vector<float>{0, 1, 2}));
     EXPECT_EQ(rot.values, q);
     EXPECT_EQ(WrittenSampler(back->model(), bone, "translation").times.size(), 2u);
-    ExpectValidGltf(out);
 }
 
 // A .glb carries every buffer and embedded image in its binary chunk.
@@ -347,7 +312,6 @@ TEST_F(SceneWriterTest, AGlbHoldsEveryBufferAndImageInItsBinaryChunk) {
     Open(b, "in.glb");
     ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 0, {{0, 0, 1, 1}, {6000, 1, 1, 1}}), 1);
     auto back = StoreAndRead("out.glb");
-    ASSERT_TRUE(back);
     const tinygltf::Model& m = back->model();
     ASSERT_EQ(m.buffers.size(), 1u);
     EXPECT_TRUE(m.buffers[0].uri.empty());
@@ -356,13 +320,10 @@ TEST_F(SceneWriterTest, AGlbHoldsEveryBufferAndImageInItsBinaryChunk) {
     EXPECT_EQ(m.images[0].mimeType, "image/png");
     EXPECT_EQ(ReadFile(out).find("data:"), std::string::npos);
     EXPECT_EQ(WrittenSampler(m, a, "scale").values, (std::vector<float>{1, 1, 1, 2, 2, 2}));
-    ExpectValidGltf(out);
 }
 
-// The same open scene stored as .glb, again as .glb with other keys, then as .gltf with only
-// one node driven anew: each file is valid and holds the last applied values, a .glb one buffer,
-// and the .gltf the scene's own buffer, one with what the second store wrote for the nodes not
-// driven again, and one with the last store's bytes.
+// One open scene stored twice as .glb, then as .gltf with one node driven anew: each holds the
+// last applied values; a .glb one buffer, the .gltf the scene's, the second store's and its own.
 TEST_F(SceneWriterTest, StoresInTurnKeepOneBufferForTheNewAnimation) {
     ModelBuilder b;
     for (const char* name : {"a", "b", "c"}) {
@@ -386,8 +347,6 @@ TEST_F(SceneWriterTest, StoresInTurnKeepOneBufferForTheNewAnimation) {
             last[n] = pass;
         }
         auto back = StoreAndRead(pass < 2 ? "out.glb" : "out.gltf");
-        ASSERT_TRUE(back);
-        ExpectValidGltf(out);
         EXPECT_EQ(back->model().buffers.size(), pass < 2 ? 1u : buffersRead + 2) << "pass " << pass;
         for (int n = 0; n < 3; ++n) {
             for (int channel : {0, 1, 5}) {
@@ -401,10 +360,7 @@ TEST_F(SceneWriterTest, StoresInTurnKeepOneBufferForTheNewAnimation) {
 // Keys before time 0 are cut off: the curve starts at 0 with its value there. No time or
 // minimum is written as -0.
 TEST_F(SceneWriterTest, CurvesStartAtZeroWithoutNegativeZeros) {
-    ModelBuilder b;
-    b.Node("a");
-    Open(b);
-    Node a = scene.Fetch("a");
+    Node a = OneNode();
     ASSERT_EQ(StoreKeys(a.get(), 0, {{-6000, 0, 1, 1}, {-3000, 1, 1, 1}, {3000, 3, 1, 1}}), 1);
     const ChannelCurve* tx = scene.source->document()->Curve(0, 0);
     ASSERT_EQ(tx->keys().size(), 2u);
@@ -413,7 +369,6 @@ TEST_F(SceneWriterTest, CurvesStartAtZeroWithoutNegativeZeros) {
     EXPECT_NEAR(tx->Evaluate(0.25), 2.5, 1e-9);
     ASSERT_EQ(StoreKeys(a.get(), 3, {{-1, 0, 0, 0}, {3000, 30, 0, 0}}), 1);
     auto back = StoreAndRead();
-    ASSERT_TRUE(back);
     for (const char* path : {"translation", "rotation"}) {
         Written w = WrittenSampler(back->model(), 0, path);
         ASSERT_FALSE(w.times.empty());
@@ -424,12 +379,10 @@ TEST_F(SceneWriterTest, CurvesStartAtZeroWithoutNegativeZeros) {
             EXPECT_FALSE(std::signbit(v) && v == 0);
         }
     }
-    ExpectValidGltf(out);
 }
 
-// A one-kilobyte scene with one rotation key at 359,000 s driven for one second stays small; a
-// rotation that really turns over those 100 hours is refused, naming the file and the node,
-// and nothing is written.
+// A small scene with one rotation key at 359,000 s stays small when driven; a rotation turning
+// over those 100 hours is refused, naming the file and node, and nothing is written.
 TEST_F(SceneWriterTest, AFarKeyCostsNothingAndATooLongCurveIsRefused) {
     ModelBuilder b;
     int a = b.Node("a");
@@ -438,11 +391,9 @@ TEST_F(SceneWriterTest, AFarKeyCostsNothingAndATooLongCurveIsRefused) {
     EXPECT_LT(ReadFile(dir + "/in.gltf").size(), 1500u);
     ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 4, {{0, 0, 1, 1}, {6000, 20, 1, 1}}), 1);
     auto back = StoreAndRead();
-    ASSERT_TRUE(back);
     EXPECT_LT(ReadFile(out).size(), 4000u);
     EXPECT_NEAR(back->Curve(a, 4)->Evaluate(0.5), 10, 1e-3);
     EXPECT_NEAR(back->Curve(a, 3)->Evaluate(100000), 90, 1e-3);
-    ExpectValidGltf(out);
 
     ModelBuilder turning;
     a = turning.Node("a");

@@ -1,7 +1,5 @@
 #pragma once
 
-// What a store wrote for one node path, read back raw from the file's model, and its value at
-// any time as players read it.
 #include <gtest/gtest.h>
 
 #include <cmath>

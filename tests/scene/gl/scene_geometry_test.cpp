@@ -2,7 +2,6 @@
 
 #include <cmath>
 #include <cstring>
-#include <filesystem>
 #include <limits>
 
 #include "scene/KLPoseSource.h"
@@ -11,6 +10,7 @@
 #include "scene/SceneDeformer.h"
 #include "scene/SceneDocument.h"
 #include "scene/gl/TestScenes.h"
+#include "testkit/TempDir.h"
 
 namespace {
 
@@ -30,13 +30,6 @@ class FixedPose : public KLPoseSource {
 
 class SceneGeometryTest : public ::testing::Test {
   protected:
-    SceneGeometryTest() {
-        const auto* info = ::testing::UnitTest::GetInstance()->current_test_info();
-        dir = std::string(CHIRRUP_BINARY_DIR) + "/test-tmp/scene-gl/" + info->name();
-        std::filesystem::remove_all(dir);
-        std::filesystem::create_directories(dir);
-    }
-    ~SceneGeometryTest() override { std::filesystem::remove_all(dir); }
     void Load(const testscenes::Sheet& sheet, const char* name = "sheet.glb") {
         const std::string path = dir + "/" + name;
         ASSERT_TRUE(testscenes::WriteSheet(path, sheet));
@@ -50,7 +43,8 @@ class SceneGeometryTest : public ::testing::Test {
         const float* p = item.positions + v * 3;
         return item.world.TransformPoint(Vec3(p[0], p[1], p[2]));
     }
-    std::string dir;
+    testkit::TempDir tmp;
+    const std::string dir = tmp.path();
     std::unique_ptr<KLWireSource> wire;
     KLScene scene;
 };

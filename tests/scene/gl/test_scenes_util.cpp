@@ -1,6 +1,5 @@
 #include <algorithm>
 #include <cmath>
-#include <cstring>
 
 #include <tiny_gltf.h>
 
@@ -10,70 +9,14 @@
 namespace testscenes {
 namespace {
 
-// Appends `data` to buffer 0 as a new buffer view and accessor; returns the accessor.
-template <typename T>
-int add_accessor(GltfModelBuilder& b, const std::vector<T>& data, int componentType, int type,
-                 int target, bool minMax = false) {
-    const int per = tinygltf::GetNumComponentsInType(uint32_t(type));
-    const std::vector<float> bounds(data.begin(), data.end());
-    return b.Accessor(data.data(), data.size() / size_t(per), per, componentType, int(sizeof(T)), 0,
-                      std::max(target, 0), minMax ? &bounds : nullptr);
-}
+// A 2 x 2 PNG checker: red, blue / blue, red.
+const unsigned char kChecker[] = {
+    0x89, 0x50, 0x4e, 0x47, 0x0d, 0x0a, 0x1a, 0x0a, 0x00, 0x00, 0x00, 0x0d, 0x49, 0x48, 0x44,
+    0x52, 0x00, 0x00, 0x00, 0x02, 0x00, 0x00, 0x00, 0x02, 0x08, 0x06, 0x00, 0x00, 0x00, 0x72,
+    0xb6, 0x0d, 0x24, 0x00, 0x00, 0x00, 0x12, 0x49, 0x44, 0x41, 0x54, 0x78, 0xda, 0x63, 0xf8,
+    0xcf, 0xc0, 0x00, 0x42, 0x40, 0x0c, 0x24, 0x40, 0x2c, 0x00, 0x43, 0xce, 0x07, 0xf9, 0xe9,
+    0x06, 0xd5, 0x19, 0x00, 0x00, 0x00, 0x00, 0x49, 0x45, 0x4e, 0x44, 0xae, 0x42, 0x60, 0x82};
 
-// A PNG file of `width` x `height` RGBA pixels, compressed with stored (uncompressed) deflate
-// blocks: enough for the tiny test textures.
-std::vector<unsigned char> png_of(int width, int height, const std::vector<unsigned char>& rgba) {
-    auto crc = [](const unsigned char* p, size_t n) {
-        uint32_t c = 0xffffffffu;
-        for (size_t i = 0; i < n; ++i) {
-            c ^= p[i];
-            for (int k = 0; k < 8; ++k) {
-                c = c & 1 ? 0xedb88320u ^ (c >> 1) : c >> 1;
-            }
-        }
-        return c ^ 0xffffffffu;
-    };
-    auto be32 = [](std::vector<unsigned char>& out, uint32_t v) {
-        out.insert(out.end(), {uint8_t(v >> 24), uint8_t(v >> 16), uint8_t(v >> 8), uint8_t(v)});
-    };
-    std::vector<unsigned char> png = {0x89, 'P', 'N', 'G', '\r', '\n', 0x1a, '\n'};
-    auto chunk = [&](const char* type, const std::vector<unsigned char>& data) {
-        be32(png, uint32_t(data.size()));
-        std::vector<unsigned char> body(type, type + 4);
-        body.insert(body.end(), data.begin(), data.end());
-        png.insert(png.end(), body.begin(), body.end());
-        be32(png, crc(body.data(), body.size()));
-    };
-    std::vector<unsigned char> header;
-    be32(header, uint32_t(width));
-    be32(header, uint32_t(height));
-    header.insert(header.end(), {8, 6, 0, 0, 0});  // 8-bit RGBA
-    chunk("IHDR", header);
-    std::vector<unsigned char> raw;
-    for (int y = 0; y < height; ++y) {
-        raw.push_back(0);  // no filter
-        raw.insert(raw.end(), rgba.begin() + y * width * 4, rgba.begin() + (y + 1) * width * 4);
-    }
-    std::vector<unsigned char> z = {0x78,
-                                    0x01,
-                                    1,
-                                    uint8_t(raw.size()),
-                                    uint8_t(raw.size() >> 8),
-                                    uint8_t(~raw.size()),
-                                    uint8_t(~raw.size() >> 8)};
-    z.insert(z.end(), raw.begin(), raw.end());
-    uint32_t a = 1, b = 0;
-    for (unsigned char c : raw) {
-        a = (a + c) % 65521;
-        b = (b + a) % 65521;
-    }
-    be32(z, (b << 16) | a);
-    chunk("IDAT", z);
-    chunk("IEND", {});
-    return png;
-}
-
-constexpr int kFloat = TINYGLTF_COMPONENT_TYPE_FLOAT;
 constexpr int kArray = TINYGLTF_TARGET_ARRAY_BUFFER;
 constexpr int kElements = TINYGLTF_TARGET_ELEMENT_ARRAY_BUFFER;
 
@@ -112,14 +55,14 @@ tinygltf::Primitive sheet_primitive(GltfModelBuilder& builder, const Sheet& s, f
     tinygltf::Primitive p;
     p.mode = TINYGLTF_MODE_TRIANGLES;
     p.material = 0;
-    p.attributes["POSITION"] = add_accessor(builder, pos, kFloat, TINYGLTF_TYPE_VEC3, kArray, true);
-    p.attributes["NORMAL"] = add_accessor(builder, nrm, kFloat, TINYGLTF_TYPE_VEC3, kArray);
-    p.attributes["TEXCOORD_0"] = add_accessor(builder, uv, kFloat, TINYGLTF_TYPE_VEC2, kArray);
+    p.attributes["POSITION"] = builder.Floats(pos, 3, 0, true, kArray);
+    p.attributes["NORMAL"] = builder.Floats(nrm, 3, 0, false, kArray);
+    p.attributes["TEXCOORD_0"] = builder.Floats(uv, 2, 0, false, kArray);
     if (skinned) {
-        p.attributes["JOINTS_0"] = add_accessor(
-            builder, joints, TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT, TINYGLTF_TYPE_VEC4, kArray);
-        p.attributes["WEIGHTS_0"] =
-            add_accessor(builder, weights, kFloat, TINYGLTF_TYPE_VEC4, kArray);
+        p.attributes["JOINTS_0"] =
+            builder.Accessor(joints.data(), joints.size() / 4, 4,
+                             TINYGLTF_COMPONENT_TYPE_UNSIGNED_SHORT, 2, 0, kArray);
+        p.attributes["WEIGHTS_0"] = builder.Floats(weights, 4, 0, false, kArray);
     }
     if (morphed) {
         for (int k = 0; k < s.morphTargets; ++k) {
@@ -132,12 +75,11 @@ tinygltf::Primitive sheet_primitive(GltfModelBuilder& builder, const Sheet& s, f
                     delta[v + 2] = 0.5f;
                 }
             }
-            p.targets.push_back({{"POSITION", add_accessor(builder, delta, kFloat,
-                                                           TINYGLTF_TYPE_VEC3, kArray, true)}});
+            p.targets.push_back({{"POSITION", builder.Floats(delta, 3, 0, true, kArray)}});
         }
     }
-    p.indices = add_accessor(builder, idx, TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT,
-                             TINYGLTF_TYPE_SCALAR, kElements);
+    p.indices = builder.Accessor(idx.data(), idx.size(), 1, TINYGLTF_COMPONENT_TYPE_UNSIGNED_INT, 4,
+                                 0, kElements);
     return p;
 }
 
@@ -151,24 +93,11 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
 
     tinygltf::Material material;
     material.name = "sheet";
-    material.pbrMetallicRoughness.baseColorFactor = {s.colour[0], s.colour[1], s.colour[2],
-                                                     s.colour[3]};
-    if (s.texture || s.corruptTexture) {
+    material.pbrMetallicRoughness.baseColorFactor = {0.9, 0.6, 0.2, 1.0};
+    if (s.texture) {
         tinygltf::Image image;
         image.mimeType = "image/png";
-        const char junk[] = "this is not a picture";
-        const std::vector<unsigned char> bytes =
-            s.corruptTexture ? std::vector<unsigned char>(junk, junk + sizeof junk)
-                             : png_of(2, 2,
-                                      {255, 0, 0, 255, 0, 0, 255, 255,  //
-                                       0, 0, 255, 255, 255, 0, 0, 255});
-        image.bufferView = int(m.bufferViews.size());
-        tinygltf::BufferView view;
-        view.buffer = 0;
-        view.byteOffset = m.buffers[0].data.size();
-        view.byteLength = bytes.size();
-        m.buffers[0].data.insert(m.buffers[0].data.end(), bytes.begin(), bytes.end());
-        m.bufferViews.push_back(view);
+        image.bufferView = builder.View(kChecker, sizeof kChecker);
         m.images.push_back(image);
         tinygltf::Texture texture;
         texture.source = 0;
@@ -219,7 +148,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
             const float mat[16] = {1, 0, 0, 0, 0, 1, 0, 0, 0, 0, 1, 0, -x, 0, 0, 1};
             inverse.insert(inverse.end(), mat, mat + 16);
         }
-        skin.inverseBindMatrices = add_accessor(builder, inverse, kFloat, TINYGLTF_TYPE_MAT4, -1);
+        skin.inverseBindMatrices = builder.Floats(inverse, 16);
         skin.skeleton = skin.joints[0];
         m.skins.push_back(skin);
         m.nodes[0].skin = 0;
@@ -231,7 +160,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
         for (int f = 0; f < s.animatedFrames; ++f) {
             times.push_back(float(f) / 30.0f);
         }
-        const int input = add_accessor(builder, times, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
+        const int input = builder.Floats(times, 1, 0, true);
         for (int j = 0; j < s.joints; ++j) {
             std::vector<float> quats;
             for (int f = 0; f < s.animatedFrames; ++f) {
@@ -240,7 +169,7 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
             }
             tinygltf::AnimationSampler sampler;
             sampler.input = input;
-            sampler.output = add_accessor(builder, quats, kFloat, TINYGLTF_TYPE_VEC4, -1);
+            sampler.output = builder.Floats(quats, 4);
             sampler.interpolation = "STEP";
             anim.samplers.push_back(sampler);
             tinygltf::AnimationChannel channel;
@@ -255,9 +184,8 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
         tinygltf::Animation anim;
         anim.name = "weights";
         tinygltf::AnimationSampler sampler;
-        sampler.input =
-            add_accessor(builder, s.weightTimes, kFloat, TINYGLTF_TYPE_SCALAR, -1, true);
-        sampler.output = add_accessor(builder, s.weightValues, kFloat, TINYGLTF_TYPE_SCALAR, -1);
+        sampler.input = builder.Floats(s.weightTimes, 1, 0, true);
+        sampler.output = builder.Floats(s.weightValues, 1);
         sampler.interpolation = "LINEAR";
         anim.samplers.push_back(sampler);
         tinygltf::AnimationChannel channel;
@@ -266,21 +194,6 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
         channel.target_path = "weights";
         anim.channels.push_back(channel);
         m.animations.push_back(anim);
-    }
-    if (!s.headLightOnly) {
-        tinygltf::Light light;
-        light.type = "directional";
-        light.color = {1, 0, 0};
-        light.intensity = 1;
-        m.lights.push_back(light);
-        tinygltf::Node lightNode;
-        lightNode.name = "sun";
-        tinygltf::Value::Object ext;
-        ext["light"] = tinygltf::Value(0);
-        lightNode.extensions["KHR_lights_punctual"] = tinygltf::Value(ext);
-        m.nodes.push_back(lightNode);
-        scene.nodes.push_back(int(m.nodes.size()) - 1);
-        m.extensionsUsed.push_back("KHR_lights_punctual");
     }
     m.scenes.push_back(scene);
     m.defaultScene = 0;
