@@ -111,6 +111,7 @@ TEST_F(ApplyDialogTest, OpeningTheApplyFileFillsTheDialog) {
     XmTextFieldSetString(out, const_cast<char*>("100000"));
     XtCallCallbacks(out, XmNactivateCallback, nullptr);
     EXPECT_EQ(theImp.applyEvent->sourceOut, theImp.duration);
+    guitest::Screenshot("window-apply-dialog");
 
     // Apply without a dag node or a keyset selected: told, and the dialog stays.
     for (bool withDag : {false, true}) {

@@ -142,6 +142,7 @@ TEST(WindowTest, QuitAsksAboutModifiedFiles) {
     unsetenv("VX_NOCONFIRM");
     ASSERT_NE(gnome.shownKeyset, nullptr) << "the loaded keyset is shown";
     EXPECT_EQ(int(guitest::Children(W("keySetsMenu")).size()), theImp.keysetCount);
+    guitest::Screenshot("window-demo-keyset");
 
     // Modified with VX_NOCONFIRM: ends at once (unmodified, the end-to-end run quits with 0).
     theImp.keysetModified = theImp.trackModified = 1;

@@ -79,6 +79,7 @@ TEST_F(InfoTest, ErrorFlagTurnsSolidOnALoggedErrorAndClearsWhenTheLogIsViewed) {
     KLError("Something went wrong in a test.\n");
     XtVaGetValues(flag, XmNbackground, &background, nullptr);
     EXPECT_EQ(background, foreground);
+    guitest::Screenshot("window-error-flag");
     // Viewed with a viewer that does nothing.
     setenv("TESSEL_USER_ERROR_READER", "true", 1);
     Gnome::view_errors_cb(nullptr, nullptr, nullptr);
@@ -99,6 +100,7 @@ TEST_F(InfoTest, AdjustRelLoadFillsTheDialogAndCopiesBackTheAnswer) {
         XmTextFieldSetString(KLXmGnome::FindWidget("refPrefix"), const_cast<char*>("pix/ref."));
         XmTextFieldSetString(KLXmGnome::FindWidget("refEnd"), const_cast<char*>("48"));
         XmTextFieldSetString(KLXmGnome::FindWidget("refBy"), const_cast<char*>("3"));
+        guitest::Screenshot("window-reference-dialog");
         return guitest::ClickWhenViewable(ok);
     }});
     EXPECT_EQ(gnome->AdjustRelLoad(&prefix, &ext, &start, &end, &by, &zoom), 1);
