@@ -5,6 +5,7 @@
 
 #include "scene/ChannelCurve.h"
 #include "scene/EulerRotation.h"
+#include "scene/EulerSpline.h"
 #include "scene/SampleReducer.h"
 #include "scene/TurnSpline.h"
 
@@ -138,6 +139,10 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
         TurnSpline(*curves_[moving], moving, rest_)
             .Build(kRotationToleranceDegrees * kFitShare, kMaxSampledFrames, out)) {
         return true;  // cubic pieces at the turning axis's keys
+    }
+    if (movingAxes > 1 && EulerSpline(curves_, rest_)
+                              .Build(kRotationToleranceDegrees * kFitShare, sampledAtMost(), out)) {
+        return true;  // cubic pieces at the union of the axes' keys
     }
     // With one turning axis a straight span of it is followed exactly (see below), as long as
     // it turns by less than half a turn, which a piece would go the other way round.
@@ -277,6 +282,21 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
             v[6 + a] = stored(leave[a][k]);
         }
     }
+}
+
+size_t SamplerBuilder::sampledAtMost() const {
+    // The whole frames from the first key to the last, and the keys of the most keyed axis
+    // (those of the others mostly share their times or sit on frames).
+    double first = HUGE_VAL, last = -HUGE_VAL, keys = 0;
+    for (const ChannelCurve* c : curves_) {
+        if (c) {
+            first = std::min(first, c->keys().front().time);
+            last = std::max(last, c->keys().back().time);
+            keys = std::max(keys, double(c->keys().size()));
+        }
+    }
+    const double frames = std::floor(last * fps_) - std::ceil(first * fps_) + 1;
+    return size_t(std::min(double(kMaxSampledFrames), std::max(0.0, frames) + keys));
 }
 
 std::vector<double> SamplerBuilder::unionTimes() const {

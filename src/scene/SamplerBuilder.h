@@ -34,7 +34,10 @@ struct BuiltSampler {
 //   - rotation turning about one axis between fixed ones, without steps: CUBICSPLINE
 //     quaternions at that axis's keys, a piece cut into equal parts where a bound on its error
 //     exceeds kRotationToleranceDegrees (see TurnSpline);
-//   - any other rotation (and a turn that steps, or that float times would move too far), and
+//   - rotation turning about more axes, without steps: the same at the union of the axes' key
+//     times (see EulerSpline), unless that needs more knots than the frames and keys sampling
+//     would look at (samples then make the smaller file);
+//   - any other rotation (one that steps, or that float times would move too far), and
 //     translation or scale mixing steps with axes keyed at different times: LINEAR samples
 //     taken from the keys and the whole frames between them, reduced to few that keep the
 //     written curve within kVectorTolerance (units) or kRotationToleranceDegrees (the angle
@@ -65,6 +68,8 @@ class SamplerBuilder {
     bool sharedTimes() const;
     void keysExact(BuiltSampler* out) const;
     void unionCubic(BuiltSampler* out) const;
+    // About how many frames and keys sampling would look at (kMaxSampledFrames at most).
+    size_t sampledAtMost() const;
     // Every axis key time, ascending, one per distinct float.
     std::vector<double> unionTimes() const;
     // The union key times plus the whole frames inside every span that is not plain (see

@@ -4,14 +4,12 @@
 #include <cmath>
 
 #include "scene/ChannelCurve.h"
+#include "scene/PieceBound.h"
 #include "scene/SamplerBuilder.h"
 
 namespace {
 constexpr double kPi = 3.14159265358979323846;
-constexpr double kHalfRadians = kPi / 360;          // half-angle radians per degree
-constexpr double kHalfFloatStep = 1.0 / (1 << 24);  // of a float, relative to its size
-constexpr double kBy384 = 1.0 / 384;
-constexpr double kRoot2 = 1.4142135623730951;
+constexpr double kHalfRadians = kPi / 360;  // half-angle radians per degree
 
 // Stored floats: a negative zero is written as zero.
 float stored(double v) {
@@ -40,42 +38,6 @@ TurnSpline::TurnSpline(const ChannelCurve& curve, int axis, const double angles[
     }
 }
 
-int TurnSpline::partsFor(double t0, double t1, double p0, double p1, double m0, double m1,
-                         double allowedRadians) {
-    const double dt = t1 - t0;
-    const double b = 3 * (p1 - p0) - 2 * m0 - m1, a = 2 * (p0 - p1) + m0 + m1;
-    // Bounds on the first three derivatives (by u) of the half-angle over the piece.
-    double first = std::max(std::fabs(m0), std::fabs(m1));
-    if (b * (b + 3 * a) < 0) {
-        // The second derivative 2b + 6au changes sign inside: the first peaks there.
-        const double u = -b / (3 * a);
-        first = std::max(first, std::fabs(m0 + 2 * b * u + 3 * a * u * u));
-    }
-    const double second = std::max(std::fabs(2 * b), std::fabs(2 * b + 6 * a));
-    const double third = std::fabs(6 * a);
-    // The knots' times are floats: a piece may sit up to half a float step off at either end,
-    // moving what a player reads by the turning speed times that (and its tangents a little).
-    const double drift = std::max(std::fabs(t0), std::fabs(t1)) * kHalfFloatStep * 2.6 * first / dt;
-    for (int parts = 1; parts <= kMaxParts; ++parts) {
-        const double A = parts == 1 ? first : first / parts,
-                     B = parts == 1 ? second : second / (parts * parts),
-                     C = parts == 1 ? third : third / (parts * parts * parts);
-        // A cubic Hermite piece of z = exp(i h) misses by at most (du^4 / 384) |z''''| with
-        // z'''' = (h'^4 - 3h''^2 - 4h'h''' - 6i h'^2 h'') z; only the part across z turns the
-        // rotation (the rest is normalised away), and across z the real part is scaled by the
-        // sine of how far h moves over the piece (at most A).
-        const double across =
-            ((A * A * A * A + 3 * B * B + 4 * A * C) * A + 6 * A * A * B) * kBy384;
-        const double whole =
-            kRoot2 * (A * A * A * A + 6 * A * A * B + 3 * B * B + 4 * A * C) * kBy384;
-        // 2 (across / (1 - whole) + drift) <= allowedRadians, without dividing
-        if (whole < 0.5 && 2 * (across + drift * (1 - whole)) <= allowedRadians * (1 - whole)) {
-            return parts;
-        }
-    }
-    return 0;
-}
-
 bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) const {
     const auto& keys = curve_.keys();
     const size_t n = keys.size();
@@ -97,9 +59,10 @@ bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* o
             return false;  // a jump at the next key, which a spline cannot make
         }
         const double dt = keys[i + 1].time - keys[i].time;
-        parts[i] =
-            partsFor(keys[i].time, keys[i + 1].time, keys[i].value * kHalfRadians,
-                     keys[i + 1].value * kHalfRadians, leave[i] * dt, in[i + 1] * dt, allowed);
+        PieceBound bound;
+        bound.Add(keys[i].value * kHalfRadians, keys[i + 1].value * kHalfRadians, leave[i] * dt,
+                  in[i + 1] * dt);
+        parts[i] = bound.Parts(keys[i].time, keys[i + 1].time, allowed, true);
         knots += size_t(parts[i]);
         if (parts[i] == 0 || knots > maxKnots) {
             return false;

@@ -172,11 +172,12 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
 TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
     Node a = OneNode();
     // A steady turn about X over 20 s (600 frames), a smooth swing about Y for the first 5 s,
-    // a quick one about Z in the first frame.
+    // a jump about Z after the first frame (a step, which a spline cannot make).
     ASSERT_EQ(StoreKeys(a.get(), 3, {{0, 0, 1, 1}, {120000, 170, 1, 1}}), 1);
     ASSERT_EQ(StoreKeys(a.get(), 4, {{0, 10, 0, 0}, {15000, 95, 0, 0}, {30000, 5, 0, 0}}), 1);
-    ASSERT_EQ(StoreKeys(a.get(), 5, {{0, 0, 0, 2}, {100, 30, 2, 2}}), 1);
-    scene.source->document()->SetCurve(0, 0, StepKeys({{0, 0}, {2, 5}, {3.5, 1}}), true);
+    SceneDocument& edit = *scene.source->document();
+    edit.SetCurve(0, 5, StepKeys({{0, 0}, {1 / 30.0, 30}}), true);
+    edit.SetCurve(0, 0, StepKeys({{0, 0}, {2, 5}, {3.5, 1}}), true);
     ASSERT_EQ(StoreKeys(a.get(), 1, {{0, 0, 0, 0}, {9000, 2, 0, 0}, {24000, -1, 0, 0}}), 1);
     auto back = StoreAndRead();
     const SceneDocument& doc = *scene.source->document();
@@ -381,8 +382,9 @@ TEST_F(SceneWriterTest, CurvesStartAtZeroWithoutNegativeZeros) {
     }
 }
 
-// A small scene with one rotation key at 359,000 s stays small when driven; a rotation turning
-// over those 100 hours is refused, naming the file and node, and nothing is written.
+// A small scene with one rotation key at 359,000 s stays small when driven; a rotation that
+// steps over those 100 hours (so that it must be sampled) is refused, naming the file and node,
+// and nothing is written.
 TEST_F(SceneWriterTest, AFarKeyCostsNothingAndATooLongCurveIsRefused) {
     ModelBuilder b;
     int a = b.Node("a");
@@ -397,7 +399,8 @@ TEST_F(SceneWriterTest, AFarKeyCostsNothingAndATooLongCurveIsRefused) {
 
     ModelBuilder turning;
     a = turning.Node("a");
-    turning.Channel(0, a, "rotation", {0, 359000}, {0, 0, 0, 1, kQ90X[0], 0, 0, kQ90X[3]});
+    turning.Channel(0, a, "rotation", {0, 359000}, {0, 0, 0, 1, kQ90X[0], 0, 0, kQ90X[3]},
+                    "STEP");
     Open(turning);
     ASSERT_EQ(StoreKeys(scene.Fetch("a").get(), 4, {{0, 0, 1, 1}, {6000, 20, 1, 1}}), 1);
     std::string refused = dir + "/refused.gltf";

@@ -1,0 +1,179 @@
+#include "scene/EulerSpline.h"
+
+#include <algorithm>
+#include <cmath>
+#include <vector>
+
+#include "scene/ChannelCurve.h"
+#include "scene/PieceBound.h"
+#include "scene/SamplerBuilder.h"
+
+namespace {
+constexpr double kHalfRadians = 3.14159265358979323846 / 360;  // half-angle radians per degree
+
+// Stored floats: a negative zero is written as zero.
+float stored(double v) {
+    return float(v) + 0.0f;
+}
+
+// qz * qy * qx, as EulerRotation::ToQuaternion, from each axis's half-angle cosine and sine.
+void product(const double c[3], const double s[3], double q[4]) {
+    q[0] = s[0] * c[1] * c[2] - c[0] * s[1] * s[2];
+    q[1] = c[0] * s[1] * c[2] + s[0] * c[1] * s[2];
+    q[2] = c[0] * c[1] * s[2] - s[0] * s[1] * c[2];
+    q[3] = c[0] * c[1] * c[2] + s[0] * s[1] * s[2];
+}
+}  // namespace
+
+EulerSpline::EulerSpline(const ChannelCurve* const curves[3], const double angles[3]) {
+    for (int a = 0; a < 3; ++a) {
+        curves_[a] = curves[a] && !curves[a]->empty() ? curves[a] : nullptr;
+        angles_[a] = angles[a];
+    }
+}
+
+bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) const {
+    // Every axis's key times, once each; a spline cannot jump, so no axis may step.
+    std::vector<double> times, merged;
+    for (const ChannelCurve* c : curves_) {
+        if (!c) {
+            continue;
+        }
+        const auto& keys = c->keys();
+        for (size_t k = 0; k + 1 < keys.size(); ++k) {
+            if (keys[k].out == ChannelCurve::kStep) {
+                return false;
+            }
+        }
+        merged.resize(times.size() + keys.size());
+        auto at = merged.begin();
+        auto from = times.begin();
+        for (const ChannelCurve::Key& k : keys) {
+            while (from != times.end() && *from < k.time) {
+                *at++ = *from++;
+            }
+            if (from == times.end() || *from != k.time) {
+                *at++ = k.time;
+            }
+        }
+        at = std::copy(from, times.end(), at);
+        merged.resize(size_t(at - merged.begin()));
+        times.swap(merged);
+    }
+    const size_t n = times.size();
+    if (n < 2 || n > maxKnots) {
+        return false;
+    }
+    for (size_t k = 1; k < n; ++k) {
+        if (!(float(times[k]) > float(times[k - 1]))) {
+            return false;  // two key times on one float
+        }
+    }
+    // Each axis's half-angle and its slopes (radians per second) at every knot.
+    std::vector<double> half[3], arrive[3], leave[3];
+    for (int a = 0; a < 3; ++a) {
+        if (curves_[a]) {
+            curves_[a]->SampleSorted(times, &half[a], &arrive[a], &leave[a]);
+            for (size_t k = 0; k < n; ++k) {
+                half[a][k] *= kHalfRadians;
+                arrive[a][k] *= kHalfRadians;
+                leave[a][k] *= kHalfRadians;
+            }
+        } else {
+            half[a].assign(n, angles_[a] * kHalfRadians);
+            arrive[a].assign(n, 0.0);
+            leave[a].assign(n, 0.0);
+        }
+    }
+    // The parts of each piece.
+    const double allowed = toleranceDegrees * 3.14159265358979323846 / 180;
+    std::vector<unsigned char> parts(n - 1);
+    size_t knots = 1;
+    for (size_t k = 0; k + 1 < n; ++k) {
+        const double dt = times[k + 1] - times[k];
+        PieceBound bound;
+        for (int a = 0; a < 3; ++a) {
+            if (curves_[a]) {
+                bound.Add(half[a][k], half[a][k + 1], leave[a][k] * dt, arrive[a][k + 1] * dt);
+            }
+        }
+        const int p = bound.Parts(times[k], times[k + 1], allowed, false);
+        parts[k] = static_cast<unsigned char>(p);
+        knots += size_t(p);
+        if (p == 0 || knots > maxKnots) {
+            return false;
+        }
+    }
+
+    BuiltSampler s;
+    s.interpolation = "CUBICSPLINE";
+    s.width = 4;
+    s.times.resize(knots);
+    float* time = s.times.data();
+    float* v = s.SizeValues(knots * 12);
+    // One knot: its time, the half-angles there and their slopes on either side. The
+    // rotation's derivative by one half-angle is the product with that axis's cosine and sine
+    // turned a quarter ahead, (-sin, cos).
+    auto put = [&](double at, const double h[3], const double in[3], const double out[3]) {
+        double c[3], sn[3], q[4], dIn[4] = {0, 0, 0, 0}, dOut[4] = {0, 0, 0, 0};
+        for (int a = 0; a < 3; ++a) {
+            c[a] = std::cos(h[a]);
+            sn[a] = std::sin(h[a]);
+        }
+        product(c, sn, q);
+        for (int a = 0; a < 3; ++a) {
+            if (in[a] == 0 && out[a] == 0) {
+                continue;
+            }
+            double cd[3] = {c[0], c[1], c[2]}, sd[3] = {sn[0], sn[1], sn[2]}, dq[4];
+            cd[a] = -sn[a];
+            sd[a] = c[a];
+            product(cd, sd, dq);
+            for (int i = 0; i < 4; ++i) {
+                dIn[i] += dq[i] * in[a];
+                dOut[i] += dq[i] * out[a];
+            }
+        }
+        *time++ = stored(at);
+        for (int i = 0; i < 4; ++i, ++v) {
+            v[0] = stored(dIn[i]);
+            v[4] = stored(q[i]);
+            v[8] = stored(dOut[i]);
+        }
+        v += 8;
+    };
+    for (size_t k = 0; k < n; ++k) {
+        const double h[3] = {half[0][k], half[1][k], half[2][k]};
+        const double in[3] = {arrive[0][k], arrive[1][k], arrive[2][k]};
+        const double out[3] = {leave[0][k], leave[1][k], leave[2][k]};
+        put(times[k], h, in, out);
+        if (k + 1 == n || parts[k] == 1) {
+            continue;
+        }
+        // The cut points of a piece cut into parts: on each axis's cubic in u = 0..1.
+        const double dt = times[k + 1] - times[k];
+        double m0[3], b[3], a3[3];
+        for (int a = 0; a < 3; ++a) {
+            const double p0 = half[a][k], p1 = half[a][k + 1], m1 = arrive[a][k + 1] * dt;
+            m0[a] = leave[a][k] * dt;
+            b[a] = 3 * (p1 - p0) - 2 * m0[a] - m1;
+            a3[a] = 2 * (p0 - p1) + m0[a] + m1;
+        }
+        for (int j = 1; j < parts[k]; ++j) {
+            const double u = double(j) / parts[k];
+            double hu[3], slope[3];
+            for (int a = 0; a < 3; ++a) {
+                hu[a] = half[a][k] + u * (m0[a] + u * (b[a] + u * a3[a]));
+                slope[a] = (m0[a] + u * (2 * b[a] + 3 * a3[a] * u)) / dt;
+            }
+            put(times[k] + u * dt, hu, slope, slope);
+        }
+    }
+    for (size_t j = 1; j < knots; ++j) {
+        if (!(s.times[j] > s.times[j - 1])) {
+            return false;  // two knots on one float time
+        }
+    }
+    *out = std::move(s);
+    return true;
+}

@@ -1,0 +1,29 @@
+#pragma once
+
+#include <cstddef>
+
+class ChannelCurve;
+struct BuiltSampler;
+
+// A rotation whose Euler angles move about more than one axis, written as CUBICSPLINE
+// quaternion pieces at the union of its axes' key times. Between two of those times every axis
+// runs along one cubic, so each knot's value and slopes follow from the angles and their slopes
+// there, and a piece whose bound on how far it (normalised, as players do) strays from the
+// rotation exceeds the tolerance is cut into equal parts (see PieceBound).
+class EulerSpline {
+  public:
+    // `curves` (degrees, borrowed) are the X, Y and Z angles, null for an axis held at
+    // `angles[axis]` (degrees).
+    EulerSpline(const ChannelCurve* const curves[3], const double angles[3]);
+
+    // Writes the knots into `out` (CUBICSPLINE, in-tangent, value, out-tangent per knot), each
+    // piece within `toleranceDegrees` of the rotation at every time it covers, allowing for the
+    // knots' times being stored as floats. False, with `out` untouched, when an axis steps,
+    // two key times fall on one float, a piece would need more than PieceBound::kMaxParts
+    // parts, or the knots would number more than `maxKnots`.
+    bool Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) const;
+
+  private:
+    const ChannelCurve* curves_[3];
+    double angles_[3];
+};
