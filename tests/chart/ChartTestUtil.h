@@ -26,9 +26,6 @@ class KLSyncChartTestAccess {
   public:
     static void Feedback(KLSyncChart* c) { c->feedback_meter_movement(); }
     static void SetActiveKey(KLSyncChart* c, KLKeyEvent* e) { c->set_active_key(e); }
-    static void Keyboard(KLSyncChart* c, unsigned long keysym, std::string text) {
-        c->handle_keyboard_input(keysym, int(text.size()), text.data());
-    }
 };
 
 namespace charttest {
@@ -46,7 +43,6 @@ class ChartWindow {
         XtManageChild(top);
         XtPopup(shell, XtGrabNone);
         guitest::WaitMapped(shell);
-        // The drawing area is never narrower than the zoom and pan bar under it.
         guitest::WaitFor([this] { return chart->geometry.width > 0 && !chart->needRedraw; });
         guitest::Settle();
     }
@@ -60,21 +56,6 @@ class ChartWindow {
     unsigned long Pixel(int x, int y) {
         guitest::Settle();
         return guitest::PixelAt(chart->drawingArea, x, y);
-    }
-
-    // The pixels of a rectangle of the window, row by row.
-    std::vector<unsigned long> Pixels(int x, int y, int w, int h) {
-        guitest::Settle();
-        std::vector<unsigned long> pixels;
-        XImage* image = XGetImage(guitest::GetDisplay(), XtWindow(chart->drawingArea), x, y,
-                                  unsigned(w), unsigned(h), AllPlanes, ZPixmap);
-        if (!image)
-            return pixels;
-        for (int j = 0; j < h; j++)
-            for (int i = 0; i < w; i++)
-                pixels.push_back(XGetPixel(image, i, j));
-        XDestroyImage(image);
-        return pixels;
     }
 
     Widget shell = nullptr;

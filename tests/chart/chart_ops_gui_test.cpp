@@ -88,8 +88,6 @@ const OpCase kOperations[] = {
            "0@0/0/1 3@300/0/1 ", -2},
     OpCase{"DeleteRegion", delete_region, 1, 0, 1, 3, -1, 1, 3, 0, "0@0/0/1 2@150/2/0.5 3@300/0/1 ",
            -2},
-    OpCase{"DeleteRegionReversedIsNoRegion", delete_region, 1, 0.5f, 1, 3, -1, 3, 1, 0,
-           "0@0/0/1 1@60/1/1 2@150/2/0.5 ", -2},
     // Smoothing: the active key, the region with its ends or the next key to the right.
     OpCase{"SmoothNextKeyRightOfTheIndicator", smooth, 1, 0, 1, 3, -1, 0, 0, 0,
            "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/0/1 ", -2},
@@ -183,16 +181,13 @@ TEST_F(ChartOps, RangesDurationAndOddSounds) {
     EXPECT_EQ(std::make_pair(a, b), std::make_pair(Seconds(4), Seconds(6)));
     EXPECT_FALSE(chart->geometry.RegionSelected());
 
-    chart->SetKeyTrack(nullptr);
+    chart->SetKeyTrack(nullptr);  // its keys would stretch the duration
     chart->SetUserDuration(CueTime());
     auto sound = charttest::Sound(std::vector<float>(48000 * 3, 0.1f), 48000);
     chart->SetSound(sound.get());
     EXPECT_EQ(chart->geometry.duration, Seconds(3));
-    EXPECT_FLOAT_EQ(chart->peak, 0.1f);
-    EXPECT_EQ(chart->sampleCount, 48000 * 3);
     chart->SetSound(nullptr);
     EXPECT_EQ(chart->geometry.duration, Seconds(3));
-    EXPECT_EQ(chart->sampleCount, 48000 * 3);
 
     for (const std::vector<float>& samples :
          {std::vector<float>{0.5f}, {NAN, 0.25f, NAN, -0.5f}, std::vector<float>(1000, 0.0f)}) {
