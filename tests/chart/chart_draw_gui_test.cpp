@@ -1,8 +1,6 @@
 // What the chart paints, read back from its window.
 #include "chart/ChartTestUtil.h"
 
-#include <X11/Xresource.h>
-
 #include <cmath>
 
 using charttest::ChartWindow;
@@ -67,16 +65,6 @@ TEST_F(ChartDraw, RegionIndicatorAndWaveform) {
     EXPECT_EQ(Pixel(25, 20), chart->soundColor);
     chart->SetSound(nullptr);
     EXPECT_EQ(Pixel(25, 20), chart->background);
-}
-
-// Colours come from the resource database; the class-wide fallbacks fill in the rest.
-TEST(ChartResources, ColoursComeFromTheResourceDatabase) {
-    ASSERT_TRUE(guitest::Shell());
-    XrmDatabase db = XtDatabase(guitest::GetDisplay());
-    XrmPutLineResource(&db, "*colourChart.keyColor: #00ff00");
-    ChartWindow window("colourChart", 300, 200);
-    EXPECT_EQ(window.chart->keyColor, guitest::NamedPixel("#00ff00"));
-    EXPECT_EQ(window.chart->soundColor, guitest::NamedPixel("#1d4f91"));
 }
 
 TEST(ChartSmall, TinyChartsAndFarKeysDrawWithoutTrouble) {

@@ -123,19 +123,4 @@ TEST(ChartBands, MapValuesToRows) {
     EXPECT_FALSE(KLChartGeometry::Hits(-100, 0) || KLChartGeometry::Hits(INT32_MIN, INT32_MAX));
 }
 
-TEST(ChartScroll, ValuesAndPanRoundTrip) {
-    auto g = chart(400);
-    g.zoomStart = 0.25f;
-    g.zoomEnd = 0.5f;
-    int value = 0, slider = 0;
-    g.ScrollValues(0, 10000, &value, &slider);
-    EXPECT_EQ(std::make_pair(value, slider), std::make_pair(2500, 2500));
-    float start, end;
-    KLChartGeometry::PanFromScroll(5000, 2500, 0, 10000, &start, &end);
-    EXPECT_FLOAT_EQ(start, 0.5f);
-    EXPECT_FLOAT_EQ(end, 0.75f);
-    KLChartGeometry::PanFromScroll(150, 25, 100, 200, &start, &end);
-    EXPECT_FLOAT_EQ(start, 1.5f) << "the minimum is not subtracted from the value";
-}
-
 }  // namespace

@@ -175,11 +175,6 @@ TEST_F(ChartOps, RangesDurationAndOddSounds) {
     chart->SetZoomPan(0.25f, 0.5f);
     chart->GetRegionRange(a, b);
     EXPECT_EQ(std::make_pair(a, b), std::make_pair(Seconds(5), Seconds(10)));
-    chart->SetRegionRange(Seconds(1), Seconds(2));
-    chart->SetZoomRange(Seconds(4), Seconds(6));  // clears the region
-    chart->GetZoomRange(a, b);
-    EXPECT_EQ(std::make_pair(a, b), std::make_pair(Seconds(4), Seconds(6)));
-    EXPECT_FALSE(chart->geometry.RegionSelected());
 
     chart->SetKeyTrack(nullptr);  // its keys would stretch the duration
     chart->SetUserDuration(CueTime());
@@ -202,32 +197,6 @@ TEST_F(ChartOps, RangesDurationAndOddSounds) {
     EXPECT_EQ(chart->geometry.duration, CueTime::FromTicks(INT32_MAX));
     EXPECT_EQ(chart->waveSegmentCount, int(chart->geometry.width));
     chart->SetSound(nullptr);
-}
-
-void count(Widget, XtPointer calls, KLFiend*) {
-    ++*static_cast<int*>(calls);
-}
-
-TEST_F(ChartOps, FeedbackCallsTheCallbacksAndPicksTheKeysAround) {
-    const char* names[] = {"showKeyframeCallback", "showKeyframeImageCallback",
-                           "showReferenceImageCallback"};
-    int calls[3] = {0, 0, 0};
-    for (int i = 0; i < 3; i++)
-        EXPECT_TRUE(chart->SetFiendCallback(names[i], count, &calls[i]));
-    EXPECT_FALSE(chart->SetFiendCallback("noSuchCallback", count, nullptr));
-    chart->SetIndicatorTime(Seconds(3.5));  // halfway from 2 s to 5 s
-    chart->UpdateDisplay();
-    EXPECT_EQ(chart->feedbackKeyBefore, 1);
-    EXPECT_EQ(chart->feedbackKeyAfter, 2);
-    EXPECT_NEAR(chart->feedbackBlend, 0.5f, 0.02f);  // to the pixel
-    EXPECT_EQ(chart->activeKey, nullptr);
-    EXPECT_EQ(std::vector<int>(calls, calls + 3), (std::vector<int>{0, 1, 1}));
-    chart->SetIndicatorTime(Seconds(5));
-    chart->UpdateDisplay();
-    EXPECT_EQ(ActiveFrame(), 150);
-    EXPECT_EQ(calls[0], 1);
-    for (const char* name : names)
-        chart->SetFiendCallback(name, nullptr, nullptr);
 }
 
 }  // namespace
