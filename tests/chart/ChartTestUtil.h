@@ -52,7 +52,6 @@ class ChartWindow {
     }
     ChartWindow(const ChartWindow&) = delete;
     ChartWindow& operator=(const ChartWindow&) = delete;
-
     unsigned long Pixel(int x, int y) {
         guitest::Settle();
         return guitest::PixelAt(chart->drawingArea, x, y);
@@ -62,17 +61,16 @@ class ChartWindow {
     KLSyncChart* chart = nullptr;
 };
 
-// A kind-1 keyset "mouth" with the given key-shape names, index order.
-inline std::unique_ptr<KLKeySet> Keyset(const std::string& names, int kind = 1) {
+// A kind-1 keyset "mouth" with the given key shapes, one a frame from frame 0.
+inline std::unique_ptr<KLKeySet> Keyset(const std::string& names) {
     auto set = std::make_unique<KLKeySet>("mouth", "face.glb");
     std::istringstream in(names);
-    std::string name, block;
+    std::ostringstream block;
+    std::string name;
     for (int frame = 0; in >> name; frame++)
-        block += "key " + name + " " + std::to_string(frame) + "\n";
-    block += "end\n";
-    std::istringstream keys(block);
+        block << "key " << name << " " << frame << "\n";
+    std::istringstream keys(block.str());
     set->Read(keys);
-    set->kind = kind;
     return set;
 }
 
