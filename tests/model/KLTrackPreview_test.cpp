@@ -34,9 +34,9 @@ class PreviewTest : public ModelTest {
         for (int i = 0; i < mouth.keyShapeCount; ++i)
             mouth.keyShapes[size_t(i)]->shapeValue = 7 + i;  // as the workspace numbers them
         mouth.keyFrameList = &frames;
-        AddChannel("jaw", KLKeyChannel::kRX, {1, 11, -3, 4});
-        AddChannel("jaw", KLKeyChannel::kTY, {-0.5f, -0.9f, -0.4f, -0.6f});
-        AddChannel("lip#2", KLKeyChannel::kSX, {1, 1.2f, 1.6f, 0.7f});
+        AddChannel(mouth, "jaw", KLKeyChannel::kRX, {1, 11, -3, 4});
+        AddChannel(mouth, "jaw", KLKeyChannel::kTY, {-0.5f, -0.9f, -0.4f, -0.6f});
+        AddChannel(mouth, "lip#2", KLKeyChannel::kSX, {1, 1.2f, 1.6f, 0.7f});
         int smooth = 0;
         for (double f : {0.0, 4.0, 9.5, 15.0, 22.0, 30.0}) {
             const int shape = int(f) % 4;
@@ -53,12 +53,6 @@ class PreviewTest : public ModelTest {
             return std::vector<KLKeyTrack*>{&mouthTrack, &browTrack};
         }));
         browTrack.SetControlGraphNode(scene.FetchNode("brow"));
-    }
-    void AddChannel(const char* node, int channel, std::vector<float> values) {
-        auto c = std::make_unique<KLKeyChannel>(node, channel, int(values.size()));
-        for (size_t i = 0; i < values.size(); ++i)
-            c->Set(int(i), values[i]);
-        mouth.AddKeyChannel(std::move(c));
     }
     int Index(const char* name) {
         std::unique_ptr<OrDagNode> n = KLWire::FetchDagNode(root.get(), name);
