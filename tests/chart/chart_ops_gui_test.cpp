@@ -34,14 +34,11 @@ class ChartOps : public charttest::ChartTest {
 
     // "shape@frame/smoothing/value" for every key, in time order.
     std::string Keys() {
-        std::string text;
-        for (const KLKeyEvent* e : track->events) {
-            char value[16];
-            snprintf(value, sizeof value, "%g", e->value);
-            text += std::to_string(e->shapeIndex) + "@" + e->time.Text() + "/" +
-                    std::to_string(e->smoothing) + "/" + value + " ";
-        }
-        return text;
+        std::ostringstream text;
+        for (const KLKeyEvent* e : track->events)
+            text << e->shapeIndex << "@" << e->time.Text() << "/" << e->smoothing << "/" << e->value
+                 << " ";
+        return text.str();
     }
     int ActiveFrame() { return chart->activeKey ? chart->activeKey->time.Frame() : -1; }
 };
