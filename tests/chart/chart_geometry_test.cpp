@@ -111,8 +111,6 @@ TEST(ChartDuration, IsTheLargestOfWhatIsShownAndAtLeastASecond) {
     EXPECT_EQ(g.duration, CueTime::FromSeconds(7));
     g.ComputeDuration(true, CueTime::FromSeconds(7), true, CueTime::FromSeconds(30));
     EXPECT_EQ(g.duration, CueTime::FromSeconds(30));
-    g.ComputeDuration(true, CueTime::FromTicks(INT32_MAX), false, CueTime());
-    EXPECT_EQ(g.duration, CueTime::FromTicks(INT32_MAX));
 }
 
 TEST(ChartBands, MapValuesToRows) {
@@ -120,8 +118,6 @@ TEST(ChartBands, MapValuesToRows) {
     using Tick = std::pair<float, int>;  // the tick's extra pixel at the top
     for (auto [value, row] : {Tick{0.0f, 280}, Tick{1.0f, 240}, Tick{2.0f, 201}, Tick{5.0f, 201}})
         EXPECT_EQ(g.TickRow(value), row) << value;
-    EXPECT_DOUBLE_EQ(g.ValueRow(1.0f), 240.0);
-    EXPECT_DOUBLE_EQ(g.ValueRow(-3.0f), 280.0);
     EXPECT_FLOAT_EQ(g.ValueFromRow(240), 1.0f);
     EXPECT_FLOAT_EQ(g.ValueFromRow(150), 2.0f);
     EXPECT_FLOAT_EQ(g.ValueFromRow(400), 0.0f);
