@@ -26,9 +26,6 @@ class KLSyncChartTestAccess {
   public:
     static void Feedback(KLSyncChart* c) { c->feedback_meter_movement(); }
     static void SetActiveKey(KLSyncChart* c, KLKeyEvent* e) { c->set_active_key(e); }
-    static void Keyboard(KLSyncChart* c, unsigned long keysym, std::string text) {
-        c->handle_keyboard_input(keysym, int(text.size()), text.data());
-    }
 };
 
 namespace charttest {
@@ -46,7 +43,6 @@ class ChartWindow {
         XtManageChild(top);
         XtPopup(shell, XtGrabNone);
         guitest::WaitMapped(shell);
-        // The drawing area is never narrower than the zoom and pan bar under it.
         guitest::WaitFor([this] { return chart->geometry.width > 0 && !chart->needRedraw; });
         guitest::Settle();
     }
@@ -56,42 +52,25 @@ class ChartWindow {
     }
     ChartWindow(const ChartWindow&) = delete;
     ChartWindow& operator=(const ChartWindow&) = delete;
-
     unsigned long Pixel(int x, int y) {
         guitest::Settle();
         return guitest::PixelAt(chart->drawingArea, x, y);
-    }
-
-    // The pixels of a rectangle of the window, row by row.
-    std::vector<unsigned long> Pixels(int x, int y, int w, int h) {
-        guitest::Settle();
-        std::vector<unsigned long> pixels;
-        XImage* image = XGetImage(guitest::GetDisplay(), XtWindow(chart->drawingArea), x, y,
-                                  unsigned(w), unsigned(h), AllPlanes, ZPixmap);
-        if (!image)
-            return pixels;
-        for (int j = 0; j < h; j++)
-            for (int i = 0; i < w; i++)
-                pixels.push_back(XGetPixel(image, i, j));
-        XDestroyImage(image);
-        return pixels;
     }
 
     Widget shell = nullptr;
     KLSyncChart* chart = nullptr;
 };
 
-// A kind-1 keyset "mouth" with the given key-shape names, index order.
-inline std::unique_ptr<KLKeySet> Keyset(const std::string& names, int kind = 1) {
+// A kind-1 keyset "mouth" with the given key shapes, one a frame from frame 0.
+inline std::unique_ptr<KLKeySet> Keyset(const std::string& names) {
     auto set = std::make_unique<KLKeySet>("mouth", "face.glb");
     std::istringstream in(names);
-    std::string name, block;
+    std::ostringstream block;
+    std::string name;
     for (int frame = 0; in >> name; frame++)
-        block += "key " + name + " " + std::to_string(frame) + "\n";
-    block += "end\n";
-    std::istringstream keys(block);
+        block << "key " << name << " " << frame << "\n";
+    std::istringstream keys(block.str());
     set->Read(keys);
-    set->kind = kind;
     return set;
 }
 

@@ -1,9 +1,18 @@
+// The chart's layout without a display: its geometry, the key layer's shapes and the
+// waveform sketch.
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <random>
+#include <sstream>
 #include <tuple>
+#include <vector>
 
 #include "chart/KLChartGeometry.h"
+#include "chart/KLKeyDrawing.h"
+#include "chart/KLWaveSummary.h"
+#include "model/KLKeySet.h"
+#include "model/KLKeyTrack.h"
 
 namespace {
 
@@ -17,40 +26,31 @@ KLChartGeometry chart(uint32_t width, uint32_t height = 200, double seconds = 10
 
 // Zooming out doubles the visible part clamping each end separately; an asked-for span is
 // clamped and ordered. Both clear the region.
-struct ZoomCase {
-    const char* name;
-    bool zoomOut;      // ZoomOut from (start, end), else SetZoomPan(start, end)
-    float start, end;  // visible part before, or the span asked for
-    float wantStart, wantEnd;
-};
-
-class ZoomSpan : public testing::TestWithParam<ZoomCase> {};
-
-TEST_P(ZoomSpan, ClampsEachEndAndClearsTheRegion) {
-    const ZoomCase& c = GetParam();
-    auto g = chart(400);
-    g.regionStart = 0.2f;
-    g.regionEnd = 0.25f;
-    if (c.zoomOut) {
-        g.zoomStart = c.start, g.zoomEnd = c.end;
-        g.ZoomOut();
-    } else {
-        g.SetZoomPan(c.start, c.end);
+TEST(ChartZoom, OutAndPanClampEachEndAndClearTheRegion) {
+    const struct {
+        bool zoomOut;      // ZoomOut from (start, end), else SetZoomPan(start, end)
+        float start, end;  // visible part before, or the span asked for
+        float wantStart, wantEnd;
+    } cases[] = {{true, 0.0f, 0.5f, 0.0f, 0.75f},  {true, 0.4f, 0.6f, 0.3f, 0.7f},
+                 {true, 0.8f, 0.9f, 0.75f, 0.95f}, {true, 0.0f, 1.0f, 0.0f, 1.0f},
+                 {false, -0.5f, 2, 0, 1},          {false, 0.6f, 0.4f, 0.6f, 0.6f},
+                 {false, NAN, NAN, 0.0f, 1.0f}};
+    for (const auto& c : cases) {
+        SCOPED_TRACE(testing::Message() << c.zoomOut << " " << c.start << " " << c.end);
+        auto g = chart(400);
+        g.regionStart = 0.2f;
+        g.regionEnd = 0.25f;
+        if (c.zoomOut) {
+            g.zoomStart = c.start, g.zoomEnd = c.end;
+            g.ZoomOut();
+        } else {
+            g.SetZoomPan(c.start, c.end);
+        }
+        EXPECT_FLOAT_EQ(g.zoomStart, c.wantStart);
+        EXPECT_FLOAT_EQ(g.zoomEnd, c.wantEnd);
+        EXPECT_FALSE(g.RegionSelected());
     }
-    EXPECT_FLOAT_EQ(g.zoomStart, c.wantStart);
-    EXPECT_FLOAT_EQ(g.zoomEnd, c.wantEnd);
-    EXPECT_FALSE(g.RegionSelected());
 }
-
-INSTANTIATE_TEST_SUITE_P(Spans, ZoomSpan,
-                         testing::Values(ZoomCase{"OutFromStart", true, 0.0f, 0.5f, 0.0f, 0.75f},
-                                         ZoomCase{"OutMiddle", true, 0.4f, 0.6f, 0.3f, 0.7f},
-                                         ZoomCase{"OutRightEdge", true, 0.8f, 0.9f, 0.75f, 0.95f},
-                                         ZoomCase{"OutEverything", true, 0.0f, 1.0f, 0.0f, 1.0f},
-                                         ZoomCase{"PanBeyondBothEnds", false, -0.5f, 2, 0, 1},
-                                         ZoomCase{"PanReversed", false, 0.6f, 0.4f, 0.6f, 0.6f},
-                                         ZoomCase{"PanNotANumber", false, NAN, NAN, 0.0f, 1.0f}),
-                         [](const auto& info) { return std::string(info.param.name); });
 
 // Zooming in takes the region, then halves about the centre; the indicator keeps its
 // fraction or hides.
@@ -111,46 +111,13 @@ TEST(ChartDuration, IsTheLargestOfWhatIsShownAndAtLeastASecond) {
     EXPECT_EQ(g.duration, CueTime::FromSeconds(7));
     g.ComputeDuration(true, CueTime::FromSeconds(7), true, CueTime::FromSeconds(30));
     EXPECT_EQ(g.duration, CueTime::FromSeconds(30));
-    g.ComputeDuration(true, CueTime::FromTicks(INT32_MAX), false, CueTime());
-    EXPECT_EQ(g.duration, CueTime::FromTicks(INT32_MAX));
 }
 
-// The grid step is the first of 1, 2, 5, 10, 20, 50, ... frames that fits; its lines lie
-// strictly inside the visible part.
-TEST(ChartGrid, StepAndLines) {
-    using Grid = std::tuple<uint32_t, double, float, float, double>;  // width, frames, zoom, step
-    for (auto [width, frames, start, end, step] :
-         {Grid{500, 500, 0, 1, 10}, Grid{500, 501, 0, 1, 20}, Grid{1600, 30, 0, 1, 1},
-          Grid{1600, 108000, 0, 1, 1000}, Grid{100, 1000, 0.5, 0.75, 50},
-          Grid{9, 30, 0, 1, 1e12}}) {
-        auto g = chart(width, 200, frames / 30);
-        g.zoomStart = start, g.zoomEnd = end;
-        EXPECT_DOUBLE_EQ(g.GridStepFrames(), step) << width << " " << frames;
-    }
-    auto g = chart(500, 200, 1000.0 / 30);  // 1000 frames: step 20, lines every 10 columns
-    auto columns = g.GridColumns();
-    ASSERT_EQ(columns.size(), 49u);
-    EXPECT_EQ(columns.front(), 10);
-    EXPECT_EQ(columns.back(), 490);
-    g.zoomStart = 0.025f;  // 75 frames: a line every 2 frames, the first after 0.026
-    g.zoomEnd = 0.1f;
-    columns = g.GridColumns();
-    // 0.026 .. 0.098, and 0.1 itself when the float end lies above it.
-    ASSERT_GE(columns.size(), 37u);
-    ASSERT_LE(columns.size(), 38u);
-    EXPECT_EQ(columns.front(), 6);
-    EXPECT_LT(columns.back(), 500);
-}
-
-TEST(ChartBands, FollowTheHeightAndMapValuesToRows) {
-    auto g = chart(400, 300);  // lower band 200 .. base 280
-    EXPECT_EQ(std::make_tuple(g.waveHeight, g.lowerBandTop, g.textBaseline),
-              std::make_tuple(185, 200, 280));
+TEST(ChartBands, MapValuesToRows) {
+    auto g = chart(400, 300);            // lower band 200 .. base 280
     using Tick = std::pair<float, int>;  // the tick's extra pixel at the top
     for (auto [value, row] : {Tick{0.0f, 280}, Tick{1.0f, 240}, Tick{2.0f, 201}, Tick{5.0f, 201}})
         EXPECT_EQ(g.TickRow(value), row) << value;
-    EXPECT_DOUBLE_EQ(g.ValueRow(1.0f), 240.0);
-    EXPECT_DOUBLE_EQ(g.ValueRow(-3.0f), 280.0);
     EXPECT_FLOAT_EQ(g.ValueFromRow(240), 1.0f);
     EXPECT_FLOAT_EQ(g.ValueFromRow(150), 2.0f);
     EXPECT_FLOAT_EQ(g.ValueFromRow(400), 0.0f);
@@ -161,37 +128,157 @@ TEST(ChartBands, FollowTheHeightAndMapValuesToRows) {
     EXPECT_FALSE(KLChartGeometry::Hits(-100, 0) || KLChartGeometry::Hits(INT32_MIN, INT32_MAX));
 }
 
-TEST(ChartReveal, RegionColumnsIncludeItsLastColumn) {
-    auto spans = [](const KLChartGeometry& g, int x, int w) {
-        std::vector<std::tuple<int, int, bool>> out;
-        for (const auto& s : g.RevealSpans(x, w))
-            out.emplace_back(s.first, s.last, s.inRegion);
-        return out;
+// A 400 x 300 chart of ten seconds (lower band 200, base line 280) over a track of keyset
+// "rest AI E".
+class KeyDrawing : public testing::Test {
+  protected:
+    void SetUp() override {
+        std::istringstream keys("key rest 0\nkey AI 1\nkey E 2\nend\n");
+        keyset.Read(keys);
+        g.SetSize(400, 300);
+        g.duration = CueTime::FromSeconds(10);
+    }
+    void Key(int shape, double seconds, int smoothing, float value = 1.0f) {
+        track.InsertKey(shape, CueTime::FromSeconds(seconds), keyset.GetKeyShape(shape), smoothing,
+                        value);
+    }
+    KLKeySet keyset{"mouth", "face.glb"};
+    KLKeyTrack track{&keyset};
+    KLChartGeometry g;
+    KLKeyDrawing d;
+};
+
+// Curves rise into the key they lead to, in that key's kind (Ease and Smooth one segment per
+// column); into a key of the same shape the line is flat on the base line whatever the values.
+TEST_F(KeyDrawing, CurvesTakeTheirKeysKindAndHeldShapesAreFlat) {
+    Key(0, 0, 0);
+    Key(1, 1, 0, 2.0f);  // Linear to the top of the band
+    Key(2, 2, 1);        // Ease
+    Key(0, 3, 2);        // Smooth
+    Key(0, 5, 2, 0.2f);  // held
+    d.Build(g, track);
+    const auto ends = [](const KLWaveSegment& s) {
+        return std::vector<int>{s.x1, s.y1, s.x2, s.y2};
     };
-    using Spans = std::vector<std::tuple<int, int, bool>>;
-    auto g = chart(100);
-    EXPECT_TRUE(spans(g, 0, 0).empty());
-    g.regionStart = 0.2f;
-    g.regionEnd = 0.5f;  // columns 20 .. 50
-    EXPECT_EQ(spans(g, 0, 100), (Spans{{0, 19, false}, {20, 50, true}, {51, 99, false}}));
-    EXPECT_EQ(spans(g, 50, 1), (Spans{{50, 50, true}})) << "from the region image only";
-    g.regionStart = 0.5f;  // start after end: no region at all
-    EXPECT_EQ(spans(g, 0, 100), (Spans{{0, 99, false}}));
+    ASSERT_EQ(d.linear.size(), 2u);
+    EXPECT_EQ(ends(d.linear[0]), (std::vector<int>{0, 280, 40, 200}));
+    EXPECT_EQ(ends(d.linear[1]), (std::vector<int>{120, 280, 200, 280}));
+    ASSERT_EQ(d.ease.size(), 40u);
+    EXPECT_EQ(d.ease.front().y1, 280);
+    EXPECT_EQ(d.ease.back().y2, 240);
+    EXPECT_EQ(d.smooth.size(), 40u);
 }
 
-TEST(ChartScroll, ValuesAndPanRoundTrip) {
-    auto g = chart(400);
-    g.zoomStart = 0.25f;
-    g.zoomEnd = 0.5f;
-    int value = 0, slider = 0;
-    g.ScrollValues(0, 10000, &value, &slider);
-    EXPECT_EQ(std::make_pair(value, slider), std::make_pair(2500, 2500));
-    float start, end;
-    KLChartGeometry::PanFromScroll(5000, 2500, 0, 10000, &start, &end);
-    EXPECT_FLOAT_EQ(start, 0.5f);
-    EXPECT_FLOAT_EQ(end, 0.75f);
-    KLChartGeometry::PanFromScroll(150, 25, 100, 200, &start, &end);
-    EXPECT_FLOAT_EQ(start, 1.5f) << "the minimum is not subtracted from the value";
+// Keys whose shape has an empty name, or none, draw a stick and a tick but no letter.
+TEST_F(KeyDrawing, NamelessKeysHaveNoLetter) {
+    keyset.keyShapes.push_back(std::make_unique<KLKey>(3.0f, "", nullptr));
+    track.InsertKey(3, CueTime::FromSeconds(1), keyset.keyShapes.back().get(), 1, 1.0f);
+    track.InsertKey(1, CueTime::FromSeconds(2), nullptr, 1, 1.0f);
+    d.Build(g, track);
+    EXPECT_TRUE(d.letters.empty());
+    EXPECT_EQ(d.sticks.size(), 4u);
+}
+
+TEST_F(KeyDrawing, FarZoomsStayWithinTheDrawableRange) {
+    Key(0, 0, 1);
+    Key(1, 9, 1);
+    Key(2, 9.5, 2);
+    Key(0, 9.9, 0);
+    for (int i = 0; i < 60; i++)
+        g.ZoomIn();  // a span of 2^-60 around the middle
+    d.Build(g, track);
+    for (const auto* list : {&d.linear, &d.ease, &d.smooth}) {
+        EXPECT_LE(list->size(), 500u);
+        for (const auto& s : *list) {
+            EXPECT_GE(std::min(s.x1, s.x2), -17);
+            EXPECT_LE(std::max(s.x1, s.x2), 417);
+        }
+    }
+    EXPECT_TRUE(d.sticks.empty());  // no key lies in view
+}
+
+std::vector<float> noise(size_t count, unsigned seed) {
+    std::mt19937 random(seed);
+    std::normal_distribution<float> sample(0.0f, 0.3f);
+    std::vector<float> samples(count);
+    for (float& s : samples)
+        s = sample(random);
+    return samples;
+}
+
+bool same(const KLWaveSegment& a, const KLWaveSegment& b) {
+    return a.x1 == b.x1 && a.y1 == b.y1 && a.x2 == b.x2 && a.y2 == b.y2;
+}
+
+// An empty range, and one of positive samples only, reach the centre line.
+TEST(WaveSummary, EmptyAndPositiveRangesReachTheCentreLine) {
+    KLWaveSummary summary;
+    std::vector<float> ones(1000, 0.5f);
+    summary.Build(ones.data(), 1000);
+    float hi, lo;
+    summary.Extent(10, 10, &hi, &lo);
+    EXPECT_EQ(std::make_pair(hi, lo), std::make_pair(0.0f, 0.0f));
+    summary.Extent(0, 1000, &hi, &lo);
+    EXPECT_EQ(std::make_pair(hi, lo), std::make_pair(0.5f, 0.0f));
+}
+
+// The sketch from the summaries against the column-by-column scan, at random chart sizes,
+// zooms, durations and sound lengths, over samples that include a NaN and an infinity.
+TEST(WaveSketch, SummaryGivesTheScansSegmentsAtRandomZooms) {
+    std::mt19937 random(3);
+    for (int round = 0; round < 60; round++) {
+        const size_t count = std::uniform_int_distribution<size_t>(2, 400000)(random);
+        auto samples = noise(count, unsigned(round));
+        samples[count / 3] = NAN;
+        samples[count / 2] = INFINITY;
+        KLWaveSummary summary;
+        summary.Build(samples.data(), long(count));
+        float peak = 0;
+        for (float s : samples)
+            peak = std::isfinite(s) ? std::max(peak, std::fabs(s)) : peak;
+
+        KLChartGeometry g;
+        g.SetSize(std::uniform_int_distribution<uint32_t>(1, 1700)(random),
+                  std::uniform_int_distribution<uint32_t>(1, 400)(random));
+        const double soundSeconds = double(count) / 48000.0;
+        g.duration = CueTime::FromSeconds(soundSeconds *
+                                          std::uniform_real_distribution<double>(0.5, 3.0)(random));
+        const float a = std::uniform_real_distribution<float>(0, 1)(random);
+        const float span = std::pow(0.5f, std::uniform_int_distribution<int>(0, 20)(random));
+        g.zoomStart = a;
+        g.zoomEnd = std::min(1.0f, a + span);
+        const CueTime length = CueTime::FromSeconds(soundSeconds);
+
+        std::vector<KLWaveSegment> fast, plain;
+        const int n = SketchWave(g, samples.data(), summary, long(count), length, peak, fast);
+        const int m =
+            SketchWave(g, samples.data(), summary, long(count), length, peak, plain, true);
+        ASSERT_EQ(n, m);
+        ASSERT_EQ(n, int(g.width));
+        for (int x = 0; x < n; x++) {
+            ASSERT_TRUE(same(fast[size_t(x)], plain[size_t(x)])) << "round " << round << " x " << x;
+            ASSERT_EQ(fast[size_t(x)].x1, x);
+        }
+    }
+}
+
+// Positive samples go downward from the centre line; without a peak, or with one sample,
+// nothing is sketched.
+TEST(WaveSketch, PositiveSamplesGoDownwardAndSilenceDrawsNothing) {
+    KLChartGeometry g;
+    g.SetSize(10, 215);  // wave band 15 .. 114, B = 99
+    g.duration = CueTime::FromSeconds(1);
+    std::vector<float> samples(1000, 1.0f);
+    KLWaveSummary summary;
+    summary.Build(samples.data(), 1000);
+    std::vector<KLWaveSegment> segments;
+    const CueTime second = CueTime::FromSeconds(1);
+    ASSERT_EQ(SketchWave(g, samples.data(), summary, 1000, second, 1.0f, segments), 10);
+    EXPECT_EQ(segments[3].y1, 15 + 99);  // hi = peak: the bottom
+    EXPECT_EQ(segments[3].y2, 15 + 49);  // lo = 0: the centre line
+    EXPECT_EQ(SketchWave(g, samples.data(), summary, 1000, second, 0.0f, segments), 0);
+    EXPECT_EQ(SketchWave(g, samples.data(), summary, 1, second, 1.0f, segments), 0);
+    EXPECT_EQ(segments.size(), 10u);
 }
 
 }  // namespace

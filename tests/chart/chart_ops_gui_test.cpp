@@ -34,14 +34,11 @@ class ChartOps : public charttest::ChartTest {
 
     // "shape@frame/smoothing/value" for every key, in time order.
     std::string Keys() {
-        std::string text;
-        for (const KLKeyEvent* e : track->events) {
-            char value[16];
-            snprintf(value, sizeof value, "%g", e->value);
-            text += std::to_string(e->shapeIndex) + "@" + e->time.Text() + "/" +
-                    std::to_string(e->smoothing) + "/" + value + " ";
-        }
-        return text;
+        std::ostringstream text;
+        for (const KLKeyEvent* e : track->events)
+            text << e->shapeIndex << "@" << e->time.Text() << "/" << e->smoothing << "/" << e->value
+                 << " ";
+        return text.str();
     }
     int ActiveFrame() { return chart->activeKey ? chart->activeKey->time.Frame() : -1; }
 };
@@ -88,8 +85,6 @@ const OpCase kOperations[] = {
            "0@0/0/1 3@300/0/1 ", -2},
     OpCase{"DeleteRegion", delete_region, 1, 0, 1, 3, -1, 1, 3, 0, "0@0/0/1 2@150/2/0.5 3@300/0/1 ",
            -2},
-    OpCase{"DeleteRegionReversedIsNoRegion", delete_region, 1, 0.5f, 1, 3, -1, 3, 1, 0,
-           "0@0/0/1 1@60/1/1 2@150/2/0.5 ", -2},
     // Smoothing: the active key, the region with its ends or the next key to the right.
     OpCase{"SmoothNextKeyRightOfTheIndicator", smooth, 1, 0, 1, 3, -1, 0, 0, 0,
            "0@0/0/1 1@60/1/1 2@150/1/0.5 3@300/0/1 ", -2},
@@ -156,9 +151,7 @@ TEST_F(ChartOps, KeysByTimeAndTheActiveKey) {
     KLSyncChartTestAccess::SetActiveKey(chart, track->key_from_time(Seconds(2)));
     chart->DeleteActiveKeyframe();
     EXPECT_EQ(chart->activeKey, nullptr);
-    chart->DeleteTimeKeyframe(Seconds(5));
-    chart->DeleteTimeKeyframe(Seconds(7));
-    EXPECT_EQ(Keys(), "0@0/0/1 3@300/0/1 ");
+    EXPECT_EQ(Keys(), "0@0/0/1 2@150/2/0.5 3@300/0/1 ");
 
     Reset();
     chart->SetKeyTrack(nullptr);
@@ -166,7 +159,6 @@ TEST_F(ChartOps, KeysByTimeAndTheActiveKey) {
     EXPECT_EQ(chart->AddTimeKeyframe(1, Seconds(1), keyset->GetKeyShape(1), 1), 0);
     chart->DeleteActiveKeyframeRegion();
     chart->SetRegionSmoothing(2);
-    chart->DeleteTimeKeyframe(Seconds(2));
     EXPECT_EQ(Keys(), kStart);
 }
 
@@ -177,22 +169,14 @@ TEST_F(ChartOps, RangesDurationAndOddSounds) {
     chart->SetZoomPan(0.25f, 0.5f);
     chart->GetRegionRange(a, b);
     EXPECT_EQ(std::make_pair(a, b), std::make_pair(Seconds(5), Seconds(10)));
-    chart->SetRegionRange(Seconds(1), Seconds(2));
-    chart->SetZoomRange(Seconds(4), Seconds(6));  // clears the region
-    chart->GetZoomRange(a, b);
-    EXPECT_EQ(std::make_pair(a, b), std::make_pair(Seconds(4), Seconds(6)));
-    EXPECT_FALSE(chart->geometry.RegionSelected());
 
-    chart->SetKeyTrack(nullptr);
+    chart->SetKeyTrack(nullptr);  // its keys would stretch the duration
     chart->SetUserDuration(CueTime());
     auto sound = charttest::Sound(std::vector<float>(48000 * 3, 0.1f), 48000);
     chart->SetSound(sound.get());
     EXPECT_EQ(chart->geometry.duration, Seconds(3));
-    EXPECT_FLOAT_EQ(chart->peak, 0.1f);
-    EXPECT_EQ(chart->sampleCount, 48000 * 3);
     chart->SetSound(nullptr);
     EXPECT_EQ(chart->geometry.duration, Seconds(3));
-    EXPECT_EQ(chart->sampleCount, 48000 * 3);
 
     for (const std::vector<float>& samples :
          {std::vector<float>{0.5f}, {NAN, 0.25f, NAN, -0.5f}, std::vector<float>(1000, 0.0f)}) {
@@ -207,32 +191,6 @@ TEST_F(ChartOps, RangesDurationAndOddSounds) {
     EXPECT_EQ(chart->geometry.duration, CueTime::FromTicks(INT32_MAX));
     EXPECT_EQ(chart->waveSegmentCount, int(chart->geometry.width));
     chart->SetSound(nullptr);
-}
-
-void count(Widget, XtPointer calls, KLFiend*) {
-    ++*static_cast<int*>(calls);
-}
-
-TEST_F(ChartOps, FeedbackCallsTheCallbacksAndPicksTheKeysAround) {
-    const char* names[] = {"showKeyframeCallback", "showKeyframeImageCallback",
-                           "showReferenceImageCallback"};
-    int calls[3] = {0, 0, 0};
-    for (int i = 0; i < 3; i++)
-        EXPECT_TRUE(chart->SetFiendCallback(names[i], count, &calls[i]));
-    EXPECT_FALSE(chart->SetFiendCallback("noSuchCallback", count, nullptr));
-    chart->SetIndicatorTime(Seconds(3.5));  // halfway from 2 s to 5 s
-    chart->UpdateDisplay();
-    EXPECT_EQ(chart->feedbackKeyBefore, 1);
-    EXPECT_EQ(chart->feedbackKeyAfter, 2);
-    EXPECT_NEAR(chart->feedbackBlend, 0.5f, 0.02f);  // to the pixel
-    EXPECT_EQ(chart->activeKey, nullptr);
-    EXPECT_EQ(std::vector<int>(calls, calls + 3), (std::vector<int>{0, 1, 1}));
-    chart->SetIndicatorTime(Seconds(5));
-    chart->UpdateDisplay();
-    EXPECT_EQ(ActiveFrame(), 150);
-    EXPECT_EQ(calls[0], 1);
-    for (const char* name : names)
-        chart->SetFiendCallback(name, nullptr, nullptr);
 }
 
 }  // namespace

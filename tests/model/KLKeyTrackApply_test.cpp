@@ -16,13 +16,6 @@ class ApplyTest : public ModelTest {
         OpenFace();
         ReadText(set, "key rest 0\nkey open 10\nkey smile 20\n");
     }
-    // A kind-1 channel with one value per key shape; channels are applied in the order added.
-    void AddChannel(const char* node, int channel, std::vector<float> values) {
-        auto c = std::make_unique<KLKeyChannel>(node, channel, int(values.size()));
-        for (size_t i = 0; i < values.size(); ++i)
-            c->Set(int(i), values[i]);
-        set.keyChannels.push_back(std::move(c));
-    }
     void Key(int shape, double frame, int smoothing, float value) {
         track.InsertKey(shape, Frames(frame), set.GetKeyShape(shape), smoothing, value);
     }
@@ -49,8 +42,8 @@ class ApplyTest : public ModelTest {
 // key before (flat first); range ends inclusive to the tick. Constant channels go unreported.
 TEST_F(ApplyTest, BlendsFromRestPoseWithTangentsPerKeyInRange) {
     set.defaultIndex = 2;
-    AddChannel("jaw", KLKeyChannel::kRX, {1, 11, -3});
-    AddChannel("jaw", KLKeyChannel::kTY, {5, 5, 5});
+    AddChannel(set, "jaw", KLKeyChannel::kRX, {1, 11, -3});
+    AddChannel(set, "jaw", KLKeyChannel::kTY, {5, 5, 5});
     Key(1, 0, KLKeyEvent::kLinear, 1.0f);
     Key(0, 3.5, KLKeyEvent::kSmooth, 0.5f);
     Key(1, 10, KLKeyEvent::kEase, 2.0f);
@@ -73,8 +66,8 @@ TEST_F(ApplyTest, BlendsFromRestPoseWithTangentsPerKeyInRange) {
 // the top level is found by name.
 TEST_F(ApplyTest, OffsetAndBaseNode) {
     CueTime::default_fps = 24;
-    AddChannel("jaw", KLKeyChannel::kTZ, {0, 3, 6});
-    AddChannel("lip", KLKeyChannel::kTX, {0, 1, 2});
+    AddChannel(set, "jaw", KLKeyChannel::kTZ, {0, 3, 6});
+    AddChannel(set, "lip", KLKeyChannel::kTX, {0, 1, 2});
     Key(1, 40, KLKeyEvent::kLinear, 1.0f);
     Key(2, 45.5, KLKeyEvent::kLinear, 0.25f);
     ASSERT_EQ(Apply(40, 50, 12.5 - 40, "neck"), 1);
@@ -91,7 +84,7 @@ TEST_F(ApplyTest, NameRulesContinueAndCancel) {
                                  {"lip#2", KLKeyChannel::kTZ},
                                  {"nose", KLKeyChannel::kRX},
                                  {"brow", KLKeyChannel::kTX}})
-        AddChannel(node, channel, {0, 1, 2});
+        AddChannel(set, node, channel, {0, 1, 2});
     Key(2, 1, KLKeyEvent::kEase, 1.0f);
     imp.answers = {1, 1, 0};
     ASSERT_EQ(Apply(0, 5), 0);

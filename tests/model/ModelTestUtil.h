@@ -2,13 +2,13 @@
 
 #include <gtest/gtest.h>
 
-#include <filesystem>
 #include <fstream>
 #include <memory>
 #include <sstream>
 #include <string>
 #include <vector>
 
+#include "model/KLKeySet.h"
 #include "scene/KLWire.h"
 #include "scene/KLWireSource.h"
 #include "scene/OrDagNode.h"
@@ -47,6 +47,15 @@ class ReportCapture : public KLErrHandler {
     void Handle(KLErr* e) override { messages.push_back(e->Message()); }
     std::vector<std::string> messages;
 };
+
+// A kind-1 channel of `set` with one value per key shape, after the channels already there
+// (apply goes through them in that order).
+inline void AddChannel(KLKeySet& set, const char* node, int channel, std::vector<float> values) {
+    auto c = std::make_unique<KLKeyChannel>(node, channel, int(values.size()));
+    for (size_t i = 0; i < values.size(); ++i)
+        c->Set(int(i), values[i]);
+    set.keyChannels.push_back(std::move(c));
+}
 
 template <class T>
 std::string Written(T& x) {
