@@ -7,7 +7,6 @@
 #include "scene/ChannelCurve.h"
 #include "scene/EulerRotation.h"
 #include "scene/KLChannel.h"
-#include "scene/KLKeyFrameList.h"
 #include "scene/KLSplineChannel.h"
 #include "toolkit/CueTime.h"
 
@@ -106,22 +105,19 @@ INSTANTIATE_TEST_SUITE_P(
         CurveCase{"MixedSides", {{0, 0, L, L}, {1, 1, F, F}}, {{0.5, 0.625}}}),
     [](const ::testing::TestParamInfo<CurveCase>& info) { return info.param.name; });
 
-TEST(ChannelCurve, SlopeSidesKindSummaryFrameRateAndMerge) {
-    // At a key the sides differ: linear into key 2 (slope 3), smooth out of it ((2 - 1) / 2).
+// At a key the sides differ: linear into key 2 (slope 3), smooth out of it ((2 - 1) / 2).
+// eval takes frames of the current frame rate. A key at the time of another replaces it.
+TEST(ChannelCurve, SlopeSidesFrameRateAndMerge) {
     Curve k({{0, 0, F, M}, {1, 1, M, L}, {2, 4, L, M}, {3, 2, F, F}});
     EXPECT_NEAR(k.SlopeAt(2, false), 3, 1e-12);
     EXPECT_NEAR(k.SlopeAt(2, true), 0.5, 1e-12);
-    Curve lin({{0, 0, L, L}, {1, 30, L, L}});
-    EXPECT_TRUE(lin.AllLinear() && !lin.AllStep() && !k.AllLinear());
-    EXPECT_TRUE(Curve({{0, 1, L, S}, {1, 5, L, S}}).AllStep());
-    int saved = CueTime::default_fps;
+    const int saved = CueTime::default_fps;
     CueTime::default_fps = 24;
-    EXPECT_DOUBLE_EQ(lin.eval(12), 15);  // frames of the current frame rate
+    EXPECT_DOUBLE_EQ(Curve({{0, 0, L, L}, {1, 30, L, L}}).eval(12), 15);
     CueTime::default_fps = saved;
     Curve c;
-    for (Curve::Key key : Keys{{1, 1}, {0, 0}, {1 + 1e-9, 7}}) {
-        c.Merge(key);  // the third key is at the same time as the first: replaces it
-    }
+    for (Curve::Key key : Keys{{1, 1}, {0, 0}, {1 + 1e-9, 7}})
+        c.Merge(key);
     ASSERT_EQ(c.keys().size(), 2u);
     EXPECT_DOUBLE_EQ(c.keys()[0].time, 0);
     EXPECT_DOUBLE_EQ(c.keys()[1].value, 7);
@@ -140,22 +136,15 @@ TEST(EulerRotation, OrderAndUnwrap) {
 }
 
 // The preview's channels: a key at the time of another replaces it; the spline channel gives
-// the Smooth case above, in ticks; removing either channel of a pair removes the pair.
-TEST(PreviewChannels, KeyedSplineAndKeyFrameList) {
-    KLChannel c, d;
+// the Smooth case above, in ticks.
+TEST(PreviewChannels, KeyedAndSpline) {
+    KLChannel c;
     KLSplineChannel s;
     c.AddKey(CueTime::FromTicks(600), 10);
     c.AddKey(CueTime::FromTicks(600), 20);
     EXPECT_EQ(c.KeyCount(), 1);
     EXPECT_FLOAT_EQ(c.Evaluate(CueTime::FromTicks(0)), 20);
-    for (int i : {0, 1, 2}) {
+    for (int i : {0, 1, 2})
         s.AddKey(CueTime::FromTicks(100 * i), float(i * i));
-    }
     EXPECT_NEAR(s.Evaluate(CueTime::FromTicks(50)), 0.375, 1e-6);
-    KLKeyFrameList list({1, 2, 3}, 7);
-    list.AddKeyChannel(&s, &d);
-    list.AddKeyChannel(&c, &s);
-    list.RemoveKeyChannel(&d);
-    ASSERT_EQ(list.KeyChannels().size(), 1u);
-    EXPECT_EQ(list.KeyChannels()[0].first, &c);
 }

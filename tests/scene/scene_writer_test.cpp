@@ -411,15 +411,3 @@ TEST_F(SceneWriterTest, AFarKeyCostsNothingAndATooLongCurveIsRefused) {
         EXPECT_FALSE(std::filesystem::exists(refused));
     }
 }
-
-// Buffers and images named by a uri are read from regular files only.
-TEST_F(SceneWriterTest, AUriNamingADirectoryIsRefused) {
-    std::filesystem::create_directory(dir + "/sub");
-    for (const char* part :
-         {R"("buffers":[{"byteLength":4,"uri":"sub"}])", R"("images":[{"uri":"sub"}])"}) {
-        WriteFile(dir + "/d.gltf", std::string(R"({"asset":{"version":"2.0"},)") + part + "}");
-        std::string error;
-        EXPECT_FALSE(SceneDocument::Load(dir + "/d.gltf", &error));
-        EXPECT_NE(error.find("not a regular file"), std::string::npos) << error;
-    }
-}
