@@ -125,15 +125,6 @@ const BadCase kBadCases[] = {
          std::memset(m.buffers[0].data.data() + v.byteOffset, 'x', 8);
      },
      "image 0 cannot be decoded; its materials show their base colour", 2},
-    {"camera_zero_aspect",
-     [](tinygltf::Model& m) {
-         m.cameras.emplace_back();
-         m.cameras[0].type = "perspective";
-         m.cameras[0].perspective.yfov = 0.5;
-         m.cameras[0].perspective.znear = 0.1;  // and no aspect ratio
-         m.nodes[0].camera = 0;
-     },
-     "camera 0 has no usable aspect ratio; the view's own shape is used", 2},
     {"no_meshes",
      [](tinygltf::Model& m) {
          m.meshes.clear();
