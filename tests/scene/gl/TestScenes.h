@@ -16,8 +16,6 @@ struct Sheet {
                        // by (0, 0.5, 0.5)
     std::vector<float> morphWeights;  // the mesh's default weights (zeros when empty)
     int animatedFrames = 0;           // animation "shapes": STEP joint turns at frames 0..N-1
-    std::vector<float> weightTimes;   // animation "weights": key times (s)...
-    std::vector<float> weightValues;  // ...and the weights of each key
     bool backSheet = false;           // a second sheet 0.5 m behind, facing away
     bool texture = false;             // a 2 x 2 red and blue checker as base colour texture
 };

@@ -20,21 +20,6 @@ const unsigned char kChecker[] = {
 constexpr int kArray = TINYGLTF_TARGET_ARRAY_BUFFER;
 constexpr int kElements = TINYGLTF_TARGET_ELEMENT_ARRAY_BUFFER;
 
-// A channel of animation `anim` on `node`'s `path`, its keys at accessor `input`.
-void add_channel(GltfModelBuilder& builder, tinygltf::Animation& anim, int node, const char* path,
-                 int input, const std::vector<float>& values, int width, const char* mode) {
-    tinygltf::AnimationSampler sampler;
-    sampler.input = input;
-    sampler.output = builder.Floats(values, width);
-    sampler.interpolation = mode;
-    anim.samplers.push_back(sampler);
-    tinygltf::AnimationChannel channel;
-    channel.sampler = int(anim.samplers.size()) - 1;
-    channel.target_node = node;
-    channel.target_path = path;
-    anim.channels.push_back(channel);
-}
-
 // One sheet's primitive: positions in the plane z = `z`, facing +Z unless `flip`.
 tinygltf::Primitive sheet_primitive(GltfModelBuilder& builder, const Sheet& s, float z, bool flip) {
     const int cols = std::max(1, s.columns), rows = std::max(1, s.rows);
@@ -162,15 +147,16 @@ bool WriteSheet(const std::string& path, const Sheet& s) {
                 const double half = 2.0 * std::sin(double(j + f)) * M_PI / 360.0;
                 quats.insert(quats.end(), {0, 0, float(std::sin(half)), float(std::cos(half))});
             }
-            add_channel(builder, m.animations.back(), m.skins[0].joints[size_t(j)], "rotation",
-                        input, quats, 4, "STEP");
+            tinygltf::Animation& anim = m.animations.back();
+            anim.samplers.emplace_back();
+            anim.samplers.back().input = input;
+            anim.samplers.back().output = builder.Floats(quats, 4);
+            anim.samplers.back().interpolation = "STEP";
+            anim.channels.emplace_back();
+            anim.channels.back().sampler = j;
+            anim.channels.back().target_node = m.skins[0].joints[size_t(j)];
+            anim.channels.back().target_path = "rotation";
         }
-    }
-    if (s.morphTargets > 0 && !s.weightTimes.empty()) {
-        m.animations.emplace_back();
-        m.animations.back().name = "weights";
-        add_channel(builder, m.animations.back(), 0, "weights",
-                    builder.Floats(s.weightTimes, 1, 0, true), s.weightValues, 1, "LINEAR");
     }
     const bool binary = path.size() > 4 && path.compare(path.size() - 4, 4, ".glb") == 0;
     return tinygltf::TinyGLTF().WriteGltfSceneToFile(&m, path, true, true, true, binary);
