@@ -13,9 +13,8 @@ namespace {
 std::string NamesOf(OrDagNode* top, int withTop) {
     std::unique_ptr<KLDagList> list = KLWire::BuildDagList(top, withTop);
     std::string out;
-    for (const auto& n : list->nodes) {
+    for (const auto& n : list->nodes)
         out += std::string(out.empty() ? "" : " ") + KLWire::NodeName(n.get());
-    }
     return out;
 }
 
@@ -36,12 +35,10 @@ void ExpectSameCurves(const SceneDocument& a, const SceneDocument& b) {
                 continue;
             }
             ASSERT_TRUE(cb) << where;
-            for (int f = -2; f <= 50; ++f) {
+            for (int f = -2; f <= 50; ++f)
                 ASSERT_NEAR(ca->eval(f), cb->eval(f), 2e-4) << where << " frame " << f;
-            }
-            for (const ChannelCurve::Key& k : ca->keys()) {
+            for (const ChannelCurve::Key& k : ca->keys())
                 ASSERT_NEAR(ca->Evaluate(k.time), cb->Evaluate(k.time), 2e-4) << where << " key";
-            }
         }
     }
 }
@@ -84,15 +81,13 @@ TEST_P(FaceScene, ReadsAndRoundTrips) {
     const std::tuple<const char*, int, double, double> rows[] = {
         {"jaw", 1, 0.5, -0.5}, {"jaw", 1, 10, -2},    {"jaw", 3, 2.9, 0}, {"jaw", 3, 3, 90},
         {"jaw", 4, 3, 0},      {"brow", 6, 15, 2.25}, {"brow", 7, 15, 1}, {"lip", 0, 15, 2.5}};
-    for (auto [node, channel, frame, value] : rows) {
+    for (auto [node, channel, frame, value] : rows)
         EXPECT_NEAR(face.Eval(node, channel, frame), value, channel < 3 ? 1e-5 : 1e-3)
             << node << " channel " << channel << " frame " << frame;
-    }
     // Translation with mixed tangents; RZ too, so the rotation is sampled, RX's step included
     // (its key at 0.1 s rounded to float must still hold from frame 3); a lossless LINEAR scale.
-    for (auto [channel, scale] : {std::pair{0, 3.0f}, {1, 1.0f}, {5, -25.0f}}) {
+    for (auto [channel, scale] : {std::pair{0, 3.0f}, {1, 1.0f}, {5, -25.0f}})
         ASSERT_EQ(StoreKeys(jaw.get(), channel, MixedKeys(scale)), 1);
-    }
     ASSERT_EQ(StoreKeys(found.get(), 6, {{0, 1, 1, 1}, {3000, 2, 1, 1}}), 1);
     ASSERT_EQ(StoreKeys(found.get(), 0, MixedKeys(2)), 1);
     ASSERT_EQ(face.source->Store(out.c_str()), 1);
@@ -181,7 +176,6 @@ TEST(SceneEdges, NamesStoreRejectsAndFailures) {
 TEST(DemoFace, JawShapes) {
     OpenScene face;
     ASSERT_TRUE(face.Open(CHIRRUP_SOURCE_DIR "/resources/demo/face.glb"));
-    for (auto [frame, degrees] : {std::pair{0.0, 0.0}, {1, 14}, {1.9, 14}, {3, 12}, {5, 0}}) {
+    for (auto [frame, degrees] : {std::pair{0.0, 0.0}, {1, 14}, {1.9, 14}, {3, 12}, {5, 0}})
         EXPECT_NEAR(face.Eval("jaw", 3, frame), degrees, 1e-3) << frame;
-    }
 }

@@ -6,9 +6,7 @@
 #include <stdexcept>
 #include <tuple>
 
-#include "scene/EulerRotation.h"
 #include "scene/SamplerBuilder.h"
-#include "scene/SceneChecker.h"
 #include "scene/SceneDocument.h"
 #include "scene/scene_builder_util.h"
 #include "scene/scene_util.h"
@@ -102,11 +100,10 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
     EXPECT_EQ(w.times, (std::vector<float>{0, 1000 / 6000.0f, 0.5f, 1, 1.5f}));
     const SceneDocument& doc = *scene.source->document();
     for (int f = 0; f <= 50; ++f) {
-        for (int c : {0, 1, 2}) {
+        for (int c : {0, 1, 2})
             ASSERT_NEAR(back->Curve(0, c)->eval(f), doc.Curve(0, c) ? doc.Curve(0, c)->eval(f) : 0,
                         1e-5)
                 << "channel " << c << " frame " << f;
-        }
     }
 }
 
@@ -130,9 +127,8 @@ TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
     EXPECT_LT(pos.times.size(), 121u);
     // Every frame, and every key of the path's own axes.
     std::vector<double> checks[2];
-    for (int f = 0; f <= 630; ++f) {
+    for (int f = 0; f <= 630; ++f)
         checks[0].push_back(f / 30.0), checks[1].push_back(f / 30.0);
-    }
     for (int c : {0, 1, 3, 4, 5}) {
         for (const ChannelCurve::Key& k : doc.Curve(0, c)->keys())
             checks[c / 3].push_back(k.time);
@@ -352,10 +348,9 @@ TEST_F(SceneWriterTest, StoresInTurnKeepOneBufferForTheNewAnimation) {
         auto back = StoreAndRead(pass < 2 ? "out.glb" : "out.gltf");
         EXPECT_EQ(back->model().buffers.size(), pass < 2 ? 1u : buffersRead + 2) << pass;
         for (int n = 0; n < 3; ++n) {
-            for (int ch : {0, 1, 5}) {
+            for (int ch : {0, 1, 5})
                 EXPECT_NEAR(back->Curve(n, ch)->Evaluate(0.5), last[n] + n + ch, 1e-3)
                     << "pass " << pass << " node " << n << " channel " << ch;
-            }
         }
     }
 }

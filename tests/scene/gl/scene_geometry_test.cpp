@@ -13,18 +13,9 @@
 
 namespace {
 
-// Sets one channel of one node, whatever the time.
-class FixedPose : public KLPoseSource {
-  public:
-    FixedPose(int node, int channel, double value)
-        : node_(node), channel_(channel), value_(value) {}
-    void Pose(KLWireSource*, CueTime, ScenePose* pose) override {
-        pose->Set(node_, channel_, value_);
-    }
-
-  private:
-    int node_, channel_;
-    double value_;
+// Raises joint 1 (node 2) by 1, whatever the time.
+struct RaiseJoint1 : KLPoseSource {
+    void Pose(KLWireSource*, CueTime, ScenePose* pose) override { pose->Set(2, 1, 1.0); }
 };
 
 class SceneGeometryTest : public ::testing::Test {
@@ -54,7 +45,7 @@ TEST_F(SceneGeometryTest, SkinFollowsItsJoints) {
     scene.Evaluate(CueTime());
     ASSERT_EQ(scene.DrawItems().size(), 1u);
     EXPECT_NEAR(Vertex(4).y, -1.0f, 1e-5) << "right edge at rest";
-    scene.SetPoseSource(std::make_unique<FixedPose>(2, 1, 1.0));  // joint1 TY
+    scene.SetPoseSource(std::make_unique<RaiseJoint1>());
     scene.Evaluate(CueTime());
     EXPECT_NEAR(Vertex(0).y, -1.0f, 1e-5) << "left edge, joint 0";
     EXPECT_NEAR(Vertex(4).y, 0.0f, 1e-5) << "right edge, joint 1";
