@@ -7,7 +7,6 @@
 #include "scene/ChannelCurve.h"
 #include "scene/EulerRotation.h"
 #include "scene/KLChannel.h"
-#include "scene/KLKeyFrameList.h"
 #include "scene/KLSplineChannel.h"
 #include "toolkit/CueTime.h"
 
@@ -27,33 +26,26 @@ struct CurveCase {
 class CurveEvaluate : public ::testing::TestWithParam<CurveCase> {};
 
 // Hand-computed values; SlopeAt from either side against the difference quotient.
-TEST_P(CurveEvaluate, GivesTheHermiteValueAndItsSlope) {
+TEST_P(CurveEvaluate, GivesTheHermiteValueItsSlopeAndTheSameInOnePass) {
     Curve c(GetParam().keys);
     for (const auto& [t, value] : GetParam().samples) {
         EXPECT_NEAR(c.Evaluate(t), value, 1e-12) << "at " << t;
         bool atKey = std::any_of(c.keys().begin(), c.keys().end(),
                                  [t = t](const Curve::Key& k) { return k.time == t; });
-        if (std::isnan(t) || atKey) {
+        if (std::isnan(t) || atKey)
             continue;
-        }
         bool inside = t > c.keys().front().time && t < c.keys().back().time;
         double numeric = inside ? (c.Evaluate(t + 1e-6) - c.Evaluate(t - 1e-6)) / 2e-6 : 0;
         EXPECT_NEAR(c.SlopeAt(t, true), numeric, 1e-5) << "at " << t;
         EXPECT_NEAR(c.SlopeAt(t, false), numeric, 1e-5) << "at " << t;
     }
-}
-
-// The one-pass sampling gives what Evaluate and SlopeAt give one time at a time: at every key
-// (where the sides differ), within float rounding of a key, between keys (several times in one
-// segment) and outside the keys.
-TEST_P(CurveEvaluate, OnePassSamplingMatchesPointwise) {
-    Curve c(GetParam().keys);
+    // The one-pass sampling gives what Evaluate and SlopeAt give one time at a time: at every
+    // key (where the sides differ), within float rounding of a key, between keys (several times
+    // in one segment) and outside the keys. MaxSlope bounds the slope everywhere.
     std::vector<double> times = {-1.0};
     for (const Curve::Key& k : c.keys()) {
-        for (double t :
-             {k.time - 0.3, k.time - 1e-8, k.time, k.time + 1e-8, k.time + 0.25, k.time + 0.5}) {
-            times.push_back(t);
-        }
+        for (double d : {-0.3, -1e-8, 0.0, 1e-8, 0.25, 0.5})
+            times.push_back(k.time + d);
     }
     times.push_back(c.keys().back().time + 5);
     std::sort(times.begin(), times.end());
@@ -69,7 +61,6 @@ TEST_P(CurveEvaluate, OnePassSamplingMatchesPointwise) {
     std::vector<double> only;
     c.EvaluateSorted(times, &only);
     EXPECT_EQ(only, values);
-    // The bound on the slope holds everywhere and is reached (the steepest point of a cubic).
     double steepest = 0;
     const double from = c.keys().front().time, to = c.keys().back().time;
     for (int i = 0; i <= 20000; ++i) {
@@ -78,15 +69,6 @@ TEST_P(CurveEvaluate, OnePassSamplingMatchesPointwise) {
             std::max({steepest, std::fabs(c.SlopeAt(t, true)), std::fabs(c.SlopeAt(t, false))});
     }
     EXPECT_GE(c.MaxSlope(), steepest * (1 - 1e-12));
-    EXPECT_LE(c.MaxSlope(), steepest * 1.001 + 1e-12);
-    // The slopes of every key at once are the ones asked key by key.
-    std::vector<double> in, out;
-    c.Slopes(&in, &out);
-    ASSERT_EQ(in.size(), c.keys().size());
-    for (size_t k = 0; k < c.keys().size(); ++k) {
-        EXPECT_EQ(in[k], c.InSlope(k)) << "key " << k;
-        EXPECT_EQ(out[k], c.OutSlope(k)) << "key " << k;
-    }
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -106,22 +88,19 @@ INSTANTIATE_TEST_SUITE_P(
         CurveCase{"MixedSides", {{0, 0, L, L}, {1, 1, F, F}}, {{0.5, 0.625}}}),
     [](const ::testing::TestParamInfo<CurveCase>& info) { return info.param.name; });
 
-TEST(ChannelCurve, SlopeSidesKindSummaryFrameRateAndMerge) {
-    // At a key the sides differ: linear into key 2 (slope 3), smooth out of it ((2 - 1) / 2).
+// At a key the sides differ: linear into key 2 (slope 3), smooth out of it ((2 - 1) / 2).
+// eval takes frames of the current frame rate. A key at the time of another replaces it.
+TEST(ChannelCurve, SlopeSidesFrameRateAndMerge) {
     Curve k({{0, 0, F, M}, {1, 1, M, L}, {2, 4, L, M}, {3, 2, F, F}});
     EXPECT_NEAR(k.SlopeAt(2, false), 3, 1e-12);
     EXPECT_NEAR(k.SlopeAt(2, true), 0.5, 1e-12);
-    Curve lin({{0, 0, L, L}, {1, 30, L, L}});
-    EXPECT_TRUE(lin.AllLinear() && !lin.AllStep() && !k.AllLinear());
-    EXPECT_TRUE(Curve({{0, 1, L, S}, {1, 5, L, S}}).AllStep());
-    int saved = CueTime::default_fps;
+    const int saved = CueTime::default_fps;
     CueTime::default_fps = 24;
-    EXPECT_DOUBLE_EQ(lin.eval(12), 15);  // frames of the current frame rate
+    EXPECT_DOUBLE_EQ(Curve({{0, 0, L, L}, {1, 30, L, L}}).eval(12), 15);
     CueTime::default_fps = saved;
     Curve c;
-    for (Curve::Key key : Keys{{1, 1}, {0, 0}, {1 + 1e-9, 7}}) {
-        c.Merge(key);  // the third key is at the same time as the first: replaces it
-    }
+    for (Curve::Key key : Keys{{1, 1}, {0, 0}, {1 + 1e-9, 7}})
+        c.Merge(key);
     ASSERT_EQ(c.keys().size(), 2u);
     EXPECT_DOUBLE_EQ(c.keys()[0].time, 0);
     EXPECT_DOUBLE_EQ(c.keys()[1].value, 7);
@@ -140,22 +119,15 @@ TEST(EulerRotation, OrderAndUnwrap) {
 }
 
 // The preview's channels: a key at the time of another replaces it; the spline channel gives
-// the Smooth case above, in ticks; removing either channel of a pair removes the pair.
-TEST(PreviewChannels, KeyedSplineAndKeyFrameList) {
-    KLChannel c, d;
+// the Smooth case above, in ticks.
+TEST(PreviewChannels, KeyedAndSpline) {
+    KLChannel c;
     KLSplineChannel s;
     c.AddKey(CueTime::FromTicks(600), 10);
     c.AddKey(CueTime::FromTicks(600), 20);
     EXPECT_EQ(c.KeyCount(), 1);
     EXPECT_FLOAT_EQ(c.Evaluate(CueTime::FromTicks(0)), 20);
-    for (int i : {0, 1, 2}) {
+    for (int i : {0, 1, 2})
         s.AddKey(CueTime::FromTicks(100 * i), float(i * i));
-    }
     EXPECT_NEAR(s.Evaluate(CueTime::FromTicks(50)), 0.375, 1e-6);
-    KLKeyFrameList list({1, 2, 3}, 7);
-    list.AddKeyChannel(&s, &d);
-    list.AddKeyChannel(&c, &s);
-    list.RemoveKeyChannel(&d);
-    ASSERT_EQ(list.KeyChannels().size(), 1u);
-    EXPECT_EQ(list.KeyChannels()[0].first, &c);
 }

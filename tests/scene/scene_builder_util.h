@@ -18,15 +18,10 @@ class ModelBuilder : public GltfModelBuilder {
     }
     // A node named `name` under `parent` (-1: a root of the scene); its index.
     int Node(const std::string& name, int parent = -1) {
-        tinygltf::Node n;
-        n.name = name;
-        m.nodes.push_back(n);
-        int index = int(m.nodes.size()) - 1;
-        if (parent < 0) {
-            m.scenes[0].nodes.push_back(index);
-        } else {
-            m.nodes[size_t(parent)].children.push_back(index);
-        }
+        m.nodes.emplace_back();
+        m.nodes.back().name = name;
+        const int index = int(m.nodes.size()) - 1;
+        (parent < 0 ? m.scenes[0].nodes : m.nodes[size_t(parent)].children).push_back(index);
         return index;
     }
     // A channel on `node`'s `path` in animation `clip` (made as needed), its data in `buffer`.
@@ -38,16 +33,15 @@ class ModelBuilder : public GltfModelBuilder {
             m.animations.back().name = "clip" + std::to_string(m.animations.size() - 1);
         }
         tinygltf::Animation& anim = m.animations[size_t(clip)];
-        tinygltf::AnimationSampler s;
-        s.input = Floats(times, 1, buffer, true);
-        s.output = Floats(values, std::string(path) == "rotation" ? 4 : 3, buffer);
-        s.interpolation = interpolation;
-        tinygltf::AnimationChannel c;
-        c.sampler = int(anim.samplers.size());
-        c.target_node = node;
-        c.target_path = path;
-        anim.samplers.push_back(s);
-        anim.channels.push_back(c);
+        anim.channels.emplace_back();
+        anim.channels.back().sampler = int(anim.samplers.size());
+        anim.channels.back().target_node = node;
+        anim.channels.back().target_path = path;
+        anim.samplers.emplace_back();
+        anim.samplers.back().input = Floats(times, 1, buffer, true);
+        anim.samplers.back().output =
+            Floats(values, std::string(path) == "rotation" ? 4 : 3, buffer);
+        anim.samplers.back().interpolation = interpolation;
     }
     bool Save(const std::string& path, bool binary = false) {
         tinygltf::TinyGLTF io;

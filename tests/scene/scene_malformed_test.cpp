@@ -58,6 +58,8 @@ INSTANTIATE_TEST_SUITE_P(
              "wrong element type"},
         Case{"MissingExternalBuffer", R"("uri":"data:)", R"("uri":"missing.bin","x":")",
              "missing.bin"},
+        Case{"BufferUriNamesADirectory", R"("uri":"data:)", R"("uri":".","x":")",
+             "is not a regular file"},
         Case{"NaNKeyValue", "", "", "NaN", {{13, NAN}}},
         Case{"KeyBeyond100Hours", "", "", "100 hours", {{11, 1e30f}}},
         Case{"EqualKeyTimes", "", "", "strictly increasing", {{10, 0}}}),

@@ -88,7 +88,7 @@ inline void WriteFile(const std::string& path, const std::string& bytes) {
 }
 inline std::string ReadFile(const std::string& path) {
     std::ifstream in(path, std::ios::binary);
-    return std::string(std::istreambuf_iterator<char>(in), {});
+    return {std::istreambuf_iterator<char>(in), {}};
 }
 
 // A scene file opened through KLWireSource, with the wire layer reset and 30 frames a second.
@@ -129,10 +129,8 @@ inline int StoreKeys(OrDagNode* node, int channel, const std::vector<StoreKey>& 
     std::vector<float> values;
     std::vector<int> in, out;
     for (const StoreKey& k : keys) {
-        times.push_back(CueTime::FromTicks(k.ticks));
-        values.push_back(k.value);
-        in.push_back(k.in);
-        out.push_back(k.out);
+        times.push_back(CueTime::FromTicks(k.ticks)), values.push_back(k.value);
+        in.push_back(k.in), out.push_back(k.out);
     }
     KLWire::alwaysClearChannel = clear ? 1 : 0;
     return KLWire::StoreChannel(node, channel, int(keys.size()), times.data(), values.data(),

@@ -21,17 +21,14 @@ inline Written WrittenSampler(const tinygltf::Model& m, int node, const std::str
     std::string why;
     for (size_t a = 0; a < m.animations.size(); ++a) {
         for (const tinygltf::AnimationChannel& c : m.animations[a].channels) {
-            if (c.target_node != node || c.target_path != path) {
-                continue;
+            if (c.target_node == node && c.target_path == path) {
+                const tinygltf::AnimationSampler& s = m.animations[a].samplers[size_t(c.sampler)];
+                ++w.channels, w.clip = int(a), w.interpolation = s.interpolation;
+                EXPECT_TRUE(SceneChecker::ReadFloats(m, s.input, 1, &w.times, &why) &&
+                            SceneChecker::ReadFloats(m, s.output, path == "rotation" ? 4 : 3,
+                                                     &w.values, &why))
+                    << why;
             }
-            ++w.channels;
-            w.clip = int(a);
-            const tinygltf::AnimationSampler& s = m.animations[a].samplers[size_t(c.sampler)];
-            w.interpolation = s.interpolation;
-            EXPECT_TRUE(SceneChecker::ReadFloats(m, s.input, 1, &w.times, &why)) << why;
-            EXPECT_TRUE(
-                SceneChecker::ReadFloats(m, s.output, path == "rotation" ? 4 : 3, &w.values, &why))
-                << why;
         }
     }
     return w;

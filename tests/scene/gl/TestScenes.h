@@ -6,19 +6,16 @@
 // Small generated glTF scenes for the view tests and benchmarks (see README.md).
 namespace testscenes {
 
-// A sheet of columns x rows quads in the XY plane, centred on the origin, facing +Z.
+// A sheet of columns x rows quads, 2 m square in the XY plane, centred on the origin, facing +Z.
 struct Sheet {
-    int columns = 1;
-    int rows = 1;
-    float width = 2.0f;    // metres along X
-    float height = 2.0f;   // metres along Y
-    int joints = 0;        // a chain along X; each vertex follows the joint of its column band
-    int morphTargets = 0;  // target k lifts a quarter-wide band from column k * columns / targets
-    float morphLift = 0.5f;
+    explicit Sheet(int columns = 1, int rows = 1, int joints = 0, int morphTargets = 0)
+        : columns(columns), rows(rows), joints(joints), morphTargets(morphTargets) {}
+    int columns, rows;
+    int joints;        // a chain along X; each vertex follows the joint of its column band
+    int morphTargets;  // target k lifts a quarter-wide band from column k * columns / targets
+                       // by (0, 0.5, 0.5)
     std::vector<float> morphWeights;  // the mesh's default weights (zeros when empty)
     int animatedFrames = 0;           // animation "shapes": STEP joint turns at frames 0..N-1
-    std::vector<float> weightTimes;   // animation "weights": key times (s)...
-    std::vector<float> weightValues;  // ...and the weights of each key
     bool backSheet = false;           // a second sheet 0.5 m behind, facing away
     bool texture = false;             // a 2 x 2 red and blue checker as base colour texture
 };
