@@ -121,16 +121,6 @@ class Recognizers : public ::testing::Test {
     KLKeySet* mouth = nullptr;
 };
 
-// A menu entry whose plug-in cannot make a recognizer says so and adds nothing.
-TEST_F(Recognizers, AnUnknownPluginIsToldAndAddsNothing) {
-    const size_t before = mouth->recognizers.size();
-    EXPECT_EQ(windowtest::AnswerAlerts(
-                  gnome->attentionAlert.get(),
-                  [] { Gnome::create_recognize_cb(nullptr, const_cast<char*>("Vowel"), nullptr); }),
-              "Failed to locate plug-in recognizer [Vowel].");
-    EXPECT_EQ(mouth->recognizers.size(), before);
-}
-
 // The panel comes from the plug-in; Recognize fills the mouth's track.
 TEST_F(Recognizers, PanelShowsAndRecognizeFillsTheMouthTrack) {
     ChartOverDialogue(0);
