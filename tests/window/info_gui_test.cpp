@@ -1,20 +1,16 @@
-// The information bar, the window's messages and questions, and the error flag.
+// The error flag and the reference-load dialog of the main window.
 #include <gtest/gtest.h>
 
-#include <Xm/MessageB.h>
 #include <Xm/TextF.h>
 #include <Xm/Xm.h>
 
-#include <fstream>
 #include <string>
-#include <vector>
 
 #include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
 #include "testkit/TempDir.h"
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLString.h"
-#include "toolkit/xm/KLAlert.h"
 #include "toolkit/xm/KLImageView.h"
 #include "window/Gnome.h"
 #include "window/WindowTestUtil.h"
@@ -27,21 +23,6 @@ class InfoTest : public ::testing::Test {
     void SetUp() override { gnome = &windowtest::TheWindow(); }
     Gnome* gnome = nullptr;
 };
-
-// Confirm asks in the window; a file that fails to load is told in the window, which goes on.
-TEST_F(InfoTest, ConfirmAndFailedLoadsAreAskedInTheWindow) {
-    KLAlert* alert = gnome->attentionAlert.get();
-    int answer = -1;
-    EXPECT_EQ(windowtest::AnswerAlerts(
-                  alert, [&] { answer = gnome->Confirm("Go on?", "Yes", "No"); }, 1),
-              "Go on?");
-    EXPECT_EQ(answer, 0);
-    testkit::TempDir dir;
-    const std::string missing = dir / "missing.track";
-    EXPECT_EQ(windowtest::AnswerAlerts(alert, [&] { answer = theImp.LoadTrack(missing.c_str()); }),
-              "Failed to open track file [" + missing + "].");
-    EXPECT_EQ(answer, 0);
-}
 
 // A logged error makes the flag solid; viewing the log (what the log holds is the workspace's
 // business) clears it.

@@ -146,7 +146,7 @@ TEST_F(PlaybackWindowTest, LoopsRestartUntilStoppedWhereTheyAre) {
     const CueTime at = chart->GetIndicatorTime();
     EXPECT_GE(at, s);
     EXPECT_LE(at, e);
-    EXPECT_EQ(Label("infoTimeValue"), at.Text());
+    EXPECT_EQ(Label(W("infoTimeValue")), at.Text());
 }
 
 TEST_F(PlaybackWindowTest, PlayForwardSaveMakesOneFrameSlotPerRegionFrame) {
@@ -186,7 +186,7 @@ TEST_F(PlaybackWindowTest, TheTimecodeFollowsAnIndicatorDraggedByHand) {
     guitest::Settle();
     const CueTime at = chart->GetIndicatorTime();
     EXPECT_EQ(g.indicatorX, to);
-    EXPECT_EQ(Label("infoTimeValue"), at.Text());
+    EXPECT_EQ(Label(W("infoTimeValue")), at.Text());
 }
 
 }  // namespace
