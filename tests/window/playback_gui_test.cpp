@@ -149,15 +149,6 @@ TEST_F(PlaybackWindowTest, LoopsRestartUntilStoppedWhereTheyAre) {
     EXPECT_EQ(Label(W("infoTimeValue")), at.Text());
 }
 
-TEST_F(PlaybackWindowTest, PlayForwardSaveMakesOneFrameSlotPerRegionFrame) {
-    CueTime s, e;
-    Region(CueTime::FromFrames(30), CueTime::FromFrames(60), &s, &e);
-    guitest::Click(W("playForwardSave"));
-    guitest::Settle();
-    EXPECT_NEAR(theImp.playblastCount, 30, 1);
-    EXPECT_EQ(gnome->playTimer, nullptr) << "no sound, no timer";
-}
-
 // Dragging the indicator by hand across the sound, away from any key, the information bar
 // shows where it was let go, not where the press was.
 TEST_F(PlaybackWindowTest, TheTimecodeFollowsAnIndicatorDraggedByHand) {

@@ -5,11 +5,9 @@
 #include <Xm/List.h>
 #include <Xm/Xm.h>
 
-#include <chrono>
 #include <cmath>
 #include <cstdlib>
 #include <fstream>
-#include <map>
 #include <sstream>
 #include <string>
 
@@ -54,14 +52,10 @@ void raise(Widget dialog) {
     guitest::Settle();
 }
 
-// Clicks item `position` of a list; a single click first waits out the multi-click time.
+// Clicks item `position` of a list, first waiting out the multi-click time so that a single
+// click is not taken for the second of two.
 void click_item(Widget list, int position, bool twice = false) {
-    static std::map<Widget, std::chrono::steady_clock::time_point> lastClick;
-    const auto multiClick = std::chrono::milliseconds(XtGetMultiClickTime(XtDisplay(list)) + 50);
-    if (lastClick.count(list))
-        guitest::WaitFor(
-            [&] { return std::chrono::steady_clock::now() - lastClick[list] > multiClick; });
-    lastClick[list] = std::chrono::steady_clock::now();
+    guitest::WaitFor([] { return false; }, XtGetMultiClickTime(XtDisplay(list)) / 1000.0 + 0.05);
     XmListSetPos(list, position);
     guitest::Settle();
     Position x = 0, y = 0;
