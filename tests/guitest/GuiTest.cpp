@@ -23,9 +23,18 @@ namespace {
 
 // Points DISPLAY at the fixture's display when the fixture file names one.
 void use_fixture_display() {
+    const char* file = getenv("CHIRRUP_DISPLAY_FILE");
+    if (!file)
+        return;
+    std::ifstream in(file);
     std::string display;
-    if (const char* file = getenv("CHIRRUP_DISPLAY_FILE"); file && std::ifstream(file) >> display)
+    if (in >> display)
         setenv("DISPLAY", display.c_str(), 1);
+}
+
+void sync_and_process() {
+    XSync(GetDisplay(), False);
+    KLXmGnome::ProcessPending();
 }
 
 void modifier_keys(unsigned int modifiers, bool press) {
@@ -89,12 +98,11 @@ bool WaitFor(const std::function<bool()>& done, double seconds) {
 }
 
 void Settle() {
-    for (int i = 0; i < 4; i++) {
-        if (i > 0)
-            std::this_thread::sleep_for(std::chrono::milliseconds(5));
-        XSync(GetDisplay(), False);
-        KLXmGnome::ProcessPending();
+    for (int i = 0; i < 3; i++) {
+        sync_and_process();
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
     }
+    sync_and_process();
 }
 
 bool Viewable(Widget widget) {

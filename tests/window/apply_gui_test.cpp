@@ -56,10 +56,9 @@ TEST(ApplyTypein, FieldCorrectsTheOthers) {
                                        Case{"nonsense", 7, {10, 40, 100, 130}}}) {
         KLEdlEvent e("scene.glb", Frames(10), Frames(40), Frames(100), Frames(130));
         Gnome::apply_typein(&e, field, Frames(typed), Frames(60));
-        const std::array<int, 4> ticks = {int(e.sourceIn.Ticks()), int(e.sourceOut.Ticks()),
-                                          int(e.destIn.Ticks()), int(e.destOut.Ticks())};
-        EXPECT_EQ(ticks,
-                  (std::array{after[0] * 200, after[1] * 200, after[2] * 200, after[3] * 200}))
+        EXPECT_EQ(
+            (std::array{e.sourceIn, e.sourceOut, e.destIn, e.destOut}),
+            (std::array{Frames(after[0]), Frames(after[1]), Frames(after[2]), Frames(after[3])}))
             << field << " " << typed;
     }
 }

@@ -86,17 +86,19 @@ TEST(WindowTest, QuitAsksAboutModifiedFiles) {
     // Save the keyset, then Cancel at the track's question: saved, and the program runs on.
     exited = -1;
     KLAlert* alert = gnome.attentionAlert.get();
+    const auto press = [alert](int button) -> std::function<bool()> {
+        return [=] { return alert->Waiting() && ClickWhenViewable(alert->Button(button)); };
+    };
     const std::string saved = windowtest::DemoProject() + "/misc_data/quit-saved.kset";
     fs::remove(saved);
     {
-        AnswerScript script({
-            [&] { return alert->Waiting() && ClickWhenViewable(alert->Button(0)); },
-            [&] {
-                return gnome.keysetManager->Waiting() &&
-                       windowtest::ChooseInBrowser(gnome.keysetManager->Browser(), saved);
-            },
-            [&] { return alert->Waiting() && ClickWhenViewable(alert->Button(2)); },
-        });
+        AnswerScript script({press(0),
+                             [&] {
+                                 return gnome.keysetManager->Waiting() &&
+                                        windowtest::ChooseInBrowser(gnome.keysetManager->Browser(),
+                                                                    saved);
+                             },
+                             press(2)});
         Gnome::quit_cb(nullptr, nullptr, nullptr);
         EXPECT_TRUE(script.Finished());
     }
@@ -105,10 +107,7 @@ TEST(WindowTest, QuitAsksAboutModifiedFiles) {
 
     // Don't Save twice: ends with 0.
     theImp.keysetModified = theImp.trackModified = 1;
-    AnswerScript script({
-        [&] { return alert->Waiting() && ClickWhenViewable(alert->Button(1)); },
-        [&] { return alert->Waiting() && ClickWhenViewable(alert->Button(1)); },
-    });
+    AnswerScript script({press(1), press(1)});
     Gnome::quit_cb(nullptr, nullptr, nullptr);
     EXPECT_TRUE(script.Finished());
     EXPECT_EQ(exited, 0);
