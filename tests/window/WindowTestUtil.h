@@ -18,7 +18,6 @@ namespace windowtest {
 Widget W(const char* name);
 // A widget's label string; "<none>" when there is no widget.
 std::string Label(Widget widget);
-std::string Label(const char* name);
 
 // The window, built once per test program (Xt cannot reopen the display).
 Gnome& TheWindow();

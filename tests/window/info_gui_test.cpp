@@ -1,20 +1,16 @@
-// The information bar, the window's messages and questions, and the error flag.
+// The error flag and the reference-load dialog of the main window.
 #include <gtest/gtest.h>
 
-#include <Xm/MessageB.h>
 #include <Xm/TextF.h>
 #include <Xm/Xm.h>
 
-#include <fstream>
 #include <string>
-#include <vector>
 
 #include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
 #include "testkit/TempDir.h"
 #include "toolkit/KLErrHandler.h"
 #include "toolkit/KLString.h"
-#include "toolkit/xm/KLAlert.h"
 #include "toolkit/xm/KLImageView.h"
 #include "window/Gnome.h"
 #include "window/WindowTestUtil.h"
@@ -22,49 +18,11 @@
 
 namespace {
 
-using windowtest::Label;
-
 class InfoTest : public ::testing::Test {
   protected:
     void SetUp() override { gnome = &windowtest::TheWindow(); }
-    // Runs `action`, answering every "Attention" alert it shows with `button`; the last told.
-    std::string Answer(const std::function<void()>& action, int button = 0) {
-        std::string told = windowtest::AnswerAlerts(gnome->attentionAlert.get(), action, button);
-        EXPECT_NE(told, "") << "nothing was told";
-        return told;
-    }
     Gnome* gnome = nullptr;
 };
-
-// The information bar shows time and fractional frame, the duration and the reference offset;
-// status reports show in the status line.
-TEST_F(InfoTest, InformationBarAndStatusLine) {
-    CueTime::default_fps = 30;
-    gnome->DisplayTimecode(CueTime::FromTicks(300));  // one and a half frames
-    EXPECT_EQ(Label("infoFrameValue"), "1.5");
-    EXPECT_EQ(Label("infoTimeValue"), "1.5");
-    gnome->DisplayDuration(CueTime::FromTicks(6000 * 5));
-    EXPECT_EQ(Label("infoDurationValue"), "150");
-    gnome->DisplayReferenceOffset(CueTime::FromTicks(2400));
-    EXPECT_EQ(Label("refAdjust"), "Set Reference Time [12]");
-    KLStatus("Parsing keyset description.");
-    EXPECT_EQ(Label("statusLine"), "Parsing keyset description.");
-}
-
-// The version is told with OK; Confirm asks in the window; a file that fails to load is told
-// in the window, which goes on.
-TEST_F(InfoTest, VersionConfirmAndFailedLoadsAreAskedInTheWindow) {
-    EXPECT_EQ(Answer([] { Gnome::version_cb(nullptr, XtPointer(2), nullptr); }),
-              "Tessel|Marlin Parlando and Facial Animation Version 2.0 (9704300208)");
-    int answer = -1;
-    EXPECT_EQ(Answer([&] { answer = gnome->Confirm("Go on?", "Yes", "No"); }, 1), "Go on?");
-    EXPECT_EQ(answer, 0);
-    testkit::TempDir dir;
-    const std::string missing = dir / "missing.track";
-    EXPECT_EQ(Answer([&] { answer = theImp.LoadTrack(missing.c_str()); }),
-              "Failed to open track file [" + missing + "].");
-    EXPECT_EQ(answer, 0);
-}
 
 // A logged error makes the flag solid; viewing the log (what the log holds is the workspace's
 // business) clears it.

@@ -24,10 +24,6 @@ std::string Label(Widget widget) {
     return widget ? guitest::XmText(widget, XmNlabelString) : "<none>";
 }
 
-std::string Label(const char* name) {
-    return Label(W(name));
-}
-
 Gnome& TheWindow() {
     static Gnome* gnome = [] {
         guitest::Shell(chirrup_fallback_resources());
