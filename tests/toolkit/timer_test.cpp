@@ -6,7 +6,6 @@
 #include <vector>
 
 #include "toolkit/DeviceClock.h"
-#include "toolkit/KLStopWatch.h"
 #include "toolkit/KLTimer.h"
 #include "toolkit/KLTimerBeat.h"
 #include "toolkit/TimerClock.h"
@@ -149,18 +148,6 @@ TEST_F(TimerTest, TheSharedClockOutlivesItsTimer) {
     Advance(1);
     EXPECT_FALSE(clock->Running());
     EXPECT_NEAR(clock->At(TimerClock::Now()), 4.75, 1e-9);
-}
-
-TEST_F(TimerTest, StopWatchReportsTheRateOfItsMarks) {
-    KLStopWatch watch;
-    EXPECT_EQ(watch.FrameRate(), 0.0);
-    for (int i = 0; i < 61; i++, Advance(1.0 / 120))
-        watch.Mark();
-    EXPECT_EQ(watch.Marks(), 61);
-    EXPECT_NEAR(watch.FrameRate(), 120.0, 1e-6);
-    watch.Reset();
-    watch.Mark();
-    EXPECT_EQ(watch.FrameRate(), 0.0) << "one mark is no rate";
 }
 
 // The device clock follows a device that asks for buffers at a steady pace (here 3% faster
