@@ -21,12 +21,6 @@ namespace {
 
 using Samples = std::vector<float>;
 
-// The device clock, moved back by the output latency so that the samples handed at a timer
-// time are the ones a timer on the wall clock would hear then.
-double device_clock() {
-    return KLSoundControl::DeviceSeconds() - KLSoundControl::Latency();
-}
-
 // A rising tone at half the device's rate: no two stretches alike.
 std::unique_ptr<CueSound> chirp(double rate, double seconds = 1.0) {
     Samples s(size_t(rate * seconds));
@@ -109,7 +103,10 @@ class SoundOutputTest : public TempDirTest {
         rate_ = KLSoundControl::DeviceRate();
         channels_ = KLSoundControl::DeviceChannels();
         ASSERT_GT(rate_, 0);
-        TimerClock::SetSource(device_clock);
+        // The device clock, moved back by the output latency so that the samples handed at a
+        // timer time are the ones a timer on the wall clock would hear then.
+        TimerClock::SetSource(
+            [] { return KLSoundControl::DeviceSeconds() - KLSoundControl::Latency(); });
         KLSoundControl::PlaySpeed(1.0f);
     }
     void TearDown() override {
@@ -227,40 +224,24 @@ TEST_F(SoundOutputTest, ASoundDestroyedWhilePlayingFallsSilent) {
         << "nothing after the sound went";
 }
 
-TEST_F(SoundOutputTest, NothingToPlayIsSilentAndSaysSo) {
-    KLTimer timer(CueTime(), CueTime::FromSeconds(0.5));
-    EXPECT_EQ(KLSoundControl::Play(nullptr, &timer, CueTime()), 0);
-    auto empty = CueSound::FromSamples({{}}, 8000);
-    EXPECT_EQ(KLSoundControl::Play(empty.get(), &timer, CueTime()), 0);
-    float pointer = 0.5f;
-    EXPECT_EQ(KLSoundControl::PlayDrag(empty.get(), nullptr, 100, &pointer), 0);
-}
-
 // Odd sounds play for as long as they last, whatever their rate and channel count; a region
 // past the end of the sound is silence; the speed out of range plays at 1.
-struct OddSound {
-    double rate;
-    int channels;
-    long frames;
-    double from, to;  // region, seconds
-    float speed;
-    long expected;  // device frames of sound at 48 kHz (0: silent)
-};
+// rate, channels, frames, region from and to (s), speed, frames heard at 48 kHz (0: silent)
+using OddSound = std::tuple<double, int, long, double, double, float, long>;
 
 class OddSoundTest : public SoundOutputTest, public ::testing::WithParamInterface<OddSound> {};
 
 TEST_P(OddSoundTest, PlaysWithoutHarm) {
-    const OddSound c = GetParam();
+    const auto [rate, channels, frames, from, to, speed, expected] = GetParam();
     ASSERT_EQ(rate_, 48000);
-    std::vector<Samples> channels(size_t(c.channels), Samples(size_t(c.frames)));
-    for (auto& ch : channels)
-        for (long i = 0; i < c.frames; i++)
-            ch[size_t(i)] = i % 2 ? 0.5f : -0.5f;
-    auto sound = CueSound::FromSamples(channels, c.rate);
-    ASSERT_EQ(Pass(sound.get(), c.from, c.to, c.speed), 1);
+    Samples wave(static_cast<size_t>(frames));
+    for (long i = 0; i < frames; i++)
+        wave[size_t(i)] = i % 2 ? 0.5f : -0.5f;
+    auto sound = CueSound::FromSamples(std::vector<Samples>(size_t(channels), wave), rate);
+    ASSERT_EQ(Pass(sound.get(), from, to, speed), 1);
     auto seg = segments(Written());
     long heard = seg.empty() ? 0 : seg.back().second - seg.front().first;
-    EXPECT_NEAR(double(heard), double(c.expected), 1100.0);
+    EXPECT_NEAR(double(heard), double(expected), 1100.0);
 }
 
 INSTANTIATE_TEST_SUITE_P(Odd, OddSoundTest,
@@ -270,7 +251,8 @@ INSTANTIATE_TEST_SUITE_P(Odd, OddSoundTest,
                                            OddSound{16000, 1, 16000, 0.5, 2, 1.0f, 24000}));
 
 // Without a usable device the silent driver takes over, the user is told once, and passes
-// still run; the audio library's own messages become the program's reports.
+// still run (nothing to play plays nothing); the audio library's own messages become the
+// program's reports.
 class SoundFallback : public ::testing::Test {
   protected:
     void TearDown() override { KLSoundControl::Close(); }
@@ -288,6 +270,11 @@ TEST_F(SoundFallback, NoDeviceFallsBackToTheSilentDriverAndReportsThroughTheProg
     KLTimer timer(CueTime(), CueTime::FromSeconds(0.2));
     EXPECT_EQ(KLSoundControl::Play(sound.get(), &timer, CueTime()), 1);
     timer.start();
+    auto empty = CueSound::FromSamples({{}}, 8000);
+    float pointer = 0.5f;
+    EXPECT_EQ(KLSoundControl::Play(nullptr, &timer, CueTime()), 0);
+    EXPECT_EQ(KLSoundControl::Play(empty.get(), &timer, CueTime()), 0);
+    EXPECT_EQ(KLSoundControl::PlayDrag(empty.get(), nullptr, 100, &pointer), 0);
     KLSoundControl::Stop();
 
     errors.reports.clear();
