@@ -57,7 +57,7 @@ TEST_P(TimerArithmetic, RunsTowardsItsEndAtWallClockRateAndStopsThere) {
 INSTANTIATE_TEST_SUITE_P(ForwardReverseAndEnds, TimerArithmetic,
                          ::testing::Values(Case{1.0, 3.0, 0.5, 1.5}, Case{1.0, 3.0, 9.0, 3.0},
                                            Case{3.0, 1.0, 0.5, 2.5}, Case{3.0, 1.0, 2.5, 1.0},
-                                           Case{0.0, -2.0, 1.0, -1.0}, Case{2.0, 2.0, 5.0, 2.0}));
+                                           Case{2.0, 2.0, 5.0, 2.0}));
 
 TEST_F(TimerTest, TriggersFireOnceWhenTheirTimeIsReachedInTheTimersDirection) {
     for (bool reverse : {false, true}) {

@@ -1,4 +1,4 @@
-// Alerts, the file browser base, image views and image buttons on the test display.
+// Alerts, the file browser base and resource-file lines on the test display.
 #include <gtest/gtest.h>
 
 #include <Xm/FileSB.h>
@@ -16,11 +16,8 @@
 
 #include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
-#include "toolkit/KLImageSGI.h"
 #include "toolkit/xm/KLAlert.h"
 #include "toolkit/xm/KLFileManager.h"
-#include "toolkit/xm/KLImageButton.h"
-#include "toolkit/xm/KLImageView.h"
 #include "toolkit/xm/KLResourceLines.h"
 #include "toolkit/xm/KLXmGnome.h"
 
@@ -86,11 +83,7 @@ class RecordingManager : public KLFileManager {
     RecordingManager(Widget parent, std::string dir)
         : KLFileManager(parent), dir_(std::move(dir)) {}
     int RetrieveFile(const char* name) override { return retrieved = name, 1; }
-    int StoreFile(const char* name) override {
-        stored = name;
-        std::ofstream(name) << "stored\n";
-        return 1;
-    }
+    int StoreFile(const char* name) override { return stored = name, 1; }
     const char* DefaultDirectory() override { return dir_.c_str(); }
     const char* FileTypeName() override { return "Testfile"; }
     const char* Extension() override { return "tst"; }
@@ -194,43 +187,6 @@ TEST_F(FileManagerTest, RetrieveAndStoreAs) {
     AnswerScript fresh({Choose(m, "new.tst")});
     EXPECT_EQ(m.StoreAs(1), 1);
     EXPECT_EQ(m.stored, dir + "/new.tst");
-}
-
-// Fades mix the two pictures by the fade, clamped; the zoom is clamped; two presses close
-// together are a double click, and a third press starts a new pair.
-TEST_F(ToolkitTest, ImageViewFadesAndImageButtonDoubleClicks) {
-    KLImageView* view = dynamic_cast<KLImageView*>(
-        KLFiend::FromWidget(KLImageView::Create(form, const_cast<char*>("view"), nullptr, 0)));
-    ASSERT_NE(view, nullptr);
-    KLImageSGI red(10, 10), blue(10, 10);
-    for (int i = 0; i < 100; i++) {
-        red.Pixels()[i * 4] = 255;
-        blue.Pixels()[i * 4 + 2] = 255;
-    }
-    EXPECT_EQ(view->MixedPixel(0, 0), -1);
-    view->SetImage(&red);
-    EXPECT_EQ(view->MixedPixel(3, 3), 0xff0000);
-    EXPECT_EQ(view->MixedPixel(10, 3), -1);
-    view->SetImages(&red, &blue, 0.25f);
-    EXPECT_EQ(view->MixedPixel(0, 0), 0xbf0040);
-    view->SetFade(3.0f);
-    EXPECT_EQ(view->MixedPixel(0, 0), 0x0000ff);
-    view->SetZoom(9);
-    EXPECT_EQ(view->Zoom(), 4);
-    XtDestroyWidget(view->GetWidget());
-
-    auto* button = dynamic_cast<KLImageButton*>(
-        KLFiend::FromWidget(KLImageButton::Create(form, const_cast<char*>("tile"), nullptr, 0)));
-    ASSERT_NE(button, nullptr);
-    int doubles = 0;
-    button->SetDoubleClickCallback([](Widget, XtPointer d, XtPointer) { ++*static_cast<int*>(d); },
-                                   &doubles);
-    const std::pair<Time, int> presses[] = {{1000, 0}, {100000, 0}, {100050, 1}, {100060, 1}};
-    for (auto [time, expected] : presses) {
-        button->Pressed(time);
-        EXPECT_EQ(doubles, expected) << time;
-    }
-    XtDestroyWidget(button->GetWidget());
 }
 
 TEST(ResourceLines, CommentsBlankLinesAndContinuations) {
