@@ -114,25 +114,20 @@ TEST_F(TimerTest, StopFreezesTimeAndAnEmptyTimerEndsOnTheFirstBeat) {
 
 // A trigger may end playback: destroy its own timer and another one during the beat.
 TEST_F(TimerTest, TheBeatSurvivesTriggersThatDestroyTimers) {
-    auto first = std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1));
-    auto second = std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1));
-    struct Owners {
-        std::unique_ptr<KLTimer>* a;
-        std::unique_ptr<KLTimer>* b;
-    } owners{&first, &second};
+    std::unique_ptr<KLTimer> timers[2] = {
+        std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1)),
+        std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1))};
     auto destroy = [](KLTimer*, void* data) {
-        auto* o = static_cast<Owners*>(data);
-        o->a->reset();
-        o->b->reset();
+        for (int i = 0; i < 2; i++)
+            static_cast<std::unique_ptr<KLTimer>*>(data)[i].reset();
     };
-    first->post_trigger(destroy, &owners, first->To());
-    second->post_trigger(destroy, &owners, second->To());
-    first->start();
-    second->start();
+    for (auto& t : timers) {
+        t->post_trigger(destroy, timers, t->To());
+        t->start();
+    }
     Advance(2);
     KLTimerBeat::Tick();
-    EXPECT_EQ(first, nullptr);
-    EXPECT_EQ(second, nullptr);
+    EXPECT_TRUE(timers[0] == nullptr && timers[1] == nullptr);
 }
 
 // The clock a sound thread holds outlives the timer and stays frozen where it stopped.
