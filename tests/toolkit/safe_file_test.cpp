@@ -32,14 +32,11 @@ std::vector<std::string> Listing(const fs::path& dir) {
 template <typename F>
 int InChild(F body) {
     const pid_t pid = ::fork();
-    if (pid == 0) {
-        body();
-        ::_exit(0);
-    }
+    if (pid == 0)
+        body(), ::_exit(0);
     int status = -1;
-    if (pid < 0)
-        return status;
-    ::waitpid(pid, &status, 0);
+    if (pid > 0)
+        ::waitpid(pid, &status, 0);
     return status;
 }
 

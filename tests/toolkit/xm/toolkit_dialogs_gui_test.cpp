@@ -1,4 +1,4 @@
-// Alerts, the file browser base and resource-file lines on the test display.
+// Alerts and the file browser base on the test display.
 #include <gtest/gtest.h>
 
 #include <Xm/FileSB.h>
@@ -18,7 +18,6 @@
 #include "guitest/GuiTest.h"
 #include "toolkit/xm/KLAlert.h"
 #include "toolkit/xm/KLFileManager.h"
-#include "toolkit/xm/KLResourceLines.h"
 #include "toolkit/xm/KLXmGnome.h"
 
 namespace fs = std::filesystem;
@@ -187,18 +186,6 @@ TEST_F(FileManagerTest, RetrieveAndStoreAs) {
     AnswerScript fresh({Choose(m, "new.tst")});
     EXPECT_EQ(m.StoreAs(1), 1);
     EXPECT_EQ(m.stored, dir + "/new.tst");
-}
-
-TEST(ResourceLines, CommentsBlankLinesAndContinuations) {
-    KLResourceLines lines(
-        "! comment\n\n*a.labelString: A\n  ! indented comment\n*b.translations: #override \\n\\\n"
-        "<Key>x: Arm()\n*c: trailing\\\\\n*d: D\r\n");
-    ASSERT_EQ(lines.Count(), 4u);
-    EXPECT_EQ(lines.Line(0), "*a.labelString: A");
-    EXPECT_EQ(lines.Line(1), "*b.translations: #override \\n<Key>x: Arm()");
-    EXPECT_EQ(lines.Line(2), "*c: trailing\\\\");
-    EXPECT_EQ(lines.Line(3), "*d: D");
-    EXPECT_EQ(lines.Lines()[4], nullptr);
 }
 
 }  // namespace
