@@ -16,6 +16,7 @@
 
 #include "guitest/AnswerScript.h"
 #include "guitest/GuiTest.h"
+#include "testkit/TempDir.h"
 #include "toolkit/xm/KLAlert.h"
 #include "toolkit/xm/KLFileManager.h"
 #include "toolkit/xm/KLXmGnome.h"
@@ -103,12 +104,10 @@ class RecordingManager : public KLFileManager {
 class FileManagerTest : public ToolkitTest {
   protected:
     void SetUp() override {
-        dir = fs::temp_directory_path() / ("chirrup-fm-" + std::to_string(getpid()));
-        fs::create_directories(dir + "/sub");
-        std::ofstream(dir + "/a.tst") << "a\n";
-        std::ofstream(dir + "/skip.tst") << "s\n";
+        fs::create_directories(temp / "sub");
+        std::ofstream(temp / "a.tst") << "a\n";
+        std::ofstream(temp / "skip.tst") << "s\n";
     }
-    void TearDown() override { fs::remove_all(dir); }
     // Once the browser is up: notes the names in its file list, types `leaf` and presses OK.
     std::function<bool()> Choose(KLFileManager& m, const std::string& leaf) {
         return [this, &m, path = dir + "/" + leaf] {
@@ -141,7 +140,8 @@ class FileManagerTest : public ToolkitTest {
                    PressWhenShown(XmMessageBoxGetChild(notice, button));
         };
     }
-    std::string dir;
+    testkit::TempDir temp;
+    const std::string dir = temp.path();
     std::vector<std::string> listed;
 };
 
