@@ -13,16 +13,14 @@
 namespace {
 
 double fakeNow = 100.0;
-double fake_clock() {
-    return fakeNow;
-}
 
 // Runs timers on a clock the test moves by hand.
 class TimerTest : public ::testing::Test {
   protected:
     void SetUp() override {
         fakeNow = 100.0;
-        TimerClock::SetSource(fake_clock);
+        fired.clear();
+        TimerClock::SetSource([] { return fakeNow; });
     }
     void TearDown() override { TimerClock::SetSource(nullptr); }
     static void Advance(double seconds) { fakeNow += seconds; }
@@ -61,7 +59,7 @@ INSTANTIATE_TEST_SUITE_P(ForwardReverseAndEnds, TimerArithmetic,
 
 TEST_F(TimerTest, TriggersFireOnceWhenTheirTimeIsReachedInTheTimersDirection) {
     for (bool reverse : {false, true}) {
-        fired.clear();
+        fired.clear();  // each direction afresh
         CueTime a = CueTime::FromSeconds(1), b = CueTime::FromSeconds(2);
         KLTimer timer(reverse ? b : a, reverse ? a : b);
         int mid = 1, end = 2;
@@ -89,7 +87,6 @@ TEST_F(TimerTest, TriggersFireOnceWhenTheirTimeIsReachedInTheTimersDirection) {
 // Stopping freezes the time and keeps the triggers not yet due; an empty timer ends, with
 // its trigger, on the first beat.
 TEST_F(TimerTest, StopFreezesTimeAndAnEmptyTimerEndsOnTheFirstBeat) {
-    fired.clear();
     KLTimer timer(CueTime::FromSeconds(0), CueTime::FromSeconds(1));
     int end = 7;
     timer.post_trigger(Note, &end, timer.To());
