@@ -34,18 +34,6 @@ unsigned Mode(const std::string& path) {
     return ::stat(path.c_str(), &st) == 0 ? st.st_mode & 07777 : 0u;
 }
 
-// Runs `body` in a child process; its wait status.
-template <typename F>
-int InChild(F body) {
-    const pid_t pid = ::fork();
-    if (pid == 0)
-        body(), ::_exit(0);
-    int status = -1;
-    if (pid > 0)
-        ::waitpid(pid, &status, 0);
-    return status;
-}
-
 Stage kill_at;  // the stage at which the child's save is killed
 void KillAtStage(Stage stage) {
     if (stage == kill_at)
