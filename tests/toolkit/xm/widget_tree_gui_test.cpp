@@ -1,4 +1,5 @@
-// The widget-table builder, the name and fiend registries and the menu helpers.
+// The fiend registry and the menu helpers, on a tree built from a widget table (the main
+// window's own table is checked by the window tests).
 // GoogleTest first: the X headers define macros (None, Bool) that its names collide with.
 #include <gtest/gtest.h>
 
@@ -32,13 +33,9 @@ int LabelFiend::alive = 0;
 const KLWidgetSpec kTable[] = {
     {"+", "testForm", XmCreateForm},
     {".+", "testBar", XmCreateMenuBar},
-    {"..+", "testFile", XmCreateCascadeButtonGadget},
-    {"..-", "testFileMenu", XmCreatePulldownMenu},
-    {"...+", "sepMenu", XmCreateSeparatorGadget},
     {"..+", "testEdit", XmCreateCascadeButtonGadget},
     {"..-", "testEditMenu", XmCreatePulldownMenu},
     {"...+", "sepMenu", XmCreateSeparatorGadget},
-    {".-", "testHidden", XmCreateLabel},
     {".+", "testFiend", LabelFiend::Create},
     {nullptr, nullptr, nullptr},
 };
@@ -61,25 +58,23 @@ Widget Find(const char* name, Widget root = nullptr) {
     return KLXmGnome::FindWidget(name, root);
 }
 
-// Rows hang under the parent their depth gives, managed by their marker; pulldowns hang from
-// their cascade; FindWidget takes the first of repeated names under the root it is given.
-// Menu entries are added and emptied keeping the first ones.
-TEST_F(WidgetTreeTest, RowsPulldownsNamesAndMenuEntries) {
-    Widget form = Find("testForm"), hidden = Find("testHidden"), menu = Find("testEditMenu");
-    ASSERT_TRUE(form && hidden && menu);
-    EXPECT_EQ(XtParent(form), top);
-    EXPECT_TRUE(XtIsManaged(Find("testBar")));
-    EXPECT_EQ(XtParent(hidden), form);
-    EXPECT_FALSE(XtIsManaged(hidden));
-    Widget fileMenu = nullptr;
-    XtVaGetValues(Find("testFile"), XmNsubMenuId, &fileMenu, nullptr);
-    EXPECT_EQ(fileMenu, Find("testFileMenu"));
-    EXPECT_EQ(XtParent(Find("sepMenu")), fileMenu);
-    EXPECT_EQ(XtParent(Find("sepMenu", menu)), menu);
-    EXPECT_EQ(Find("testFile", menu), nullptr);
-    EXPECT_EQ(Find("noSuchWidget"), nullptr);
-    EXPECT_EQ(Find(nullptr), nullptr);
+TEST_F(WidgetTreeTest, FiendsAreFoundByNameAndDieWithTheirWidget) {
+    KLFiend* fiend = KLXmGnome::FindFiend("testFiend");
+    ASSERT_NE(fiend, nullptr);
+    EXPECT_EQ(KLXmGnome::FindFiend("testForm"), nullptr);
+    int before = LabelFiend::alive;
+    XtDestroyWidget(fiend->GetWidget());
+    guitest::Settle();
+    EXPECT_EQ(LabelFiend::alive, before - 1);
+    EXPECT_EQ(KLXmGnome::FindFiend("testFiend"), nullptr);
+    EXPECT_EQ(Find("testFiend"), nullptr);
+}
 
+// Menu entries are added and emptied keeping the first ones; names are found under the root
+// given.
+TEST_F(WidgetTreeTest, MenuEntriesAreAddedAndEmptied) {
+    Widget menu = Find("testEditMenu");
+    ASSERT_NE(menu, nullptr);
     int calls = 0;
     auto count = [](Widget, XtPointer n, XtPointer) { ++*static_cast<int*>(n); };
     Widget a = KLXmGnome::AddMenuEntry(menu, "alpha", count, &calls);
@@ -91,18 +86,8 @@ TEST_F(WidgetTreeTest, RowsPulldownsNamesAndMenuEntries) {
     KLXmGnome::EmptyMenu(menu, 1);
     guitest::Settle();
     EXPECT_EQ(guitest::Children(menu), std::vector<Widget>{Find("sepMenu", menu)});
-}
-
-TEST_F(WidgetTreeTest, FiendsAreFoundByNameAndDieWithTheirWidget) {
-    KLFiend* fiend = KLXmGnome::FindFiend("testFiend");
-    ASSERT_NE(fiend, nullptr);
-    EXPECT_EQ(KLXmGnome::FindFiend("testForm"), nullptr);
-    int before = LabelFiend::alive;
-    XtDestroyWidget(fiend->GetWidget());
-    guitest::Settle();
-    EXPECT_EQ(LabelFiend::alive, before - 1);
-    EXPECT_EQ(KLXmGnome::FindFiend("testFiend"), nullptr);
-    EXPECT_EQ(Find("testFiend"), nullptr);
+    EXPECT_EQ(Find("testEdit", menu), nullptr);
+    EXPECT_EQ(Find(nullptr), nullptr);
 }
 
 }  // namespace
