@@ -61,9 +61,7 @@ TEST_P(DeferredSignals, RunAsTheLoopAsksAndEndTheProgramAsBefore) {
     ASSERT_EQ(pipe(loopPipe), 0);
     ASSERT_EQ(pipe(reportPipe), 0);
     fcntl(loopPipe[1], F_SETFL, O_NONBLOCK);
-    const pid_t pid = fork();
-    ASSERT_GE(pid, 0);
-    if (pid == 0) {
+    const int status = InChild([&] {
         struct rlimit noCore = {0, 0};
         setrlimit(RLIMIT_CORE, &noCore);
         for (int sig : {SIGSEGV, SIGBUS, SIGTERM, SIGUSR1, SIGUSR2})
@@ -71,20 +69,15 @@ TEST_P(DeferredSignals, RunAsTheLoopAsksAndEndTheProgramAsBefore) {
         DeferAsynchronousSignals(wake_loop, 1);
         c.child();
         _exit(99);
-    }
-    close(reportPipe[1]);
+    });
+    close(reportPipe[1]);  // the child's reports are all in the pipe now
     std::string events;
     char buffer[256];
     for (ssize_t n; (n = read(reportPipe[0], buffer, sizeof buffer)) > 0;)
         events.append(buffer, size_t(n));
-    int status = 0;
-    ASSERT_EQ(waitpid(pid, &status, 0), pid);
-    close(reportPipe[0]);
-    close(loopPipe[0]);
-    close(loopPipe[1]);
-    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == c.endedBy)
-        << (WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
-                              : "signal " + std::to_string(WTERMSIG(status)));
+    for (int fd : {reportPipe[0], loopPipe[0], loopPipe[1]})
+        close(fd);
+    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == c.endedBy) << "wait status " << status;
     EXPECT_EQ(events, c.events);
 }
 

@@ -1,11 +1,8 @@
 // Where recognizer results become keyframes: a scripted result list against the keys placed.
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "toolkit/CueResultPlacement.h"
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 using Key = CueResultPlacement::Key;
 
 std::ostream& operator<<(std::ostream& out, const Key& k) {
@@ -68,26 +65,6 @@ INSTANTIATE_TEST_SUITE_P(
                       {key(300, 1), key(900, 1), key(2700, 2)}},
         PlacementCase{"NothingLinkedPlacesNothing", script({-1, -1}), 0, {}}),
     [](const auto& info) { return std::string(info.param.name); });
-
-TEST(PlacementProgress, CalledAfterEveryHundredResults) {
-    std::vector<CueRecognizer::Result> results(250, {1, 1});
-    results[120] = {2, 2};
-    std::vector<long> calls;
-    std::vector<Key> keys;
-    CueResultPlacement::Place(
-        results, CueTime(), kStep, [&](const Key& k) { keys.push_back(k); },
-        [&](long n) {
-            calls.push_back(n);
-            EXPECT_EQ(keys.size(), n < 120 ? 1u : 4u) << "keys are placed as they are found";
-        });
-    EXPECT_THAT(calls, ElementsAre(100, 200));
-    EXPECT_THAT(keys, ElementsAre(key(300, 1), key(300 + 600 * 119, 1), key(300 + 600 * 120, 2),
-                                  key(300 + 600 * 121, 1)));
-    calls.clear();
-    CueResultPlacement::Place(
-        script({1, 2}), CueTime(), kStep, [](const Key&) {}, [&](long n) { calls.push_back(n); });
-    EXPECT_THAT(calls, IsEmpty());
-}
 
 // A long recognition (ten hours of one-frame steps) keeps its times exact to the tick.
 TEST(PlacementProgress, LongRunsKeepExactTimes) {

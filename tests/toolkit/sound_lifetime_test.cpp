@@ -19,12 +19,10 @@
 namespace {
 
 std::unique_ptr<CueSound> tone(double rate, long frames, int channels = 1) {
-    const std::vector<float> silent(static_cast<size_t>(frames));
-    std::vector<std::vector<float>> data(static_cast<size_t>(channels), silent);
-    for (auto& ch : data)
-        for (long i = 0; i < frames; i++)
-            ch[size_t(i)] = float(0.4 * std::sin(double(i) * 0.05));
-    return CueSound::FromSamples(std::move(data), rate);
+    std::vector<float> wave(static_cast<size_t>(frames));
+    for (size_t i = 0; i < wave.size(); i++)
+        wave[i] = float(0.4 * std::sin(double(i) * 0.05));
+    return CueSound::FromSamples(std::vector<std::vector<float>>(size_t(channels), wave), rate);
 }
 
 // Waits until the device has asked for `count` more buffers (two seconds at most).
@@ -86,13 +84,12 @@ TEST_P(SoundLifetimeTest, ReplacingAndDestroyingWhatPlaysWhileTheDeviceRuns) {
                 timer->start();
                 break;
             }
-            case 4: {  // scrubbing at a pointer that moves, with or without a timer
+            case 4:  // scrubbing at a pointer that moves, with or without a timer
                 if (!sound)
                     sound = tone(16000, 16000);
                 KLSoundControl::PlayDrag(sound.get(), random() % 2 ? timer.get() : nullptr, 100,
                                          position.get());
                 break;
-            }
             case 5: {  // the pointer moves
                 float at = float(random() % 1000) / 1000.0f;
                 __atomic_store(position.get(), &at, __ATOMIC_RELAXED);

@@ -21,12 +21,6 @@ namespace {
 
 using Samples = std::vector<float>;
 
-// The device clock, moved back by the output latency so that the samples handed at a timer
-// time are the ones a timer on the wall clock would hear then.
-double device_clock() {
-    return KLSoundControl::DeviceSeconds() - KLSoundControl::Latency();
-}
-
 // A rising tone at half the device's rate: no two stretches alike.
 std::unique_ptr<CueSound> chirp(double rate, double seconds = 1.0) {
     Samples s(size_t(rate * seconds));
@@ -39,31 +33,27 @@ std::unique_ptr<CueSound> chirp(double rate, double seconds = 1.0) {
 
 Samples resampled(const Samples& in, double ratio) {
     Samples out(size_t(double(in.size()) * ratio) + 16);
-    SRC_DATA d{};
-    d.data_in = in.data();
-    d.input_frames = long(in.size());
-    d.data_out = out.data();
-    d.output_frames = long(out.size());
-    d.src_ratio = ratio;
-    d.end_of_input = 1;
+    SRC_DATA d{in.data(), out.data(), long(in.size()), long(out.size()), 0, 0, 1, ratio};
     EXPECT_EQ(src_simple(&d, SRC_SINC_FASTEST, 1), 0);
     out.resize(size_t(d.output_frames_gen));
     return out;
 }
 
-// Stretches of `out` louder than silence, as [first, end) frame ranges.
-std::vector<std::pair<long, long>> segments(const Samples& out) {
-    std::vector<std::pair<long, long>> found;
-    long quiet = 1 << 30, start = -1;
+using Segment = std::pair<long, long>;  // [first, end) frames
+
+// Stretches of `out` louder than silence.
+std::vector<Segment> segments(const Samples& out) {
+    std::vector<Segment> found;
+    long quiet = 1 << 30;
     for (long i = 0; i < long(out.size()); i++) {
-        if (std::fabs(out[size_t(i)]) > 1e-4f) {
-            if (start < 0 || quiet > 256)
-                found.push_back({i, i + 1});
-            start = i, quiet = 0;
-            found.back().second = i + 1;
-        } else {
+        if (std::fabs(out[size_t(i)]) <= 1e-4f) {
             quiet++;
+            continue;
         }
+        if (quiet > 256)
+            found.push_back({i, i + 1});
+        quiet = 0;
+        found.back().second = i + 1;
     }
     return found;
 }
@@ -84,15 +74,20 @@ long locate(const Samples& out, long at, const Samples& ref) {
     return best;
 }
 
-// The largest difference between a segment of `out` and `ref`, matched where the middle of
-// the segment lies in `ref`, leaving `edge` frames at each end of the segment.
-float mismatch(const Samples& out, std::pair<long, long> seg, const Samples& ref, long edge) {
-    long middle = (seg.first + seg.second) / 2 - 256;
-    long lag = middle - locate(out, middle, ref);
+// Where in `ref` the first frame of `seg` lies, matched at the middle of the segment.
+long origin(const Samples& out, Segment seg, const Samples& ref) {
+    const long middle = (seg.first + seg.second) / 2 - 256;
+    return locate(out, middle, ref) - (middle - seg.first);
+}
+
+// The largest difference between `seg` and `ref` from its origin, leaving `edge` frames at
+// each end of the segment.
+float mismatch(const Samples& out, Segment seg, const Samples& ref, long edge) {
+    const long lag = seg.first - origin(out, seg, ref);
     float worst = 0;
     for (long i = seg.first + edge; i < seg.second - edge; i++) {
-        long r = i - lag;
-        float expected = r >= 0 && r < long(ref.size()) ? ref[size_t(r)] : 0.0f;
+        const long r = i - lag;
+        const float expected = r >= 0 && r < long(ref.size()) ? ref[size_t(r)] : 0.0f;
         worst = std::max(worst, std::fabs(out[size_t(i)] - expected));
     }
     return worst;
@@ -109,7 +104,10 @@ class SoundOutputTest : public TempDirTest {
         rate_ = KLSoundControl::DeviceRate();
         channels_ = KLSoundControl::DeviceChannels();
         ASSERT_GT(rate_, 0);
-        TimerClock::SetSource(device_clock);
+        // The device clock, moved back by the output latency so that the samples handed at a
+        // timer time are the ones a timer on the wall clock would hear then.
+        TimerClock::SetSource(
+            [] { return KLSoundControl::DeviceSeconds() - KLSoundControl::Latency(); });
         KLSoundControl::PlaySpeed(1.0f);
     }
     void TearDown() override {
@@ -176,9 +174,7 @@ TEST_P(SoundPassTest, WritesTheResampledRegionForEveryPass) {
     for (auto s : seg) {
         EXPECT_NEAR(double(s.second - s.first), double(ref.size() / 2), late) << "region / speed";
         EXPECT_LT(mismatch(out, s, ref, 64), 0.01f);
-        const long middle = (s.first + s.second) / 2 - 256;
-        const long at = locate(out, middle, ref) - (middle - s.first);
-        EXPECT_NEAR(double(at), double(ref.size() / 4), late) << "from the region's start";
+        EXPECT_NEAR(double(origin(out, s, ref)), double(ref.size() / 4), late) << "region start";
     }
 }
 
@@ -198,14 +194,10 @@ TEST_F(SoundOutputTest, AScrubGrainIsTheSoundAtThePointerAndRestingIsSilent) {
     Samples out = Written();
     auto seg = segments(out);
     ASSERT_EQ(seg.size(), 2u) << "one grain per move, nothing while resting";
-    const long grain = rate_ / 10;
-    for (int i = 0; i < 2; i++) {
-        long first = seg[size_t(i)].first;
-        EXPECT_NEAR(double(seg[size_t(i)].second - first), double(grain), 2.0);
-        EXPECT_LT(mismatch(out, seg[size_t(i)], ref, 64), 0.01f);
-        long at = locate(out, first + 1024, ref) - 1024;
-        long expected = long(ref.size()) * (i == 0 ? 2 : 1) / 4;
-        EXPECT_NEAR(double(at), double(expected), 2.0) << "grain " << i;
+    for (size_t i = 0; i < 2; i++) {
+        EXPECT_NEAR(double(seg[i].second - seg[i].first), double(rate_ / 10), 2.0) << "a grain";
+        EXPECT_LT(mismatch(out, seg[i], ref, 64), 0.01f);
+        EXPECT_NEAR(double(origin(out, seg[i], ref)), double(ref.size() * (2 - i) / 4), 2.0) << i;
     }
 }
 
@@ -227,40 +219,24 @@ TEST_F(SoundOutputTest, ASoundDestroyedWhilePlayingFallsSilent) {
         << "nothing after the sound went";
 }
 
-TEST_F(SoundOutputTest, NothingToPlayIsSilentAndSaysSo) {
-    KLTimer timer(CueTime(), CueTime::FromSeconds(0.5));
-    EXPECT_EQ(KLSoundControl::Play(nullptr, &timer, CueTime()), 0);
-    auto empty = CueSound::FromSamples({{}}, 8000);
-    EXPECT_EQ(KLSoundControl::Play(empty.get(), &timer, CueTime()), 0);
-    float pointer = 0.5f;
-    EXPECT_EQ(KLSoundControl::PlayDrag(empty.get(), nullptr, 100, &pointer), 0);
-}
-
 // Odd sounds play for as long as they last, whatever their rate and channel count; a region
 // past the end of the sound is silence; the speed out of range plays at 1.
-struct OddSound {
-    double rate;
-    int channels;
-    long frames;
-    double from, to;  // region, seconds
-    float speed;
-    long expected;  // device frames of sound at 48 kHz (0: silent)
-};
+// rate, channels, frames, region from and to (s), speed, frames heard at 48 kHz (0: silent)
+using OddSound = std::tuple<double, int, long, double, double, float, long>;
 
 class OddSoundTest : public SoundOutputTest, public ::testing::WithParamInterface<OddSound> {};
 
 TEST_P(OddSoundTest, PlaysWithoutHarm) {
-    const OddSound c = GetParam();
+    const auto [rate, channels, frames, from, to, speed, expected] = GetParam();
     ASSERT_EQ(rate_, 48000);
-    std::vector<Samples> channels(size_t(c.channels), Samples(size_t(c.frames)));
-    for (auto& ch : channels)
-        for (long i = 0; i < c.frames; i++)
-            ch[size_t(i)] = i % 2 ? 0.5f : -0.5f;
-    auto sound = CueSound::FromSamples(channels, c.rate);
-    ASSERT_EQ(Pass(sound.get(), c.from, c.to, c.speed), 1);
+    Samples wave(static_cast<size_t>(frames));
+    for (long i = 0; i < frames; i++)
+        wave[size_t(i)] = i % 2 ? 0.5f : -0.5f;
+    auto sound = CueSound::FromSamples(std::vector<Samples>(size_t(channels), wave), rate);
+    ASSERT_EQ(Pass(sound.get(), from, to, speed), 1);
     auto seg = segments(Written());
     long heard = seg.empty() ? 0 : seg.back().second - seg.front().first;
-    EXPECT_NEAR(double(heard), double(c.expected), 1100.0);
+    EXPECT_NEAR(double(heard), double(expected), 1100.0);
 }
 
 INSTANTIATE_TEST_SUITE_P(Odd, OddSoundTest,
@@ -270,7 +246,8 @@ INSTANTIATE_TEST_SUITE_P(Odd, OddSoundTest,
                                            OddSound{16000, 1, 16000, 0.5, 2, 1.0f, 24000}));
 
 // Without a usable device the silent driver takes over, the user is told once, and passes
-// still run; the audio library's own messages become the program's reports.
+// still run (nothing to play plays nothing); the audio library's own messages become the
+// program's reports.
 class SoundFallback : public ::testing::Test {
   protected:
     void TearDown() override { KLSoundControl::Close(); }
@@ -288,6 +265,11 @@ TEST_F(SoundFallback, NoDeviceFallsBackToTheSilentDriverAndReportsThroughTheProg
     KLTimer timer(CueTime(), CueTime::FromSeconds(0.2));
     EXPECT_EQ(KLSoundControl::Play(sound.get(), &timer, CueTime()), 1);
     timer.start();
+    auto empty = CueSound::FromSamples({{}}, 8000);
+    float pointer = 0.5f;
+    EXPECT_EQ(KLSoundControl::Play(nullptr, &timer, CueTime()), 0);
+    EXPECT_EQ(KLSoundControl::Play(empty.get(), &timer, CueTime()), 0);
+    EXPECT_EQ(KLSoundControl::PlayDrag(empty.get(), nullptr, 100, &pointer), 0);
     KLSoundControl::Stop();
 
     errors.reports.clear();

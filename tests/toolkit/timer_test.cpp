@@ -6,7 +6,6 @@
 #include <vector>
 
 #include "toolkit/DeviceClock.h"
-#include "toolkit/KLStopWatch.h"
 #include "toolkit/KLTimer.h"
 #include "toolkit/KLTimerBeat.h"
 #include "toolkit/TimerClock.h"
@@ -14,16 +13,14 @@
 namespace {
 
 double fakeNow = 100.0;
-double fake_clock() {
-    return fakeNow;
-}
 
 // Runs timers on a clock the test moves by hand.
 class TimerTest : public ::testing::Test {
   protected:
     void SetUp() override {
         fakeNow = 100.0;
-        TimerClock::SetSource(fake_clock);
+        fired.clear();
+        TimerClock::SetSource([] { return fakeNow; });
     }
     void TearDown() override { TimerClock::SetSource(nullptr); }
     static void Advance(double seconds) { fakeNow += seconds; }
@@ -58,11 +55,11 @@ TEST_P(TimerArithmetic, RunsTowardsItsEndAtWallClockRateAndStopsThere) {
 INSTANTIATE_TEST_SUITE_P(ForwardReverseAndEnds, TimerArithmetic,
                          ::testing::Values(Case{1.0, 3.0, 0.5, 1.5}, Case{1.0, 3.0, 9.0, 3.0},
                                            Case{3.0, 1.0, 0.5, 2.5}, Case{3.0, 1.0, 2.5, 1.0},
-                                           Case{0.0, -2.0, 1.0, -1.0}, Case{2.0, 2.0, 5.0, 2.0}));
+                                           Case{2.0, 2.0, 5.0, 2.0}));
 
 TEST_F(TimerTest, TriggersFireOnceWhenTheirTimeIsReachedInTheTimersDirection) {
     for (bool reverse : {false, true}) {
-        fired.clear();
+        fired.clear();  // each direction afresh
         CueTime a = CueTime::FromSeconds(1), b = CueTime::FromSeconds(2);
         KLTimer timer(reverse ? b : a, reverse ? a : b);
         int mid = 1, end = 2;
@@ -90,7 +87,6 @@ TEST_F(TimerTest, TriggersFireOnceWhenTheirTimeIsReachedInTheTimersDirection) {
 // Stopping freezes the time and keeps the triggers not yet due; an empty timer ends, with
 // its trigger, on the first beat.
 TEST_F(TimerTest, StopFreezesTimeAndAnEmptyTimerEndsOnTheFirstBeat) {
-    fired.clear();
     KLTimer timer(CueTime::FromSeconds(0), CueTime::FromSeconds(1));
     int end = 7;
     timer.post_trigger(Note, &end, timer.To());
@@ -115,25 +111,20 @@ TEST_F(TimerTest, StopFreezesTimeAndAnEmptyTimerEndsOnTheFirstBeat) {
 
 // A trigger may end playback: destroy its own timer and another one during the beat.
 TEST_F(TimerTest, TheBeatSurvivesTriggersThatDestroyTimers) {
-    auto first = std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1));
-    auto second = std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1));
-    struct Owners {
-        std::unique_ptr<KLTimer>* a;
-        std::unique_ptr<KLTimer>* b;
-    } owners{&first, &second};
+    std::unique_ptr<KLTimer> timers[2] = {
+        std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1)),
+        std::make_unique<KLTimer>(CueTime(), CueTime::FromSeconds(1))};
     auto destroy = [](KLTimer*, void* data) {
-        auto* o = static_cast<Owners*>(data);
-        o->a->reset();
-        o->b->reset();
+        for (int i = 0; i < 2; i++)
+            static_cast<std::unique_ptr<KLTimer>*>(data)[i].reset();
     };
-    first->post_trigger(destroy, &owners, first->To());
-    second->post_trigger(destroy, &owners, second->To());
-    first->start();
-    second->start();
+    for (auto& t : timers) {
+        t->post_trigger(destroy, timers, t->To());
+        t->start();
+    }
     Advance(2);
     KLTimerBeat::Tick();
-    EXPECT_EQ(first, nullptr);
-    EXPECT_EQ(second, nullptr);
+    EXPECT_TRUE(timers[0] == nullptr && timers[1] == nullptr);
 }
 
 // The clock a sound thread holds outlives the timer and stays frozen where it stopped.
@@ -149,18 +140,6 @@ TEST_F(TimerTest, TheSharedClockOutlivesItsTimer) {
     Advance(1);
     EXPECT_FALSE(clock->Running());
     EXPECT_NEAR(clock->At(TimerClock::Now()), 4.75, 1e-9);
-}
-
-TEST_F(TimerTest, StopWatchReportsTheRateOfItsMarks) {
-    KLStopWatch watch;
-    EXPECT_EQ(watch.FrameRate(), 0.0);
-    for (int i = 0; i < 61; i++, Advance(1.0 / 120))
-        watch.Mark();
-    EXPECT_EQ(watch.Marks(), 61);
-    EXPECT_NEAR(watch.FrameRate(), 120.0, 1e-6);
-    watch.Reset();
-    watch.Mark();
-    EXPECT_EQ(watch.FrameRate(), 0.0) << "one mark is no rate";
 }
 
 // The device clock follows a device that asks for buffers at a steady pace (here 3% faster

@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 
 #include <stdlib.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <filesystem>
 #include <fstream>
@@ -34,6 +36,18 @@ inline void UseSoundDriver(const char* driver, const char* file = "/dev/null") {
     setenv("SDL_AUDIODRIVER", driver, 1);
     setenv("SDL_DISKAUDIOFILE", file, 1);
     setenv("SDL_DISKAUDIODELAY", "0", 1);
+}
+
+// Runs `body` in a child process; its wait status (-1 when there is no child).
+template <typename F>
+int InChild(F body) {
+    const pid_t pid = ::fork();
+    if (pid == 0)
+        body(), ::_exit(0);
+    int status = -1;
+    if (pid > 0)
+        ::waitpid(pid, &status, 0);
+    return status;
 }
 
 // Gives each test a fresh directory, removed afterwards, and keeps the reports made meanwhile.
