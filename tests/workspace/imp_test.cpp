@@ -15,7 +15,6 @@
 #include "model/KLEdlEvent.h"
 #include "model/KLKeySet.h"
 #include "model/KLKeyTrack.h"
-#include "scene/KLScene.h"
 #include "scene/KLWireSource.h"
 #include "toolkit/SafeFile.h"
 #include "workspace/ConsoleGhost.h"
@@ -27,61 +26,30 @@ namespace {
 
 using ImpTest = ProjectTest;
 
-TEST_F(ImpTest, KeysetLookupsStayInBoundsAndFindTheFirstOfAName) {
-    for (const char* n : {"a", "b", "b", "c", "d", "e", "f", "g", "h", "i"}) {
-        const int i = theImp.keysetCount++;
-        theImp.keySets[i] = std::make_unique<KLKeySet>(n, nullptr);
-        theImp.keyTracks[i] = std::make_unique<KLKeyTrack>(theImp.keySets[i].get());
-    }
-    EXPECT_TRUE(!theImp.GetKeySet(10) && !theImp.GetKeySet(-1) && !theImp.GetKeyTrack(10));
-    EXPECT_EQ(theImp.GetKeySet(9), theImp.keySets[9].get());
-    EXPECT_EQ(theImp.GetKeySetId("b"), 1);
-    EXPECT_EQ(theImp.GetKeySetId("B"), -1) << "names are case-sensitive";
-    EXPECT_EQ(theImp.GetKeySetId(nullptr), -1);
-}
-
-TEST_F(ImpTest, FeedbackOutOfRangeKeepsTheModeButRefreshesTheScene) {
-    theImp.SetFeedback(1);
-    theImp.scene->Feedback(3);
-    theImp.SetFeedback(7);
-    EXPECT_EQ(theImp.feedback, 1);
-    EXPECT_EQ(theImp.scene->Feedback(), 1);
-    theImp.SetFeedback(2);
-}
-
 TEST_F(ImpTest, ErrorLogTakesReportsAtTheOutputLevelAndTheViewerSeesIt) {
-    const std::string log = dir / "errlog.vx";
-    theImp.SetErrorFilename(log.c_str());
-    size_t header = ReadFile(log).size();
-    KLInform("not logged at the default level\n");
-    KLWarning("Audio file [x] does not exist.\n");
-    KLError("second");
-    EXPECT_EQ(ReadFile(log).substr(header), "Audio file [x] does not exist.\nsecond");
-    EXPECT_THAT(ghost.calls, ElementsAre("ShowErrorFlag()", "ShowErrorFlag()"));
-    KLErrHandler::outputLevel = KLErr::kStatus;
-    KLStatus("shown when verbose\n");
-    KLErrHandler::outputLevel = KLErrHandler::kDefaultOutputLevel;
-    EXPECT_THAT(ReadFile(log), HasSubstr("shown when verbose\n"));
-
-    // Viewing appends a separator only after new messages.
-    const std::string seen = dir / "seen";
-    const std::string separator = "\n---------------------------------------\n\n";
+    const std::string log = dir / "errlog.vx", seen = dir / "seen";
     std::optional<ScopedEnv> viewer;
     viewer.emplace("TESSEL_USER_ERROR_READER", ("sh -c 'cp \"$0\" " + seen + "'").c_str());
     theImp.SetErrorFilename(log.c_str());
-    header = ReadFile(log).size();
+    const size_t header = ReadFile(log).size();
     theImp.ViewErrorLog();
     EXPECT_EQ(ReadFile(log).size(), header) << "no messages yet: no separator";
-    KLError("one\n");
+    KLInform("not logged at the default level\n");
+    KLWarning("one\n");
+    KLError("two");
+    EXPECT_EQ(ghost.Calls("ShowErrorFlag").size(), 2u);
     theImp.ViewErrorLog();
-    EXPECT_EQ(ReadFile(seen).substr(header), "one\n") << "the viewer gets the log";
+    EXPECT_EQ(ReadFile(seen).substr(header), "one\ntwo") << "the viewer gets the log";
     theImp.ViewErrorLog();
-    KLError("two\n");
-    viewer.reset();
+    KLErrHandler::outputLevel = KLErr::kStatus;
+    KLStatus("shown when verbose\n");
+    KLErrHandler::outputLevel = KLErrHandler::kDefaultOutputLevel;
     viewer.emplace("TESSEL_USER_ERROR_READER", "false");
     theImp.ViewErrorLog();
-    EXPECT_EQ(ReadFile(log).substr(header),
-              "one\n" + separator + "two\n" + "Problem launching error log viewer.\n" + separator);
+    const std::string separator = "\n---------------------------------------\n\n";
+    EXPECT_EQ(ReadFile(log).substr(header), "one\ntwo" + separator + "shown when verbose\n" +
+                                                "Problem launching error log viewer.\n" +
+                                                separator);
     EXPECT_EQ(ghost.Calls("ClearErrorFlag").size(), 4u);
 
     const std::string bad = dir / "missing-dir/errlog.vx";

@@ -1,5 +1,5 @@
 // The shipped Phoneme recognizer plug-in: recognition of the demo dialogue, its settings, its
-// report when the speech model is missing, awkward sounds, its panel; and the pure parts it is
+// report when the speech model is missing, awkward sounds; and the pure parts it is
 // built from (the step timeline, the level meter and the pause splitter), compiled in here.
 #include <gtest/gtest.h>
 
@@ -13,7 +13,6 @@
 #include "phoneme/PauseSplitter.h"
 #include "phoneme/PhoneTimeline.h"
 #include "phoneme/SoundLevels.h"
-#include "toolkit/CueChirrup.h"
 #include "toolkit/CueRecognizerCatalog.h"
 #include "toolkit/CueSound.h"
 
@@ -44,12 +43,6 @@ bool in_order(const std::vector<std::string>& seen, const std::vector<std::strin
         ++at;
     }
     return true;
-}
-std::string joined(const std::vector<std::string>& v) {
-    std::string out;
-    for (const auto& s : v)
-        out += s + " ";
-    return out;
 }
 // Steps of one frame at 30 frames per second that cover `sound`.
 long frames_of(const CueSound& sound) {
@@ -98,7 +91,7 @@ TEST_F(PhonemePlugin, FindsTheDemoDialoguesPhonesInOrderOneResultPerFrame) {
     ASSERT_TRUE(r->GuardedRecognize(*dialogue_)) << reports.text;
     ASSERT_EQ(long(r->results.size()), frames_of(*dialogue_));
     EXPECT_EQ(name_at(*r, 30), "SIL") << "1.0 s lies in the pause";
-    EXPECT_TRUE(in_order(phones(*r), kDialoguePhones)) << joined(phones(*r));
+    EXPECT_TRUE(in_order(phones(*r), kDialoguePhones)) << ::testing::PrintToString(phones(*r));
     for (const auto& result : r->results)
         EXPECT_EQ(result.shapeIndex, r->targets[size_t(result.targetIndex)].keyShapeIndex);
     EXPECT_FALSE(r->Configured()) << "38 phones are not linked";
@@ -110,7 +103,7 @@ TEST_F(PhonemePlugin, FindsTheDemoDialoguesPhonesInOrderOneResultPerFrame) {
     for (size_t i = 0; i < 12; ++i)
         EXPECT_EQ(name_at(*r, i), "SIL") << i;
     EXPECT_EQ(name_at(*r, 45), "SIL") << "1.0 s into the dialogue";
-    EXPECT_TRUE(in_order(phones(*r), kDialoguePhones)) << joined(phones(*r));
+    EXPECT_TRUE(in_order(phones(*r), kDialoguePhones)) << ::testing::PrintToString(phones(*r));
 }
 
 TEST_F(PhonemePlugin, StepMinimumAndThreadsShapeTheResults) {
@@ -143,22 +136,20 @@ TEST_F(PhonemePlugin, StepMinimumAndThreadsShapeTheResults) {
 TEST_F(PhonemePlugin, SettingsRoundTripAndRefuseNonsense) {
     ASSERT_EQ(r->targets.size(), 40u);
     EXPECT_TRUE(r->targets.front().name == "AA" && r->targets.back().name == "SIL");
-    for (const auto& t : r->targets) {
-        CueSound sample(t.soundFile.c_str());
-        EXPECT_TRUE(sample.Valid() && sample.Length() > 0.1f) << t.name << ": " << t.soundFile;
-    }
+    for (const auto& t : r->targets)
+        EXPECT_GT(CueSound(t.soundFile.c_str()).Length(), 0.1f) << t.soundFile;
     const std::string defaults = SettingsText(*r);
     EXPECT_THAT(defaults, HasSubstr("/Phoneme-samples/SIL.wav\n"
                                     "    minimum 2\n    speed fast\n    threads 0\n"
                                     "    models \"/usr/share/pocketsphinx/model/en-us\"\n"));
-    const std::string text =
-        "    step 2\n    target AA picture aa.sgi sound aa.wav\n    minimum 4\n"
-        "    speed accurate\n    threads 1\n    models \"/opt/my models\"\n";
-    ASSERT_TRUE(ReadSettingsText(*r, text + "end\n"));
+    const std::string common = "    step 2\n    target AA picture aa.sgi sound aa.wav\n",
+                      own =
+                          "    minimum 4\n    speed accurate\n    threads 1\n"
+                          "    models \"/opt/my models\"\n";
+    ASSERT_TRUE(ReadSettingsText(*r, common + own + "end\n"));
     const std::string written = SettingsText(*r);
-    EXPECT_THAT(written, HasSubstr("    step 2\n    target AA picture aa.sgi sound aa.wav\n"));
-    EXPECT_THAT(written, HasSubstr("    minimum 4\n    speed accurate\n    threads 1\n"
-                                   "    models \"/opt/my models\"\n"));
+    EXPECT_THAT(written, HasSubstr(common));
+    EXPECT_THAT(written, HasSubstr(own));
     std::unique_ptr<CueRecognizer> copy(r->GuardedClone());
     ASSERT_TRUE(ReadSettingsText(*copy, written + "end\n"));
     EXPECT_EQ(SettingsText(*copy), written);
@@ -187,16 +178,14 @@ TEST_F(PhonemePlugin, RefusesWhatItCannotAnalyseAndTellsAMissingModel) {
                 HasSubstr("Recognizer [Phoneme] cannot run: its speech model file [" + dir.path() +
                           "/en-us/mdef] is missing (install pocketsphinx-en-us"));
     // A model folder with every file present but unreadable ones: the decoder cannot start.
+    std::filesystem::create_directory(dir / "en-us");
     for (const char* f :
          {"en-us/mdef", "en-us/feat.params", "en-us/means", "en-us/variances", "en-us/sendump",
-          "en-us/transition_matrices", "en-us/noisedict", "en-us-phone.lm.bin"}) {
-        std::filesystem::create_directories(std::filesystem::path(dir / f).parent_path());
+          "en-us/transition_matrices", "en-us/noisedict", "en-us-phone.lm.bin"})
         WriteFile(dir / f, "not a model\n");
-    }
     reports.text.clear();
     EXPECT_FALSE(r->GuardedRecognize(*dialogue_));
-    EXPECT_THAT(reports.text, HasSubstr("Recognizer [Phoneme] could not start its speech decoder "
-                                        "with the model in [" +
+    EXPECT_THAT(reports.text, HasSubstr("could not start its speech decoder with the model in [" +
                                         dir.path() + "]."));
     ASSERT_TRUE(r->GuardedResetSettings());
     r->step = CueTime();
@@ -235,11 +224,12 @@ TEST_P(PhonemeOddSounds, GiveOneResultPerStepAndFindWhatIsThere) {
     ASSERT_TRUE(r->GuardedRecognize(*sound)) << reports.text;
     EXPECT_EQ(long(r->results.size()), frames_of(*sound));
     if (!GetParam().phones.empty()) {
-        EXPECT_TRUE(in_order(phones(*r), GetParam().phones)) << joined(phones(*r));
+        EXPECT_TRUE(in_order(phones(*r), GetParam().phones))
+            << ::testing::PrintToString(phones(*r));
     } else {
         // Nothing heard: no phone for a key to be placed from.
         EXPECT_THAT(phones(*r), ::testing::AnyOf(IsEmpty(), ElementsAre("SIL")))
-            << joined(phones(*r));
+            << ::testing::PrintToString(phones(*r));
     }
     EXPECT_THAT(reports.text, IsEmpty());
 }
@@ -247,7 +237,6 @@ TEST_P(PhonemeOddSounds, GiveOneResultPerStepAndFindWhatIsThere) {
 INSTANTIATE_TEST_SUITE_P(
     Sounds, PhonemeOddSounds,
     ::testing::Values(
-        OddSound{"Silence", samples(std::vector<float>(32000, 0.0f), 16000), {}},
         OddSound{"WhiteNoise", samples(noise(44100, 0.5f), 22050), {}},
         OddSound{"NoSamples", samples({}, 16000), {}},
         // Telephone bandwidth loses the hiss of the fricatives, not the words' vowels.
@@ -259,93 +248,6 @@ INSTANTIATE_TEST_SUITE_P(
                  },
                  kDialoguePhones}),
     [](const auto& info) { return std::string(info.param.name); });
-
-// What a plug-in asks of the window's panel, and the progress it reports, through a host
-// that records the calls; each control's `set` is what moving it in the panel calls.
-class RecordingHost : public CueChirrupHost {
-  public:
-    struct Control {
-        std::string name;
-        float value;
-        std::vector<std::string> labels;
-        std::function<void(CueRecognizer*, float)> set;
-    };
-    std::vector<Control> controls;
-    std::vector<float> progress;
-
-    int CreateFloatSlider(CueRecognizer*, const char* name, float, float, float value,
-                          FloatCallback callback) override {
-        controls.push_back(
-            {name, value, {}, [callback](CueRecognizer* r, float v) { callback(r, v); }});
-        return 1;
-    }
-    int CreateIntSlider(CueRecognizer*, const char* name, int, int, int value,
-                        IntCallback callback) override {
-        controls.push_back({name, float(value), {}, [callback](CueRecognizer* r, float v) {
-                                callback(r, int(v));
-                            }});
-        return 1;
-    }
-    int CreateOption(CueRecognizer*, const char* name, int count, const char* const* labels,
-                     int value, OptionCallback callback) override {
-        controls.push_back(
-            {name, float(value), {labels, labels + count}, [callback](CueRecognizer* r, float v) {
-                 callback(r, int(v));
-             }});
-        return 1;
-    }
-    int SetFloatSlider(CueRecognizer*, const char*, float) override { return 1; }
-    int SetIntSlider(CueRecognizer*, const char*, int) override { return 1; }
-    int SetOption(CueRecognizer*, const char*, int) override { return 1; }
-    void Progress(CueRecognizer*, float done) override { progress.push_back(done); }
-
-    std::string Shown() const {  // "name=value ..."
-        std::string out;
-        for (const Control& c : controls)
-            out += KLFmt("%s=%g ", c.name.c_str(), c.value);
-        return out;
-    }
-};
-
-class PluginPanels : public PhonemePlugin {
-  protected:
-    void SetUp() override {
-        PhonemePlugin::SetUp();
-        previous = CueChirrup::SetHost(&host);
-    }
-    void TearDown() override { CueChirrup::SetHost(previous); }
-    RecordingHost host;
-    CueChirrupHost* previous = nullptr;
-};
-
-TEST_F(PluginPanels, PhonemeHasStepMinimumAndSpeedAndReportsProgress) {
-    r->UpdatePanel();
-    ASSERT_EQ(host.Shown(), "step=1 minimum=2 speed=0 ");
-    EXPECT_THAT(host.controls[2].labels, ElementsAre("fast", "balanced", "accurate"));
-    host.controls[0].set(r.get(), 3);
-    host.controls[1].set(r.get(), 4);
-    host.controls[2].set(r.get(), 2);
-    EXPECT_THAT(SettingsText(*r), HasSubstr("    step 3\n"));
-    EXPECT_THAT(SettingsText(*r), HasSubstr("    minimum 4\n    speed accurate\n"));
-
-    // Half a minute of speech takes long enough to report progress on the way.
-    ASSERT_TRUE(ReadSettingsText(*r, "speed fast\nend\n"));
-    ASSERT_TRUE(r->GuardedRecognize(*repeated(*dialogue_, 8)));
-    ASSERT_FALSE(host.progress.empty());
-    EXPECT_TRUE(std::is_sorted(host.progress.begin(), host.progress.end()));
-    EXPECT_TRUE(host.progress.front() >= 0.0f && host.progress.back() <= 1.0f);
-}
-
-TEST_F(PluginPanels, LoudnessSlidersKeepHalfBelowOpen) {
-    std::unique_ptr<CueRecognizer> loudness(catalog_->FetchRecognizer("Loudness"));
-    ASSERT_TRUE(loudness);
-    loudness->UpdatePanel();
-    ASSERT_EQ(host.Shown(), "step=1 half=-36 open=-24 ");
-    host.controls[1].set(loudness.get(), -20.0f);  // past "open": it moves up
-    EXPECT_THAT(SettingsText(*loudness), HasSubstr("    levels -20 -19\n"));
-    host.controls[2].set(loudness.get(), -30.0f);  // below "half": it moves down
-    EXPECT_THAT(SettingsText(*loudness), HasSubstr("    levels -31 -30\n"));
-}
 
 // The pure parts.
 
@@ -402,8 +304,6 @@ TEST(PhoneTimeline, StepRules) {
         {{9, 9, 9}, fill({-5, -5, -5}, 5), {9, 9, 9}},
         // Fewer levels than steps: the steps without one are left alone.
         {{1, 9, 9}, fill({-20, -20}, 5), {1, 1, 9}},
-        // A one-step flicker inside a run vanishes.
-        {{1, 1, 2, 1, 1}, absorb(2), {1, 1, 1, 1, 1}},
         // The longer neighbour wins, the earlier one on a tie.
         {{1, 1, 2, 3, 3, 3}, absorb(2), {1, 1, 3, 3, 3, 3}},
         // Short runs at the ends join their only neighbour.

@@ -8,7 +8,6 @@
 #include <sstream>
 
 #include "WorkspaceTestUtil.h"
-#include "model/KLKeySet.h"
 #include "toolkit/CuePrefs.h"
 #include "toolkit/CueRecognizerCatalog.h"
 #include "toolkit/CueSound.h"
@@ -213,35 +212,11 @@ TEST_F(SettingsFile, ReadsOnlyItsOwnBlockAfterAReset) {
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, nullptr), 0);
     EXPECT_EQ(theImp.ConfigureRecognizer(nullptr, file.c_str()), 0);
     EXPECT_THAT(ghost.calls, IsEmpty()) << "an unreadable file is refused silently";
-}
 
-// A keyset file's block of a plug-in recognizer and its links, read and written back.
-TEST_F(SettingsFile, PluginSettingsAndLinksComeFromKeysetFiles) {
-    ScopedEnv project("TESSEL_PROJECT", dir.path().c_str());
-    ScopedEnv misc("TESSEL_MISC_DIR", nullptr);
-    ResetWorkspace();
-    theImp.recognizers.ScanDirectory(kGoodPlugins.c_str());
-    std::unique_ptr<CueRecognizer> level(theImp.recognizers.FetchRecognizer("Level"));
-    ASSERT_TRUE(level);
-    EXPECT_EQ(level->ConfigFileName(), dir / "misc_data/Level.config");
-    {
-        ScopedEnv none("TESSEL_PROJECT", nullptr);
-        EXPECT_EQ(level->ConfigFileName(), "./Level.config");
-    }
-    const std::string blocks =
-        "begin recognizer Level mouth\n    step 6\n    target silent\n    target quiet\n"
-        "    target loud\n    threshold 0.2 0.7\nend\n\n"
-        "begin recognizer-links Level mouth\n    link silent to rest\n    link loud to wide\nend\n";
-    WriteFile(dir / "face.gltf", FaceSceneJson());
-    WriteFile(dir / "face.keyset", "wire " + (dir / "face.gltf") + " 0\n" + kMouth + blocks);
-    ASSERT_EQ(theImp.LoadKeyset((dir / "face.keyset").c_str()), 1);
-    KLKeySet* mouth = theImp.GetKeySet("mouth");
-    CueRecognizer* r = mouth ? mouth->GetRecognizer("Level") : nullptr;
-    ASSERT_TRUE(r && mouth->recognizers.size() == 1u);
-    EXPECT_EQ(r->FindTarget("loud")->keyShapeIndex, 2);
-    ASSERT_EQ(theImp.SaveKeyset((dir / "saved.keyset").c_str()), 1);
-    EXPECT_THAT(ReadFile(dir / "saved.keyset"), HasSubstr(blocks));
-    ResetWorkspace();
+    ScopedEnv project("TESSEL_PROJECT", dir.path().c_str()), misc("TESSEL_MISC_DIR", nullptr);
+    EXPECT_EQ(r.ConfigFileName(), dir / "misc_data/Vowel.config");
+    ScopedEnv none("TESSEL_PROJECT", nullptr);
+    EXPECT_EQ(r.ConfigFileName(), "./Vowel.config");
 }
 
 // The program exports its symbols to plug-ins and scans the catalogue when a keyset file

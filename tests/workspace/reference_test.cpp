@@ -42,18 +42,10 @@ class DialogGhost : public RecordingGhost {
     std::vector<int> shownRange;     // start, end, by, zoom
 };
 
-void collect_status(const char* message, void* data) {
-    static_cast<std::vector<std::string>*>(data)->push_back(message);
-}
-
 class ReferenceTest : public ::testing::Test {
   protected:
-    void SetUp() override {
-        theImp.referenceZoom = 2;
-        KLErrHandler::SetStatusHook(collect_status, &status);
-    }
+    void SetUp() override { theImp.referenceZoom = 2; }
     void TearDown() override {
-        KLErrHandler::SetStatusHook(nullptr, nullptr);
         theImp.DeleteReference();
         theImp.DeletePlayblast();
         theImp.referenceZoom = 2;
@@ -87,7 +79,6 @@ class ReferenceTest : public ::testing::Test {
     TempDir dir;
     DialogGhost ghost;
     GhostScope scope{&ghost};
-    std::vector<std::string> status;
 };
 
 TEST_F(ReferenceTest, NameFormsFindTheRunAndNameItsParts) {
@@ -192,9 +183,6 @@ TEST_F(ReferenceTest, ZoomResizesByItsTableAndOutOfRangeMeansFour) {
 TEST_F(ReferenceTest, FrameIndexIsWholeFramesFromTheOffsetAtTheWorkspaceRate) {
     frames("take.%04d.png", 10, 13);
     ASSERT_EQ(theImp.LoadReference(path("take.0010.png").c_str()), 1);
-    ASSERT_EQ(status.size(), 5u);
-    EXPECT_EQ(status[0], "Computing available frame range...");
-    EXPECT_EQ(status[4], "Loading [" + path("take.0013.png") + "] from [10] to [13] ...");
     EXPECT_EQ(at(10), 10);
     EXPECT_EQ(at(10.9), 10);
     EXPECT_EQ(at(13.99), 13);
@@ -215,12 +203,8 @@ TEST_F(ReferenceTest, FrameIndexIsWholeFramesFromTheOffsetAtTheWorkspaceRate) {
 }
 
 TEST_F(ReferenceTest, PlayblastLoadsIntoItsOwnSequence) {
-    EXPECT_EQ(theImp.LoadPlayblast(path("blast.1.png").c_str()), 0);
-    EXPECT_THAT(ghost.Calls("Inform("),
-                ElementsAre("Inform(Failed to find any playblast frames.|Dismiss)"));
     frames("blast.%d.png", 5, 7);
     ghost.newZoom = 3;
-    ghost.calls.clear();
     ASSERT_EQ(theImp.LoadPlayblast(path("blast.5.png").c_str()), 1);
     EXPECT_EQ(theImp.playblastCount, 3);
     EXPECT_EQ(theImp.referenceLoaded, 0);
@@ -229,8 +213,6 @@ TEST_F(ReferenceTest, PlayblastLoadsIntoItsOwnSequence) {
     EXPECT_EQ(grey(theImp.GetPlayblast(CueTime::FromFrames(6.5))), 6);
     EXPECT_EQ(theImp.GetReference(CueTime::FromFrames(6)), nullptr);
     EXPECT_EQ(theImp.PlayblastEnd(), CueTime::FromFrames(8));
-    theImp.DeletePlayblast();
-    EXPECT_EQ(theImp.GetPlayblast(CueTime::FromFrames(6)), nullptr);
 }
 
 }  // namespace
