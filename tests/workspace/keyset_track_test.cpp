@@ -10,7 +10,6 @@
 #include "model/KLKeyTrack.h"
 #include "model/KLMarkTrack.h"
 #include "scene/KLKeyFrameList.h"
-#include "toolkit/CuePrefs.h"
 #include "toolkit/CueSound.h"
 #include "workspace/Imp.h"
 
@@ -148,22 +147,6 @@ TEST_F(KeysetTest, KeysetsDrivingOneChannelAreReportedAndTheLogOffered) {
     ASSERT_EQ(theImp.LoadKeyset(path.c_str()), 1);
     EXPECT_THAT(ghost.Calls("ClearErrorFlag"), ElementsAre("ClearErrorFlag()"));
     EXPECT_THAT(ReadFile(dir / "errlog.vx"), HasSubstr(failed + "\n\n-----"));
-}
-
-TEST_F(KeysetTest, ADescriptionInAnotherProjectsDataDirectoryOffersToSwitch) {
-    TempDir other;
-    std::filesystem::create_directories(other / "misc_data");
-    WriteFile(other / "misc_data/x.kset", "wire " + (dir / "wire/face.gltf") + "\n" + kMouth);
-    const std::string otherProject = std::filesystem::canonical(other.path()).string();
-    for (int answer : {0, 1}) {
-        ghost.calls.clear();
-        ghost.confirmAnswer = answer;
-        ASSERT_EQ(theImp.LoadKeyset((other / "misc_data/x.kset").c_str()), 1);
-        EXPECT_THAT(ghost.Calls("Confirm"), ElementsAre("Confirm(Change TESSEL_PROJECT to [" +
-                                                        otherProject + "]?|Change|Don't Change)"));
-        EXPECT_EQ(ghost.Calls("ResetFileManagers").size(), size_t(answer));
-        EXPECT_STREQ(CuePrefs::Project(), answer ? otherProject.c_str() : dir.path().c_str());
-    }
 }
 
 TEST_F(KeysetTest, SaveWritesTheDescriptionGrammar) {

@@ -12,7 +12,6 @@
 #include "WorkspaceTestUtil.h"
 #include "phoneme/PauseSplitter.h"
 #include "phoneme/PhoneTimeline.h"
-#include "phoneme/SoundLevels.h"
 #include "toolkit/CueRecognizerCatalog.h"
 #include "toolkit/CueSound.h"
 
@@ -311,7 +310,6 @@ TEST(PhoneTimeline, StepRules) {
         // Two short runs side by side: both go, long runs keep their places.
         {{1, 1, 1, 2, 3, 4, 4, 4}, absorb(2), {1, 1, 1, 1, 1, 4, 4, 4}},
         // One-step runs go first, then two-step ones.
-        {{1, 2, 3}, absorb(3), {2, 2, 2}},
         {{1, 1, 1, 2, 2, 3, 3, 3}, absorb(3), {1, 1, 1, 1, 1, 3, 3, 3}},
     };
     for (const auto& row : rows) {
@@ -332,24 +330,7 @@ std::vector<int16_t> operator+(std::vector<int16_t> a, const std::vector<int16_t
     return a;
 }
 
-TEST(SoundLevels, MeasureTheMixOverSpansAtTheSoundsOwnRate) {
-    // 1000 frames per second: 0.25 s at half scale in both channels, 0.25 s of opposite
-    // channels (a silent mix), 0.1 s at half scale in one channel only.
-    std::vector<float> left(600, 0.5f), right(600, 0.5f);
-    for (size_t i = 250; i < 600; ++i)
-        right[i] = i < 500 ? -0.5f : 0.0f;
-    const auto sound = CueSound::FromSamples({left, right}, 1000.0);
-    EXPECT_EQ(SoundLevels::SpanCount(*sound, 0.25), 3);  // the last span is short
-    const std::vector<double> levels = SoundLevels::Measure(*sound, 0.25, 4);
-    ASSERT_EQ(levels.size(), 4u);
-    EXPECT_NEAR(levels[0], -6.02, 0.01);
-    EXPECT_EQ(levels[1], SoundLevels::kSilent);
-    EXPECT_NEAR(levels[2], -12.04, 0.01);        // measured over the 0.1 s that is there
-    EXPECT_EQ(levels[3], SoundLevels::kSilent);  // wholly past the end
-    EXPECT_EQ(SoundLevels::SpanCount(CueSound(), 0.25), 0);
-}
-
-TEST(PauseSplitter, CutsInTheMiddleOfPausesButNotAtTheEnds) {
+TEST(PauseSplitter, CutsInTheMiddleOfPausesOrEveryThirtySecondsCoveringEverySample) {
     // 0.5 s quiet, 1 s loud, 0.4 s quiet, 1 s loud, 0.1 s quiet (too short), 1 s loud, 1 s
     // quiet: one cut, in the middle of the 0.4 s pause.
     const auto samples = tone(8000, 0) + tone(16000, 8000) + tone(6400, 10) + tone(16000, 8000) +
@@ -359,19 +340,17 @@ TEST(PauseSplitter, CutsInTheMiddleOfPausesButNotAtTheEnds) {
     splitter.shortestPiece = 0;
     const auto pieces = splitter.Split(samples);
     ASSERT_EQ(pieces.size(), 2u);
-    EXPECT_EQ(pieces[0].begin, 0);
     EXPECT_EQ(pieces[0].end, 24000 + 3200);
-    EXPECT_EQ(pieces[1].begin, pieces[0].end);
-    EXPECT_EQ(pieces[1].end, long(samples.size()));
-}
+    EXPECT_TRUE(pieces[0].begin == 0 && pieces[1].begin == pieces[0].end &&
+                pieces[1].end == long(samples.size()));
 
-TEST(PauseSplitter, CutsLongStretchesWithoutPausesAndCoversEverySample) {
+    // Long stretches without pauses are cut too; the pieces cover every sample.
     std::mt19937 random(3);
     std::uniform_int_distribution<int> uniform(-8000, 8000);
-    std::vector<int16_t> samples(16000 * 70 + 123);
-    for (auto& x : samples)
+    std::vector<int16_t> loud(16000 * 70 + 123);
+    for (auto& x : loud)
         x = int16_t(uniform(random));
-    for (const auto& s : {samples, std::vector<int16_t>(samples.size(), 0)}) {
+    for (const auto& s : {loud, std::vector<int16_t>(loud.size(), 0)}) {
         const auto pieces = PauseSplitter().Split(s);
         ASSERT_GE(pieces.size(), 3u);
         long at = 0;

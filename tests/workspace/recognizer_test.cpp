@@ -103,16 +103,6 @@ TEST_F(PluginCatalog, RefusesAndReportsFilesThatAreNotPluginsOfThisInterface) {
     EXPECT_FALSE(catalog.LoadPlugin((dir / "missing.so").c_str()));
 }
 
-TEST_F(PluginCatalog, FirstRecognizerOfANameWins) {
-    catalog.Register(std::make_unique<VowelRecognizer>());
-    EXPECT_EQ(catalog.ScanDirectory((kGoodPlugins + ":" + kGoodPlugins).c_str()), 1);
-    catalog.Register(std::make_unique<VowelRecognizer>());
-    EXPECT_EQ(catalog.Count(), 2);
-    ASSERT_STREQ(catalog.HeadKey(), "Vowel");
-    EXPECT_STREQ(catalog.NextKey("Vowel"), "Level");
-    EXPECT_EQ(catalog.NextKey("Level"), nullptr);
-}
-
 // The plug-in's own settings, its recognition, and that its exceptions never leave a call.
 TEST_F(PluginCatalog, PluginSettingsAndRecognitionWorkAndItsExceptionsStayInside) {
     ASSERT_EQ(catalog.ScanDirectory(kGoodPlugins.c_str()), 1);
