@@ -108,9 +108,7 @@ TEST_F(KeysetTest, RecognizerBlockFailuresAreToldAndLoadingGoesOn) {
         {"begin recognizer-links Other mouth\n link a to rest\nend\n",
          "Failed to find recognizer [Other]."},
         {"begin recognizer-links Vowel mouth\n link zz to rest\nend\n",
-         "Failed to find target [zz] for recognizer [Vowel]."},
-        {"begin recognizer-links Vowel mouth\n link a to nokey\nend\n",
-         "Failed to find key [nokey] for recognizer [Vowel]."}};
+         "Failed to find target [zz] for recognizer [Vowel]."}};
     for (const auto& [blocks, message] : rows) {
         ghost.calls.clear();
         ASSERT_EQ(
@@ -125,28 +123,20 @@ TEST_F(KeysetTest, RecognizerBlockFailuresAreToldAndLoadingGoesOn) {
 }
 
 // "lips" samples lip only; between its frames 10 and 20 only lip TX changes, as in "mouth".
-TEST_F(KeysetTest, KeysetsDrivingOneChannelAreReportedAndTheLogOffered) {
+TEST_F(KeysetTest, KeysetsDrivingOneChannelAreReported) {
     const std::string path =
         Describe(std::string(kMouth) + "begin keyset lips lip\n key half 10\n key full 20\nend\n");
     const std::string failed = "Keyset verification revealed some problems.";
-    {
-        ghost.confirmAnswer = 0;
-        Reports reports;
-        ASSERT_EQ(theImp.LoadKeyset(path.c_str()), 1) << "the load still succeeds";
-        EXPECT_EQ(reports.text,
-                  "Dag [lip] channel [TX] is found in keysets [mouth] and [lips]\n"
-                  "Dag [lip] channel [TX] is found in keysets [lips] and [mouth]\n" +
-                      failed + "\n");
-        EXPECT_THAT(ghost.Calls("Confirm"),
-                    ElementsAre("Confirm(" + failed + "|View Error Log|Dismiss)"));
-        EXPECT_THAT(ghost.Calls("ClearErrorFlag"), IsEmpty()) << "Dismiss does not open the log";
-    }
-    theImp.SetErrorFilename((dir / "errlog.vx").c_str());
-    ghost.confirmAnswer = 1;
-    ghost.calls.clear();
-    ASSERT_EQ(theImp.LoadKeyset(path.c_str()), 1);
-    EXPECT_THAT(ghost.Calls("ClearErrorFlag"), ElementsAre("ClearErrorFlag()"));
-    EXPECT_THAT(ReadFile(dir / "errlog.vx"), HasSubstr(failed + "\n\n-----"));
+    ghost.confirmAnswer = 0;
+    Reports reports;
+    ASSERT_EQ(theImp.LoadKeyset(path.c_str()), 1) << "the load still succeeds";
+    EXPECT_EQ(reports.text,
+              "Dag [lip] channel [TX] is found in keysets [mouth] and [lips]\n"
+              "Dag [lip] channel [TX] is found in keysets [lips] and [mouth]\n" +
+                  failed + "\n");
+    EXPECT_THAT(ghost.Calls("Confirm"),
+                ElementsAre("Confirm(" + failed + "|View Error Log|Dismiss)"));
+    EXPECT_THAT(ghost.Calls("ClearErrorFlag"), IsEmpty()) << "Dismiss does not open the log";
 }
 
 TEST_F(KeysetTest, SaveWritesTheDescriptionGrammar) {
@@ -347,19 +337,6 @@ TEST_F(TrackTest, FpsStatementSetsOrKeepsTheRate) {
         EXPECT_EQ(theImp.fps, expected) << text;
         EXPECT_EQ(CueTime::default_fps, expected) << text;
     }
-}
-
-TEST_F(TrackTest, LoadSoundTakesTheNameAsItStandsAndKeepsTheSoundOnFailure) {
-    const std::string good = dir / "misc_data/dialogue.aiff", bad = dir / "misc_data/no.aiff";
-    ASSERT_EQ(theImp.LoadSound(good.c_str()), 1);
-    EXPECT_EQ(theImp.trackModified, 1);
-    EXPECT_THAT(ghost.calls, ElementsAre("DisplayDuration(12000)", "InitSound(sound)"));
-    ghost.calls.clear();
-    EXPECT_EQ(theImp.LoadSound(bad.c_str()), 0);
-    ASSERT_EQ(ghost.Calls("Inform").size(), 1u);
-    EXPECT_THAT(ghost.Calls("Inform")[0],
-                ::testing::StartsWith("Inform(Could not read sound file [" + bad + "]"));
-    EXPECT_EQ(theImp.soundFile, good);
 }
 
 TEST_F(TrackTest, DurationIsTheLongestOfItsCandidatesAndNeverBelowOneSecond) {

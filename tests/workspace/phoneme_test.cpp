@@ -60,7 +60,6 @@ class PhonemePlugin : public ::testing::Test {
     static void SetUpTestSuite() {
         catalog_ = new CueRecognizerCatalog;
         ASSERT_TRUE(catalog_->LoadPlugin((kShippedPlugins + "/Phoneme.so").c_str()));
-        ASSERT_TRUE(catalog_->LoadPlugin((kShippedPlugins + "/Loudness.so").c_str()));
         dialogue_ = new CueSound(CHIRRUP_SOURCE_DIR "/resources/demo/dialogue.aiff");
         ASSERT_TRUE(dialogue_->Valid()) << dialogue_->ErrorText();
     }
@@ -299,8 +298,6 @@ TEST(PhoneTimeline, StepRules) {
         {{1, 9, 9, 9, 2}, fill({-20, -50, -20, -20, -20}, 5), {1, 9, 1, 2, 2}},
         // Filled steps do not spread further: only phones the decoder heard count.
         {{1, 9, 9, 9, 9, 9, 9}, fill(Levels(7, -20), 2), {1, 1, 1, 9, 9, 9, 9}},
-        // All silence, however loud (white noise, say), stays silence.
-        {{9, 9, 9}, fill({-5, -5, -5}, 5), {9, 9, 9}},
         // Fewer levels than steps: the steps without one are left alone.
         {{1, 9, 9}, fill({-20, -20}, 5), {1, 1, 9}},
         // The longer neighbour wins, the earlier one on a tie.

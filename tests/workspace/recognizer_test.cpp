@@ -164,27 +164,20 @@ TEST_F(PluginCatalog, LoudnessMapsRmsLevelToClosedHalfOpen) {
     EXPECT_EQ(r->results.size(), 4u) << "the last short step gets a result";
 }
 
-class SettingsFile : public PluginCatalog {
-  protected:
-    std::string write(const std::string& text) {
-        WriteFile(dir / "Vowel.config", text);
-        return dir / "Vowel.config";
-    }
+// Configuring resets the settings (not the links) and reads only the recognizer's own block.
+TEST_F(PluginCatalog, SettingsFileGivesOnlyItsOwnBlockAfterAReset) {
     RecordingGhost ghost;
     GhostScope scope{&ghost};
     VowelRecognizer r;
-};
-
-// Configuring resets the settings (not the links) and reads only the recognizer's own block.
-TEST_F(SettingsFile, ReadsOnlyItsOwnBlockAfterAReset) {
+    const std::string file = dir / "Vowel.config";
     r.step = CueTime::FromFrames(9);
     r.gain = 5.0f;
     r.FindTarget("a")->keyShapeIndex = 3;
     r.FindTarget("a")->pictureFile = "a.sgi";
-    const std::string file = write(
-        "gain 11\nbegin recognizer Other\n    gain 12\nend\n"
-        "begin recognizer Vowel extra\n    gain 13\nend\n"
-        "begin recognizer Vowel\n    target e picture e.sgi\n    gain 0.25\nend\ngain 14\n");
+    WriteFile(file,
+              "gain 11\nbegin recognizer Other\n    gain 12\nend\n"
+              "begin recognizer Vowel extra\n    gain 13\nend\n"
+              "begin recognizer Vowel\n    target e picture e.sgi\n    gain 0.25\nend\ngain 14\n");
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, file.c_str()), 1);
     EXPECT_EQ(r.gain, 0.25f);
     EXPECT_EQ(r.step, r.defaultStep);
@@ -194,7 +187,8 @@ TEST_F(SettingsFile, ReadsOnlyItsOwnBlockAfterAReset) {
     EXPECT_THAT(ghost.calls, ElementsAre("ShowRecognizerGui()"));
 
     r.gain = 5.0f;
-    EXPECT_EQ(theImp.ConfigureRecognizer(&r, write("begin recognizer Other\nend\n").c_str()), 1);
+    WriteFile(file, "begin recognizer Other\nend\n");
+    EXPECT_EQ(theImp.ConfigureRecognizer(&r, file.c_str()), 1);
     EXPECT_EQ(r.gain, 5.0f) << "without its block the settings stay";
 
     ghost.calls.clear();
