@@ -188,7 +188,7 @@ class BatchTest : public ProjectTest {
     RunResult Run(std::vector<std::string> args, std::vector<EnvChange> env = {});
     // "-B x.track APPLY DAG OFFSET out.gltf x.kset"; the scene is stored as Out().
     RunResult Batch(const std::string& dag = "VX_ROOT", const std::string& apply = "face.gltf",
-                    const std::string& offset = "12", std::vector<EnvChange> env = {});
+                    const std::string& offset = "12");
     std::string Out() const { return dir / "wire/out.gltf"; }
 };
 

@@ -170,8 +170,8 @@ RunResult BatchTest::Run(std::vector<std::string> args, std::vector<EnvChange> e
 }
 
 RunResult BatchTest::Batch(const std::string& dag, const std::string& apply,
-                           const std::string& offset, std::vector<EnvChange> env) {
-    return Run({"-B", "x.track", apply, dag, offset, "out.gltf", "x.kset"}, std::move(env));
+                           const std::string& offset) {
+    return Run({"-B", "x.track", apply, dag, offset, "out.gltf", "x.kset"});
 }
 
 std::string FaceSceneJson() {
