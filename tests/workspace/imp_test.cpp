@@ -104,11 +104,9 @@ TEST_F(ImpTest, ApplyCoversTheWorkspaceAndEveryKeysetOfTheName) {
 
 struct SecondSignal {
     int signal;
-    int file;          // 1: while the keyset is written, 2: while the track is
-    bool fromOutside;  // sent by another process rather than raised by the save itself
+    int file;  // 1: while the keyset is written, 2: while the track is
 };
 SecondSignal second;
-int second_sent_fd = -1;  // the child tells the test process here that the save is under way
 
 // A process holding keysets (and a sound) that receives a fatal signal writes "_m.keyset" (and
 // "_m.track") in its working directory and ends with status -1.
@@ -125,14 +123,8 @@ class EmergencySaveTest : public ProjectTest {
     }
 
     // Forks a process that loads what is asked and then receives `sig`; its wait status.
-    // `hook`, when given, watches the saves of the child; with `sendDuringSave`, this process
-    // sends that signal to the child once the hook has written to second_sent_fd.
-    int Crash(int sig, bool keysets, bool sound, SafeFile::StageHook hook = nullptr,
-              int sendDuringSave = 0) {
-        int told[2];
-        if (::pipe(told) != 0)
-            return -1;
-        second_sent_fd = told[1];
+    // `hook`, when given, watches the saves of the child.
+    int Crash(int sig, bool keysets, bool sound, SafeFile::StageHook hook = nullptr) {
         const pid_t pid = ::fork();
         if (pid == 0) {
             struct rlimit noCore = {0, 0};  // a second fault must not leave a core file
@@ -149,17 +141,9 @@ class EmergencySaveTest : public ProjectTest {
             ::raise(sig);
             ::_exit(122);
         }
-        ::close(told[1]);
         int status = -1;
-        if (pid > 0) {
-            char byte;
-            // Only a child that really was made gets a signal (kill(-1) would reach every
-            // process); the read ends when the child does, having told or not.
-            if (sendDuringSave && ::read(told[0], &byte, 1) == 1)
-                ::kill(pid, sendDuringSave);
+        if (pid > 0)
             ::waitpid(pid, &status, 0);
-        }
-        ::close(told[0]);
         return status;
     }
     std::vector<std::string> WorkFiles() const {
@@ -199,15 +183,8 @@ INSTANTIATE_TEST_SUITE_P(Signals, EmergencySave,
 // signal: no second save starts, and the file being written is absent, not half-written.
 void SecondSignalDuringSave(SafeFile::Stage stage) {
     static int files = 0;
-    if (stage != SafeFile::Stage::Written || ++files != second.file)
-        return;
-    if (!second.fromOutside) {
-        ::raise(second.signal);
-        return;  // survived: the save goes on, and the test says so
-    }
-    (void)!::write(second_sent_fd, "w", 1);
-    for (;;)
-        ::pause();  // a slow save
+    if (stage == SafeFile::Stage::Written && ++files == second.file)
+        ::raise(second.signal);  // if survived, the save goes on, and the test says so
 }
 
 class EmergencySaveInterrupted : public EmergencySaveTest,
@@ -215,8 +192,7 @@ class EmergencySaveInterrupted : public EmergencySaveTest,
 
 TEST_P(EmergencySaveInterrupted, EndsAtOnceLeavingCompleteFilesOnly) {
     second = GetParam();
-    const int status =
-        Crash(SIGTERM, true, true, SecondSignalDuringSave, second.fromOutside ? second.signal : 0);
+    const int status = Crash(SIGTERM, true, true, SecondSignalDuringSave);
     EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == second.signal)
         << (WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status)) : "signal");
     EXPECT_EQ(ReadFile(dir / "child.err"), "EMERGENCY SAVE ON SIGNAL 15 ... ")
@@ -231,15 +207,13 @@ TEST_P(EmergencySaveInterrupted, EndsAtOnceLeavingCompleteFilesOnly) {
     }
 }
 
+// A fault, and signals of the save's own kind and another, arriving while a file is written.
 INSTANTIATE_TEST_SUITE_P(Signals, EmergencySaveInterrupted,
-                         ::testing::Values(SecondSignal{SIGSEGV, 1, false},
-                                           SecondSignal{SIGTERM, 1, true},
-                                           SecondSignal{SIGUSR1, 2, true}),
+                         ::testing::Values(SecondSignal{SIGSEGV, 1}, SecondSignal{SIGTERM, 1},
+                                           SecondSignal{SIGUSR1, 2}),
                          [](const auto& info) {
-                             const SecondSignal& p = info.param;
-                             return std::string(sigabbrev_np(p.signal)) +
-                                    (p.file == 1 ? "_InKeyset" : "_InTrack") +
-                                    (p.fromOutside ? "_Sent" : "_Raised");
+                             return std::string(sigabbrev_np(info.param.signal)) +
+                                    (info.param.file == 1 ? "_InKeyset" : "_InTrack");
                          });
 
 TEST_F(EmergencySave, WithoutKeysetsNothingIsSavedWithoutASoundNoTrack) {
