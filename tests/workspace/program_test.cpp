@@ -19,8 +19,6 @@ using namespace wstest;
 
 namespace {
 
-const std::string kBanner =
-    "Tessel|Marlin Parlando and Facial Animation Version 2.0 (9704300208)\n";
 const std::regex kLogHeader(
     "---------- Chirrup Error Log ---------- "
     "[A-Z][a-z]{2} [A-Z][a-z]{2} [ 0-9]\\d \\d\\d:\\d\\d:\\d\\d \\d{4}\n\n");
@@ -38,15 +36,6 @@ class ProgramTest : public BatchTest {
     }
     std::string Log() const { return ReadFile(dir / "errlog.vx"); }
 };
-
-TEST_F(ProgramTest, InformationAndHelpPrintBannerAndUsage) {
-    const RunResult info = Run({"-i", "-h"});
-    EXPECT_EQ(info.status, 0);
-    EXPECT_EQ(info.err, kBanner) << "-i ends the program before -h is seen";
-    EXPECT_EQ(info.out, "");
-    EXPECT_FALSE(FileExists(dir / "errlog.vx")) << "the log is named after the options";
-    EXPECT_THAT(Run({"-v", "-h", "file"}).err, StartsWith(kBanner + " usage: chirrup [-e STRING]"));
-}
 
 TEST_F(ProgramTest, MissingArgumentsAreToldExactlyAndEndWithTheirStatus) {
     // A short -B ends the program (the parser tests tell the other missing arguments).
