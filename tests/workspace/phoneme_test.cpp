@@ -253,45 +253,29 @@ TEST(PhoneTimeline, StepsTakeTheSegmentCoveringMostOfThemAndSpeechStandsOut) {
 // The rules that rewrite the step targets (9 is silence): quiet steps become silence, loud
 // silence takes the nearest phone, short runs join a neighbour.
 TEST(PhoneTimeline, StepRules) {
-    using Levels = std::vector<double>;
-    using Rule = std::function<void(std::vector<int>&)>;
-    const auto quiet = [](Levels levels) {
-        return [levels](std::vector<int>& t) {
-            PhoneTimeline::SilenceQuietSteps(t, levels, -60.0, 9);
-        };
+    std::vector<int> quiet = {1, 2, 3, 4};
+    PhoneTimeline::SilenceQuietSteps(quiet, {-20, -70, -60, -180}, -60.0, 9);
+    EXPECT_THAT(quiet, ElementsAre(1, 9, 3, 9));
+    const auto filled = [](std::vector<int> t, const std::vector<double>& levels, long reach) {
+        PhoneTimeline::FillLoudSilence(t, levels, -30.0, reach, 9);
+        return t;
     };
-    const auto fill = [](Levels levels, long reach) {
-        return [levels, reach](std::vector<int>& t) {
-            PhoneTimeline::FillLoudSilence(t, levels, -30.0, reach, 9);
-        };
+    // Quiet silence stays; loud silence takes the nearer phone, the earlier on a tie.
+    EXPECT_THAT(filled({1, 9, 9, 9, 2}, {-20, -50, -20, -20, -20}, 5), ElementsAre(1, 9, 1, 2, 2));
+    // Filled steps do not spread further: only phones the decoder heard count.
+    EXPECT_THAT(filled({1, 9, 9, 9, 9, 9, 9}, std::vector<double>(7, -20), 2),
+                ElementsAre(1, 1, 1, 9, 9, 9, 9));
+    // Fewer levels than steps: the steps without one are left alone.
+    EXPECT_THAT(filled({1, 9, 9}, {-20, -20}, 5), ElementsAre(1, 1, 9));
+    const auto absorbed = [](std::vector<int> t, int minimum) {
+        PhoneTimeline::AbsorbShortRuns(t, minimum);
+        return t;
     };
-    const auto absorb = [](int minimum) {
-        return [minimum](std::vector<int>& t) { PhoneTimeline::AbsorbShortRuns(t, minimum); };
-    };
-    const struct {
-        std::vector<int> in;
-        Rule rule;
-        std::vector<int> out;
-    } rows[] = {
-        {{1, 2, 3, 4}, quiet({-20, -70, -60, -180}), {1, 9, 3, 9}},
-        // Quiet silence stays; loud silence takes the nearer phone, the earlier on a tie.
-        {{1, 9, 9, 9, 2}, fill({-20, -50, -20, -20, -20}, 5), {1, 9, 1, 2, 2}},
-        // Filled steps do not spread further: only phones the decoder heard count.
-        {{1, 9, 9, 9, 9, 9, 9}, fill(Levels(7, -20), 2), {1, 1, 1, 9, 9, 9, 9}},
-        // Fewer levels than steps: the steps without one are left alone.
-        {{1, 9, 9}, fill({-20, -20}, 5), {1, 1, 9}},
-        // The longer neighbour wins, the earlier one on a tie.
-        {{1, 1, 2, 3, 3, 3}, absorb(2), {1, 1, 3, 3, 3, 3}},
-        // Short runs at the ends join their only neighbour.
-        {{2, 1, 1, 1, 3}, absorb(2), {1, 1, 1, 1, 1}},
-        // One-step runs go first, then two-step ones.
-        {{1, 1, 1, 2, 2, 3, 3, 3}, absorb(3), {1, 1, 1, 1, 1, 3, 3, 3}},
-    };
-    for (const auto& row : rows) {
-        std::vector<int> targets = row.in;
-        row.rule(targets);
-        EXPECT_EQ(targets, row.out) << "row " << &row - rows;
-    }
+    // The longer neighbour wins, the earlier one on a tie; runs at the ends join their only
+    // neighbour; one-step runs go first, then two-step ones.
+    EXPECT_THAT(absorbed({1, 1, 2, 3, 3, 3}, 2), ElementsAre(1, 1, 3, 3, 3, 3));
+    EXPECT_THAT(absorbed({2, 1, 1, 1, 3}, 2), ElementsAre(1, 1, 1, 1, 1));
+    EXPECT_THAT(absorbed({1, 1, 1, 2, 2, 3, 3, 3}, 3), ElementsAre(1, 1, 1, 1, 1, 3, 3, 3));
 }
 
 std::vector<int16_t> tone(long samples, int16_t level) {
