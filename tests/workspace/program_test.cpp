@@ -364,25 +364,19 @@ TEST(CommandLineTest, OptionsRunUpToTheInfileAndLaterOnesAreNotOptions) {
 // The frame rate: the environment's, then every -fps in order; negative rates are ignored and
 // text or a missing number asks for the default rate (0).
 TEST(CommandLineTest, FrameRateFromTheEnvironmentThenTheCommandLine) {
-    struct Row {
-        std::vector<const char*> args;
-        const char* env;  // VX_FPS, or null
-        std::optional<int> fps;
+    const auto fps = [](std::vector<const char*> args, const char* env) {  // env: VX_FPS
+        return ParseLine(std::move(args),
+                         env ? decltype(environment){{"VX_FPS", env}} : decltype(environment){})
+            .line.fps;
     };
-    for (const Row& row : std::vector<Row>{{{}, nullptr, std::nullopt},
-                                           {{}, "25", 25},
-                                           {{}, "-4", std::nullopt},
-                                           {{}, "many", 0},
-                                           {{"-fps", "24"}, "25", 24},
-                                           {{"-fps", "-3"}, "25", 25},
-                                           {{"-fps", "60", "-fps", "15"}, nullptr, 15},
-                                           {{"-fps"}, "25", 0}}) {
-        std::map<std::string, std::string> env;
-        if (row.env)
-            env["VX_FPS"] = row.env;
-        EXPECT_EQ(ParseLine(row.args, env).line.fps, row.fps)
-            << (row.args.empty() ? "" : row.args.back()) << " with " << (row.env ? row.env : "-");
-    }
+    EXPECT_EQ(fps({}, nullptr), std::nullopt);
+    EXPECT_EQ(fps({}, "25"), 25);
+    EXPECT_EQ(fps({}, "-4"), std::nullopt);
+    EXPECT_EQ(fps({}, "many"), 0);
+    EXPECT_EQ(fps({"-fps", "24"}, "25"), 24);
+    EXPECT_EQ(fps({"-fps", "-3"}, "25"), 25);
+    EXPECT_EQ(fps({"-fps", "60", "-fps", "15"}, nullptr), 15);
+    EXPECT_EQ(fps({"-fps"}, "25"), 0);
     const Parsed quiet = ParseLine({}, {{"VX_VERBOSE", ""}, {"VX_AUDIO", "1"}});
     EXPECT_TRUE(quiet.line.verbose && quiet.line.beep) << "set, even empty, counts";
 }
