@@ -58,22 +58,19 @@ TEST_F(KeysetTest, LoadFailuresAreToldAndLeaveTheWorkspaceAsDefined) {
     const std::string path = dir / "misc_data/bad.kset";
     WriteFile(dir / "wire/text.gltf", "this is not a scene\n");
     const char* const noWire = "Could not read wire file, cannot load keyset";
-    struct Row {
-        const char* description;  // null: no such file; "": a directory of that name
-        std::string message;
-    };
-    for (const Row& row : {Row{nullptr, Fill("Failed to open keyset file [%M/bad.kset].")},
-                           Row{kMouth, noWire}, Row{"wire text.gltf 3\n", noWire}}) {
+    // The description written, null: no such file.
+    for (const auto& [description, message] : std::vector<std::pair<const char*, std::string>>{
+             {nullptr, Fill("Failed to open keyset file [%M/bad.kset].")},
+             {kMouth, noWire},
+             {"wire text.gltf 3\n", noWire}}) {
         ASSERT_EQ(theImp.LoadKeyset(Describe(kMouth, "good.kset").c_str()), 1);
         std::filesystem::remove(path);
-        if (row.description && *row.description)
-            WriteFile(path, row.description);
-        else if (row.description)
-            std::filesystem::create_directory(path);
+        if (description)
+            WriteFile(path, description);
         ghost.calls.clear();
         EXPECT_EQ(StdErr([&] { EXPECT_EQ(theImp.LoadKeyset(path.c_str()), 0); }), "");
-        EXPECT_THAT(ghost.Calls("Inform"), ElementsAre("Inform(" + row.message + "|Dismiss)"));
-        EXPECT_EQ(theImp.keysetCount, row.description && *row.description ? 0 : 1);
+        EXPECT_THAT(ghost.Calls("Inform"), ElementsAre("Inform(" + message + "|Dismiss)"));
+        EXPECT_EQ(theImp.keysetCount, description ? 0 : 1);
     }
 }
 

@@ -79,41 +79,34 @@ class ReferenceTest : public ::testing::Test {
     GhostScope scope{&ghost};
 };
 
+// Each case in a directory of its own: the frames made, the name given to LoadReference, and
+// the prefix, extension and run the dialog shows, loaded as they are.
 TEST_F(ReferenceTest, NameFormsFindTheRunAndNameItsParts) {
-    struct Row {
-        const char* format;  // the frames made: one run, and another if `more`
-        int first, last;
-        const char* more;
-        int moreFirst, moreLast;
-        const char* given;  // the name given to LoadReference
-        const char* prefix;
-        const char* ext;
-        int start, end;
-    };
-    const Row rows[] = {
-        {"take.%04d.png", 10, 13, "take.%d.png", 14, 16, "take.0010.png", "take", "png", 10, 13},
-        {"take.%d", 10, 12, nullptr, 0, 0, "take.10", "take", "", 10, 12},
-        {"take.%03d.png", 7, 8, nullptr, 0, 0, "take.002.png", "take", "png", 7, 8},  // up
-        {"face.%d.sgi", 0, 2, nullptr, 0, 0, "face.sgi", "face", "sgi", 0, 2},        // no number
-        {"take.%02d.png", 5, 7, "take.%02d.png", 9, 9, "take.05.png", "take", "png", 5, 7},
-        {"shot.2/face.%d", 0, 1, nullptr, 0, 0, "shot.2/face", "shot.2/face", "", 0, 1},
-    };
-    for (const Row& r : rows) {
-        SCOPED_TRACE(r.given);
-        const std::string sub = "r" + std::to_string(&r - rows) + "/";  // a directory each
-        frames((sub + r.format).c_str(), r.first, r.last);
-        if (r.more)
-            frames((sub + r.more).c_str(), r.moreFirst, r.moreLast);
-        ASSERT_EQ(theImp.LoadReference(path(sub + r.given).c_str()), 1);
-        EXPECT_THAT(ghost.shown, ElementsAre(path(sub + r.prefix), r.ext));
-        EXPECT_THAT(ghost.shownRange, ElementsAre(r.start, r.end, 1, 2));
+    const auto finds = [this](const std::string& given, const std::string& prefix, const char* ext,
+                              int start, int end) {
+        SCOPED_TRACE(given);
+        ASSERT_EQ(theImp.LoadReference(path(given).c_str()), 1);
+        EXPECT_THAT(ghost.shown, ElementsAre(path(prefix), ext));
+        EXPECT_THAT(ghost.shownRange, ElementsAre(start, end, 1, 2));
         ASSERT_EQ(theImp.referenceLoaded, 1);
         std::vector<int> expected;
-        for (int n = r.start; n <= r.end; ++n)
+        for (int n = start; n <= end; ++n)
             expected.push_back(n);
         EXPECT_EQ(reference_greys(), expected);
-        EXPECT_EQ(theImp.referenceOffset, CueTime::FromFrames(r.start));
-    }
+        EXPECT_EQ(theImp.referenceOffset, CueTime::FromFrames(start));
+    };
+    frames("a/take.%04d.png", 10, 13), frames("a/take.%d.png", 14, 16);  // padding changes
+    finds("a/take.0010.png", "a/take", "png", 10, 13);
+    frames("b/take.%d", 10, 12);
+    finds("b/take.10", "b/take", "", 10, 12);
+    frames("c/take.%03d.png", 7, 8);  // the search goes up from the number given
+    finds("c/take.002.png", "c/take", "png", 7, 8);
+    frames("d/face.%d.sgi", 0, 2);  // no number given
+    finds("d/face.sgi", "d/face", "sgi", 0, 2);
+    frames("e/take.%02d.png", 5, 7), frames("e/take.%02d.png", 9, 9);  // a gap
+    finds("e/take.05.png", "e/take", "png", 5, 7);
+    frames("f/shot.2/face.%d", 0, 1);
+    finds("f/shot.2/face", "f/shot.2/face", "", 0, 1);
 }
 
 TEST_F(ReferenceTest, TheDialogMayChooseTheRangeOrRename) {
