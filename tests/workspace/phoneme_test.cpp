@@ -198,33 +198,28 @@ std::vector<float> noise(size_t count, float level) {
 // Sounds that are not speech, or not as the model expects it: one result per step, and the
 // phones that are there in order (none for noise or nothing: no phone to place a key from).
 TEST_F(PhonemePlugin, OddSoundsGiveOneResultPerStepAndFindWhatIsThere) {
-    const std::vector<float>& mono = dialogue_->Channel(0);
-    const double rate = dialogue_->Rate();
-    const struct {
-        const char* name;
-        std::unique_ptr<CueSound> sound;
-        std::vector<std::string> phones;
-    } rows[] = {{"white noise", CueSound::FromSamples({noise(44100, 0.5f)}, 22050), {}},
-                {"no samples", CueSound::FromSamples({std::vector<float>()}, 16000), {}},
-                // Telephone bandwidth loses the hiss of the fricatives, not the words' vowels.
-                {"8 kHz",
-                 CueSound::FromSamples({dialogue_->Resampled(8000)}, 8000),
-                 {"L", "OW", "SIL", "M", "UW", "SIL"}},
-                {"stereo, one side silent",
-                 CueSound::FromSamples({mono, std::vector<float>(mono.size(), 0.0f)}, rate),
-                 kDialoguePhones}};
-    for (const auto& row : rows) {
-        SCOPED_TRACE(row.name);
-        ASSERT_TRUE(row.sound && row.sound->Valid());
-        ASSERT_TRUE(r->GuardedRecognize(*row.sound)) << reports.text;
-        EXPECT_EQ(long(r->results.size()), frames_of(*row.sound));
+    const auto finds = [this](const char* name, std::unique_ptr<CueSound> sound,
+                              const std::vector<std::string>& wanted) {
+        SCOPED_TRACE(name);
+        ASSERT_TRUE(sound && sound->Valid());
+        ASSERT_TRUE(r->GuardedRecognize(*sound)) << reports.text;
+        EXPECT_EQ(long(r->results.size()), frames_of(*sound));
         const std::vector<std::string> heard = phones(*r);
-        if (row.phones.empty())
+        if (wanted.empty())
             EXPECT_THAT(heard, ::testing::AnyOf(IsEmpty(), ElementsAre("SIL")));
         else
-            EXPECT_TRUE(in_order(heard, row.phones)) << ::testing::PrintToString(heard);
+            EXPECT_TRUE(in_order(heard, wanted)) << ::testing::PrintToString(heard);
         EXPECT_THAT(reports.text, IsEmpty());
-    }
+    };
+    finds("white noise", CueSound::FromSamples({noise(44100, 0.5f)}, 22050), {});
+    finds("no samples", CueSound::FromSamples({std::vector<float>()}, 16000), {});
+    // Telephone bandwidth loses the hiss of the fricatives, not the words' vowels.
+    finds("8 kHz", CueSound::FromSamples({dialogue_->Resampled(8000)}, 8000),
+          {"L", "OW", "SIL", "M", "UW", "SIL"});
+    const std::vector<float>& mono = dialogue_->Channel(0);
+    finds("stereo, one side silent",
+          CueSound::FromSamples({mono, std::vector<float>(mono.size(), 0.0f)}, dialogue_->Rate()),
+          kDialoguePhones);
 }
 
 // The pure parts.
