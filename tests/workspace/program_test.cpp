@@ -184,25 +184,6 @@ TEST_F(ProgramTest, AMissingOrUnwritableApplyFileIsTold) {
         << "a message after the storing line";
 }
 
-// Without a project, a name with a directory is taken as it stands, a plain one from the
-// working directory.
-TEST_F(ProgramTest, NamesAreTakenAsTheyStandOrFromTheWorkingDirectory) {
-    TempDir elsewhere;
-    WriteFile(elsewhere / "t.track", kBatchTrack);
-    const std::string out = elsewhere / "o.glb";
-    for (const char* f : {"misc_data/x.kset", "wire/face.gltf"})
-        std::filesystem::copy_file(dir / f,
-                                   dir / ("work/" + std::filesystem::path(f).filename().string()));
-    const RunResult r = RunChirrup(
-        {"-B", elsewhere / "t.track", "face.gltf", "VX_ROOT", "0", out, "x.kset"}, dir / "work");
-    EXPECT_EQ(r.err, "Batch mode.\n  Reading keyset x.kset\n  Reading track " +
-                         (elsewhere / "t.track") +
-                         "\n  Reading apply file face.gltf\n  Applying to dag VX_ROOT with offset "
-                         "0\nApplying mouth\nApplying turn\n  Storing to " +
-                         out + "\n");
-    EXPECT_NEAR(*EvalChannel(out, "jaw", 1, 30), 1.0, 1e-4) << "event 30 wide 0.5, offset 0";
-}
-
 // --- batch runs on damaged or unusual inputs: each ends with status 0 and a line on the error
 // stream saying what was refused, or with a valid scene, and never costs memory or disk out of
 // proportion to what it applies. No offset unless told otherwise.
