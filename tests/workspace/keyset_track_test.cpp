@@ -1,5 +1,5 @@
-// Keyset description files and track files: loading with every message, recognizer blocks,
-// verification, the project check, saving back byte for byte, the sound and the duration.
+// Keyset description files and track files: loading with its messages, recognizer blocks,
+// verification, saving back byte for byte, the sound and the duration.
 #include <gtest/gtest.h>
 
 #include <cmath>

@@ -1,6 +1,5 @@
 // Recognizer settings blocks, the plug-in catalogue with real shared objects, the shipped
-// Loudness plug-in, settings files read by the workspace, and recognizers in keyset files and
-// batch runs.
+// Loudness plug-in, settings files read by the workspace, and plug-ins found by batch runs.
 #include <gtest/gtest.h>
 
 #include <filesystem>
