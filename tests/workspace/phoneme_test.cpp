@@ -178,8 +178,10 @@ TEST_F(PhonemePlugin, RefusesWhatItCannotAnalyseAndTellsAMissingModel) {
         WriteFile(dir / f, "not a model\n");
     reports.text.clear();
     EXPECT_FALSE(r->GuardedRecognize(*dialogue_));
-    EXPECT_THAT(reports.text, HasSubstr("could not start its speech decoder with the model in [" +
-                                        dir.path() + "]."));
+    EXPECT_THAT(
+        reports.text,
+        HasSubstr("Recognizer [Phoneme] could not start its speech decoder with the model in [" +
+                  dir.path() + "]."));
     ASSERT_TRUE(r->GuardedResetSettings());
     r->step = CueTime();
     EXPECT_FALSE(r->GuardedRecognize(*dialogue_));
