@@ -1,13 +1,12 @@
-// The chirrup program run as a program: command line, environment, error log location and
-// batch runs end to end (progress lines, every early end, the stored scene value by value,
-// damaged or unusual inputs); and its command-line parser on its own.
+// The chirrup program run as a program: command line, environment and batch runs end to end
+// (progress lines, every early end, the stored scene value by value, damaged or unusual
+// inputs); and its command-line parser on its own.
 #include <gtest/gtest.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
 
 #include <filesystem>
 #include <map>
-#include <regex>
 #include <sstream>
 #include <tuple>
 
@@ -18,10 +17,6 @@
 using namespace wstest;
 
 namespace {
-
-const std::regex kLogHeader(
-    "---------- Chirrup Error Log ---------- "
-    "[A-Z][a-z]{2} [A-Z][a-z]{2} [ 0-9]\\d \\d\\d:\\d\\d:\\d\\d \\d{4}\n\n");
 
 const char* const kApplied = "Applying mouth\nApplying turn\n  Storing to %W/out.gltf\n";
 
@@ -69,20 +64,6 @@ TEST_F(ProgramTest, FrameRateFromOptionOrEnvironmentDecidesWhereTheKeysLand) {
         EXPECT_NEAR(EvalChannel(Out(), "jaw", 1, keyFrame).value_or(-1), wide, 1e-4);
         EXPECT_NEAR(EvalChannel(Out(), "jaw", 1, keyFrame / 2).value_or(-1), wide / 2, 1e-3);
     }
-}
-
-TEST_F(ProgramTest, TheLogGoesToTheOptionTheProjectOrTheWorkingDirectory) {
-    const std::vector<std::string> args{"-B", "t", "a", "d", "0", "o"};
-    WriteFile(dir / "work/errlog.vx", "old text that must go\n");
-    ASSERT_EQ(RunChirrup(args, dir / "work").status, 0);
-    EXPECT_TRUE(std::regex_match(ReadFile(dir / "work/errlog.vx"), kLogHeader))
-        << ReadFile(dir / "work/errlog.vx");
-    ASSERT_EQ(Run(args).status, 0);
-    EXPECT_TRUE(std::regex_match(Log(), kLogHeader));
-    std::filesystem::remove(dir / "errlog.vx");
-    ASSERT_EQ(Run({"-e", "my.log", "-B", "t", "a", "d", "0", "o"}).status, 0);
-    EXPECT_TRUE(std::regex_match(ReadFile(dir / "work/my.log"), kLogHeader));
-    EXPECT_FALSE(FileExists(dir / "errlog.vx"));
 }
 
 TEST_F(ProgramTest, BatchAppliesEveryKeysetAndStoresTheScene) {
