@@ -116,9 +116,6 @@ class GhostScope {
     Ghost* saved_;
 };
 
-// Empties theImp: no keysets, sound, log or apply event; 30 frames per second; interactive.
-void ResetWorkspace();
-
 // A recognizer compiled into the tests: targets "a" and "e" and a setting "gain".
 class VowelRecognizer : public CueRecognizer {
   public:
@@ -143,17 +140,11 @@ std::string SettingsText(const CueRecognizer& r);
 bool ReadSettingsText(CueRecognizer& r, const std::string& text);
 
 // Collects the toolkit's reports at or above `level` while installed.
-class Reports : public KLErrHandler {
-  public:
-    explicit Reports(int level = KLErr::kWarning) : level_(level) {}
-    void Handle(KLErr* e) override {
-        if (e->Level() >= level_)
-            text += e->Message();
-    }
+struct Reports : KLErrHandler {
+    explicit Reports(int level = KLErr::kWarning) : level(level) {}
+    void Handle(KLErr* e) override { text += e->Level() >= level ? e->Message() : ""; }
     std::string text;
-
-  private:
-    int level_;
+    int level;
 };
 
 inline const char* const kMouth =
@@ -164,7 +155,7 @@ inline const char* const kMouth =
 class ProjectTest : public ::testing::Test {
   protected:
     void SetUp() override;
-    void TearDown() override { ResetWorkspace(); }
+    void TearDown() override;  // empties the workspace again
     std::string Data(const std::string& name, const std::string& text) const;  // its path
     // `text` with %W, %M and %D replaced by the wire, data and project directories.
     std::string Fill(std::string text) const;
@@ -197,7 +188,7 @@ class BatchTest : public ProjectTest {
     RunResult Run(std::vector<std::string> args, std::vector<EnvChange> env = {});
     // "-B x.track APPLY DAG OFFSET out.gltf x.kset"; the scene is stored as Out().
     RunResult Batch(const std::string& dag = "VX_ROOT", const std::string& apply = "face.gltf",
-                    const std::string& offset = "12", std::vector<EnvChange> env = {});
+                    const std::string& offset = "12");
     std::string Out() const { return dir / "wire/out.gltf"; }
 };
 

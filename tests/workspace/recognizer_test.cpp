@@ -1,6 +1,5 @@
 // Recognizer settings blocks, the plug-in catalogue with real shared objects, the shipped
-// Loudness plug-in, settings files read by the workspace, and recognizers in keyset files and
-// batch runs.
+// Loudness plug-in, settings files read by the workspace, and plug-ins found by batch runs.
 #include <gtest/gtest.h>
 
 #include <filesystem>
@@ -8,7 +7,6 @@
 #include <sstream>
 
 #include "WorkspaceTestUtil.h"
-#include "model/KLKeySet.h"
 #include "toolkit/CuePrefs.h"
 #include "toolkit/CueRecognizerCatalog.h"
 #include "toolkit/CueSound.h"
@@ -104,16 +102,6 @@ TEST_F(PluginCatalog, RefusesAndReportsFilesThatAreNotPluginsOfThisInterface) {
     EXPECT_FALSE(catalog.LoadPlugin((dir / "missing.so").c_str()));
 }
 
-TEST_F(PluginCatalog, FirstRecognizerOfANameWins) {
-    catalog.Register(std::make_unique<VowelRecognizer>());
-    EXPECT_EQ(catalog.ScanDirectory((kGoodPlugins + ":" + kGoodPlugins).c_str()), 1);
-    catalog.Register(std::make_unique<VowelRecognizer>());
-    EXPECT_EQ(catalog.Count(), 2);
-    ASSERT_STREQ(catalog.HeadKey(), "Vowel");
-    EXPECT_STREQ(catalog.NextKey("Vowel"), "Level");
-    EXPECT_EQ(catalog.NextKey("Level"), nullptr);
-}
-
 // The plug-in's own settings, its recognition, and that its exceptions never leave a call.
 TEST_F(PluginCatalog, PluginSettingsAndRecognitionWorkAndItsExceptionsStayInside) {
     ASSERT_EQ(catalog.ScanDirectory(kGoodPlugins.c_str()), 1);
@@ -175,27 +163,20 @@ TEST_F(PluginCatalog, LoudnessMapsRmsLevelToClosedHalfOpen) {
     EXPECT_EQ(r->results.size(), 4u) << "the last short step gets a result";
 }
 
-class SettingsFile : public PluginCatalog {
-  protected:
-    std::string write(const std::string& text) {
-        WriteFile(dir / "Vowel.config", text);
-        return dir / "Vowel.config";
-    }
+// Configuring resets the settings (not the links) and reads only the recognizer's own block.
+TEST_F(PluginCatalog, SettingsFileGivesOnlyItsOwnBlockAfterAReset) {
     RecordingGhost ghost;
     GhostScope scope{&ghost};
     VowelRecognizer r;
-};
-
-// Configuring resets the settings (not the links) and reads only the recognizer's own block.
-TEST_F(SettingsFile, ReadsOnlyItsOwnBlockAfterAReset) {
+    const std::string file = dir / "Vowel.config";
     r.step = CueTime::FromFrames(9);
     r.gain = 5.0f;
     r.FindTarget("a")->keyShapeIndex = 3;
     r.FindTarget("a")->pictureFile = "a.sgi";
-    const std::string file = write(
-        "gain 11\nbegin recognizer Other\n    gain 12\nend\n"
-        "begin recognizer Vowel extra\n    gain 13\nend\n"
-        "begin recognizer Vowel\n    target e picture e.sgi\n    gain 0.25\nend\ngain 14\n");
+    WriteFile(file,
+              "gain 11\nbegin recognizer Other\n    gain 12\nend\n"
+              "begin recognizer Vowel extra\n    gain 13\nend\n"
+              "begin recognizer Vowel\n    target e picture e.sgi\n    gain 0.25\nend\ngain 14\n");
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, file.c_str()), 1);
     EXPECT_EQ(r.gain, 0.25f);
     EXPECT_EQ(r.step, r.defaultStep);
@@ -205,7 +186,8 @@ TEST_F(SettingsFile, ReadsOnlyItsOwnBlockAfterAReset) {
     EXPECT_THAT(ghost.calls, ElementsAre("ShowRecognizerGui()"));
 
     r.gain = 5.0f;
-    EXPECT_EQ(theImp.ConfigureRecognizer(&r, write("begin recognizer Other\nend\n").c_str()), 1);
+    WriteFile(file, "begin recognizer Other\nend\n");
+    EXPECT_EQ(theImp.ConfigureRecognizer(&r, file.c_str()), 1);
     EXPECT_EQ(r.gain, 5.0f) << "without its block the settings stay";
 
     ghost.calls.clear();
@@ -213,35 +195,11 @@ TEST_F(SettingsFile, ReadsOnlyItsOwnBlockAfterAReset) {
     EXPECT_EQ(theImp.ConfigureRecognizer(&r, nullptr), 0);
     EXPECT_EQ(theImp.ConfigureRecognizer(nullptr, file.c_str()), 0);
     EXPECT_THAT(ghost.calls, IsEmpty()) << "an unreadable file is refused silently";
-}
 
-// A keyset file's block of a plug-in recognizer and its links, read and written back.
-TEST_F(SettingsFile, PluginSettingsAndLinksComeFromKeysetFiles) {
-    ScopedEnv project("TESSEL_PROJECT", dir.path().c_str());
-    ScopedEnv misc("TESSEL_MISC_DIR", nullptr);
-    ResetWorkspace();
-    theImp.recognizers.ScanDirectory(kGoodPlugins.c_str());
-    std::unique_ptr<CueRecognizer> level(theImp.recognizers.FetchRecognizer("Level"));
-    ASSERT_TRUE(level);
-    EXPECT_EQ(level->ConfigFileName(), dir / "misc_data/Level.config");
-    {
-        ScopedEnv none("TESSEL_PROJECT", nullptr);
-        EXPECT_EQ(level->ConfigFileName(), "./Level.config");
-    }
-    const std::string blocks =
-        "begin recognizer Level mouth\n    step 6\n    target silent\n    target quiet\n"
-        "    target loud\n    threshold 0.2 0.7\nend\n\n"
-        "begin recognizer-links Level mouth\n    link silent to rest\n    link loud to wide\nend\n";
-    WriteFile(dir / "face.gltf", FaceSceneJson());
-    WriteFile(dir / "face.keyset", "wire " + (dir / "face.gltf") + " 0\n" + kMouth + blocks);
-    ASSERT_EQ(theImp.LoadKeyset((dir / "face.keyset").c_str()), 1);
-    KLKeySet* mouth = theImp.GetKeySet("mouth");
-    CueRecognizer* r = mouth ? mouth->GetRecognizer("Level") : nullptr;
-    ASSERT_TRUE(r && mouth->recognizers.size() == 1u);
-    EXPECT_EQ(r->FindTarget("loud")->keyShapeIndex, 2);
-    ASSERT_EQ(theImp.SaveKeyset((dir / "saved.keyset").c_str()), 1);
-    EXPECT_THAT(ReadFile(dir / "saved.keyset"), HasSubstr(blocks));
-    ResetWorkspace();
+    ScopedEnv project("TESSEL_PROJECT", dir.path().c_str()), misc("TESSEL_MISC_DIR", nullptr);
+    EXPECT_EQ(r.ConfigFileName(), dir / "misc_data/Vowel.config");
+    ScopedEnv none("TESSEL_PROJECT", nullptr);
+    EXPECT_EQ(r.ConfigFileName(), "./Vowel.config");
 }
 
 // The program exports its symbols to plug-ins and scans the catalogue when a keyset file

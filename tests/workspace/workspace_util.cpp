@@ -105,7 +105,8 @@ bool ReadSettingsText(CueRecognizer& r, const std::string& text) {
     return r.GuardedReadSettings(in);
 }
 
-void ResetWorkspace() {
+// Empties theImp: no keysets, sound, log or apply event; 30 frames per second; interactive.
+static void ResetWorkspace() {
     theImp.batchMode = 0;
     theImp.clear_keyset_data();
     theImp.sound.reset();
@@ -119,6 +120,10 @@ void ResetWorkspace() {
     theImp.loadGeometry = theImp.geometryActive = 1;
     theImp.keysetModified = theImp.trackModified = 0;
     theImp.wireFrame = 0.0f;
+}
+
+void ProjectTest::TearDown() {
+    ResetWorkspace();
 }
 
 void ProjectTest::SetUp() {
@@ -165,8 +170,8 @@ RunResult BatchTest::Run(std::vector<std::string> args, std::vector<EnvChange> e
 }
 
 RunResult BatchTest::Batch(const std::string& dag, const std::string& apply,
-                           const std::string& offset, std::vector<EnvChange> env) {
-    return Run({"-B", "x.track", apply, dag, offset, "out.gltf", "x.kset"}, std::move(env));
+                           const std::string& offset) {
+    return Run({"-B", "x.track", apply, dag, offset, "out.gltf", "x.kset"});
 }
 
 std::string FaceSceneJson() {
