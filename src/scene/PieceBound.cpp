@@ -23,14 +23,13 @@ void PieceBound::Add(double p0, double p1, double m0, double m1) {
 }
 
 int PieceBound::Parts(double t0, double t1, double allowedRadians, bool oneAxis) const {
-    const double dt = t1 - t0;
     // The knots' times are floats: a piece may sit up to half a float step off at either end,
     // moving what a player reads by the turning speed times that (and its tangents a little).
     const double drift =
-        std::max(std::fabs(t0), std::fabs(t1)) * kHalfFloatStep * 2.6 * first_ / dt;
-    for (int parts = 1; parts <= kMaxParts; ++parts) {
-        const double A = first_ / parts, B = second_ / (parts * parts),
-                     C = third_ / (parts * parts * parts);
+        std::max(std::fabs(t0), std::fabs(t1)) * kHalfFloatStep * 2.6 * first_ / (t1 - t0);
+    double by = 1;  // 1 / parts, multiplied rather than divided: most pieces need one part
+    for (int parts = 1; parts <= kMaxParts; by = 1.0 / ++parts) {
+        const double A = first_ * by, B = second_ * by * by, C = third_ * by * by * by;
         const double fourth = A * A * A * A + 6 * A * A * B + 3 * B * B + 4 * A * C;
         // How far the piece strays from the rotation (as 4-vectors), and the part of that
         // which turns it: for one axis, z = exp(i h) has z'''' = (h'^4 - 3h''^2 - 4h'h''' -
