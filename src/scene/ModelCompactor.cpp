@@ -113,12 +113,10 @@ void ModelCompactor::RemoveUnusedAccessors(const std::set<int>& candidates) {
         return;
     }
     std::vector<int> viewMap(m_.bufferViews.size());
-    std::set<int> shrunk;
     std::vector<tinygltf::BufferView> views;
     for (size_t i = 0; i < m_.bufferViews.size(); ++i) {
         if (freedViews.count(int(i))) {
             viewMap[i] = -1;
-            shrunk.insert(m_.bufferViews[i].buffer);
         } else {
             viewMap[i] = int(views.size());
             views.push_back(std::move(m_.bufferViews[i]));
@@ -126,45 +124,71 @@ void ModelCompactor::RemoveUnusedAccessors(const std::set<int>& candidates) {
     }
     m_.bufferViews = std::move(views);
     each_view_ref(m_, [&](int& v) { v = v >= 0 ? viewMap[size_t(v)] : v; });
-    compactBuffers(shrunk);
 }
 
-void ModelCompactor::compactBuffers(const std::set<int>& buffers) {
-    for (int b : buffers) {
-        // Byte ranges still covered by a view, merged where they overlap, are moved down
-        // keeping their offset modulo 16 so that every alignment rule still holds.
-        std::vector<size_t> order;
-        for (size_t i = 0; i < m_.bufferViews.size(); ++i) {
-            if (m_.bufferViews[i].buffer == b) {
-                order.push_back(i);
-            }
+std::vector<std::vector<ModelCompactor::Span>> ModelCompactor::LiveSpans(
+    const tinygltf::Model& m, std::vector<size_t>* spanOfView, std::vector<size_t>* lengths) {
+    const std::vector<tinygltf::BufferView>& views = m.bufferViews;
+    std::vector<size_t> order;
+    order.reserve(views.size());
+    for (size_t i = 0; i < views.size(); ++i) {
+        if (views[i].buffer >= 0 && size_t(views[i].buffer) < m.buffers.size()) {
+            order.push_back(i);
         }
-        std::sort(order.begin(), order.end(), [&](size_t x, size_t y) {
-            return m_.bufferViews[x].byteOffset < m_.bufferViews[y].byteOffset;
-        });
-        std::vector<unsigned char>& bytes = m_.buffers[size_t(b)].data;
-        size_t written = 0;  // moved down in place: every range goes to or below where it was
-        size_t k = 0;
-        while (k < order.size()) {
-            size_t start = m_.bufferViews[order[k]].byteOffset;
-            size_t end = start + m_.bufferViews[order[k]].byteLength;
-            size_t j = k + 1;
-            while (j < order.size() && m_.bufferViews[order[j]].byteOffset < end) {
-                const tinygltf::BufferView& v = m_.bufferViews[order[j]];
-                end = std::max(end, size_t(v.byteOffset + v.byteLength));
-                ++j;
+    }
+    std::sort(order.begin(), order.end(), [&](size_t x, size_t y) {
+        return views[x].buffer != views[y].buffer ? views[x].buffer < views[y].buffer
+                                                  : views[x].byteOffset < views[y].byteOffset;
+    });
+    std::vector<std::vector<Span>> spans(m.buffers.size());
+    spanOfView->assign(views.size(), 0);
+    lengths->assign(m.buffers.size(), 0);
+    for (size_t k = 0; k < order.size();) {
+        const size_t b = size_t(views[order[k]].buffer);
+        size_t start = views[order[k]].byteOffset, end = start + views[order[k]].byteLength;
+        size_t j = k + 1;
+        while (j < order.size() && size_t(views[order[j]].buffer) == b &&
+               views[order[j]].byteOffset < end) {
+            end = std::max(end, size_t(views[order[j]].byteOffset + views[order[j]].byteLength));
+            ++j;
+        }
+        size_t& written = (*lengths)[b];
+        const size_t at = written + (start % 16 + 16 - written % 16) % 16;
+        for (size_t v = k; v < j; ++v) {
+            (*spanOfView)[order[v]] = spans[b].size();
+        }
+        spans[b].push_back(Span{start, at, end - start});
+        written = at + (end - start);
+        k = j;
+    }
+    return spans;
+}
+
+void ModelCompactor::CloseGaps() {
+    std::vector<size_t> spanOfView, lengths;
+    const std::vector<std::vector<Span>> spans = LiveSpans(m_, &spanOfView, &lengths);
+    for (size_t b = 0; b < m_.buffers.size(); ++b) {
+        if (spans[b].empty()) {
+            continue;  // (a buffer no view uses is left for RemoveUnusedBuffers)
+        }
+        // Every span goes to or below where it was: moved down in place, in order.
+        std::vector<unsigned char>& bytes = m_.buffers[b].data;
+        size_t written = 0;
+        for (const Span& s : spans[b]) {
+            std::fill(bytes.begin() + long(written), bytes.begin() + long(s.to), 0);
+            if (s.to != s.from) {
+                std::memmove(bytes.data() + s.to, bytes.data() + s.from, s.length);
             }
-            size_t at = written + (start % 16 + 16 - written % 16) % 16;
-            std::fill(bytes.begin() + long(written), bytes.begin() + long(at), 0);
-            std::memmove(bytes.data() + at, bytes.data() + start, end - start);
-            for (size_t v = k; v < j; ++v) {
-                m_.bufferViews[order[v]].byteOffset =
-                    m_.bufferViews[order[v]].byteOffset - start + at;
-            }
-            written = at + (end - start);
-            k = j;
+            written = s.to + s.length;
         }
         bytes.resize((written + 3) & ~size_t(3), 0);
+    }
+    for (size_t v = 0; v < m_.bufferViews.size(); ++v) {
+        tinygltf::BufferView& view = m_.bufferViews[v];
+        if (view.buffer >= 0) {
+            const Span& s = spans[size_t(view.buffer)][spanOfView[v]];
+            view.byteOffset = view.byteOffset - s.from + s.to;
+        }
     }
 }
 

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <set>
+#include <vector>
 
 #include <tiny_gltf.h>
 
@@ -17,7 +18,8 @@ class ModelCompactor {
     // renumbered and unused objects stay in place (still valid, merely unused).
     bool RenumberingSafe() const;
     // Removes those of `candidates` (accessor indices) that nothing uses any more, then the
-    // buffer views only they used, and moves the remaining bytes of their buffers together.
+    // buffer views only they used. Their bytes stay where they are, a gap in the model that
+    // the serialiser leaves out of the file (see SceneSerializer::Write).
     void RemoveUnusedAccessors(const std::set<int>& candidates);
     // Removes every buffer that no buffer view uses.
     void RemoveUnusedBuffers();
@@ -26,8 +28,23 @@ class ModelCompactor {
     // other buffer too (without, the serialiser joins them as it writes the binary chunk).
     void PackIntoFirstBuffer(bool moveBuffers);
 
+    // Bytes [from, from + length) of a buffer that buffer views cover (merged where they
+    // overlap), and `to`, where they go when the bytes no view covers are left out: as low as
+    // they can, keeping their offset modulo 16 so that every alignment rule still holds.
+    struct Span {
+        size_t from, to, length;
+    };
+    // The spans of every buffer, in order; `spanOfView` the index of each view's span in its
+    // buffer's list, `lengths` each buffer's length without the bytes left out.
+    static std::vector<std::vector<Span>> LiveSpans(const tinygltf::Model& m,
+                                                    std::vector<size_t>* spanOfView,
+                                                    std::vector<size_t>* lengths);
+
+    // Moves the bytes of every buffer that a view uses together as LiveSpans places them,
+    // leaving out what no view covers.
+    void CloseGaps();
+
   private:
-    void compactBuffers(const std::set<int>& buffers);
     void moveIntoFirst();
     // Appends bytes at a 16-byte boundary of buffer 0; returns their offset.
     size_t appendToFirst(const std::vector<unsigned char>& bytes);

@@ -8,6 +8,7 @@
 #include <sstream>
 #include <vector>
 
+#include "scene/ModelCompactor.h"
 #include "toolkit/SafeFile.h"
 
 namespace {
@@ -46,33 +47,54 @@ void put_u32(std::ostream& out, uint32_t v) {
     out.write(bytes, 4);
 }
 
-// Where each buffer starts in a binary chunk that joins them all, 16-byte aligned, and the
-// chunk's length (before its padding to 4 bytes).
-std::vector<size_t> join_bases(const tinygltf::Model& model, size_t* length) {
-    std::vector<size_t> base(model.buffers.size(), 0);
+// Where each buffer starts in a binary chunk that joins them all, 16-byte aligned, when each
+// is `lengths` long, and the chunk's length (before its padding to 4 bytes).
+std::vector<size_t> join_bases(const std::vector<size_t>& lengths, size_t* length) {
+    std::vector<size_t> base(lengths.size(), 0);
     size_t at = 0;
-    for (size_t b = 0; b < model.buffers.size(); ++b) {
+    for (size_t b = 0; b < lengths.size(); ++b) {
         at = (at + 15) & ~size_t(15);
         base[b] = at;
-        at += model.buffers[b].data.size();
+        at += lengths[b];
     }
     *length = at;
     return base;
 }
 
+std::vector<size_t> buffer_lengths(const tinygltf::Model& model) {
+    std::vector<size_t> lengths;
+    for (const tinygltf::Buffer& b : model.buffers) {
+        lengths.push_back(b.data.size());
+    }
+    return lengths;
+}
+
 // Writes a .glb whose binary chunk is buffer 0 (with `join`, every buffer one after another)
-// straight from the model: the JSON comes from the serialiser with the buffers taken out, one
+// straight from the model, leaving out the bytes no buffer view covers (see
+// ModelCompactor::LiveSpans): the JSON comes from the serialiser with the buffers taken out, one
 // marked empty buffer in their place and the views moved onto it, and the marked buffer's object
 // is then replaced by the chunk's real length. False when the model does not allow it (the
 // caller then lets the serialiser write the whole container); the model is left as it was.
-bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool join,
+bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool join, bool closeGaps,
                       std::ostream& out) {
     if (model->buffers.empty() || (!join && model->buffers.size() > 1) ||
         !SceneSerializer::CanJoinBuffers(*model) || !model->buffers[0].uri.empty()) {
         return false;
     }
+    std::vector<size_t> spanOfView, lengths;
+    std::vector<std::vector<ModelCompactor::Span>> spans;
+    if (closeGaps) {
+        spans = ModelCompactor::LiveSpans(*model, &spanOfView, &lengths);
+    } else {
+        // Each buffer whole, as one span where it is.
+        lengths = buffer_lengths(*model);
+        spanOfView.assign(model->bufferViews.size(), 0);
+        for (size_t length : lengths) {
+            spans.push_back({ModelCompactor::Span{0, 0, length}});
+        }
+    }
     size_t length = 0;
-    const std::vector<size_t> base = join_bases(*model, &length);
+    const std::vector<size_t> base = join_bases(lengths, &length);
     if (length == 0 || length > 0xFFFFFFF0u) {
         return false;
     }
@@ -83,10 +105,12 @@ bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool j
     buffers.swap(model->buffers);
     std::vector<std::pair<int, size_t>> placed;  // each view's buffer and offset, to restore
     placed.reserve(model->bufferViews.size());
-    for (tinygltf::BufferView& v : model->bufferViews) {
+    for (size_t i = 0; i < model->bufferViews.size(); ++i) {
+        tinygltf::BufferView& v = model->bufferViews[i];
         placed.emplace_back(v.buffer, v.byteOffset);
-        if (v.buffer > 0 && size_t(v.buffer) < base.size()) {
-            v.byteOffset += base[size_t(v.buffer)];
+        if (v.buffer >= 0 && size_t(v.buffer) < base.size()) {
+            const ModelCompactor::Span& s = spans[size_t(v.buffer)][spanOfView[i]];
+            v.byteOffset = base[size_t(v.buffer)] + s.to + (v.byteOffset - s.from);
             v.buffer = 0;
         }
     }
@@ -130,13 +154,25 @@ bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool j
     out.write(json.data(), std::streamsize(json.size()));
     put_u32(out, uint32_t(binLength));
     put_u32(out, 0x004E4942);  // "BIN"
+    // Spans that keep their distance from the one before (the bytes between them fewer than
+    // 16, the alignment gap) go out in one write with those bytes.
     static const char kZeros[16] = {};
     size_t written = 0;
     for (size_t b = 0; b < model->buffers.size(); ++b) {
-        out.write(kZeros, std::streamsize(base[b] - written));
-        const std::vector<unsigned char>& data = model->buffers[b].data;
-        out.write(reinterpret_cast<const char*>(data.data()), std::streamsize(data.size()));
-        written = base[b] + data.size();
+        const char* data = reinterpret_cast<const char*>(model->buffers[b].data.data());
+        const std::vector<ModelCompactor::Span>& in = spans[b];
+        for (size_t k = 0; k < in.size();) {
+            size_t j = k + 1;
+            while (j < in.size() && in[j].from - in[j].to == in[k].from - in[k].to) {
+                ++j;
+            }
+            const size_t at = base[b] + in[k].to;
+            const size_t bytes = in[j - 1].from + in[j - 1].length - in[k].from;
+            out.write(kZeros, std::streamsize(at - written));
+            out.write(data + in[k].from, std::streamsize(bytes));
+            written = at + bytes;
+            k = j;
+        }
     }
     out.write(kZeros, std::streamsize(binLength - written));
     return true;
@@ -144,13 +180,16 @@ bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool j
 
 // Serialises `model` through a SafeFile: `path` is either the old file or the whole new one.
 bool write_safely(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binary, bool join,
-                  const std::string& path, std::string* error) {
+                  bool closeGaps, const std::string& path, std::string* error) {
     SafeFile file(path);
     if (!file.IsOpen()) {
         *error = "Cannot write scene file [" + path + "]: " + file.ErrorText();
         return false;
     }
-    bool written = binary && write_glb_direct(writer, model, join, file.Stream());
+    bool written = binary && write_glb_direct(writer, model, join, closeGaps, file.Stream());
+    if (!written && closeGaps) {
+        ModelCompactor(*model).CloseGaps();
+    }
     if (!written && !writer->WriteGltfSceneToStream(model, file.Stream(), !binary, binary)) {
         *error = "Cannot write scene file [" + path + "]: the scene could not be serialised";
         return false;  // the SafeFile removes what was written
@@ -202,7 +241,7 @@ std::string SceneSerializer::Base64(const unsigned char* bytes, size_t size) {
 
 bool SceneSerializer::CanJoinBuffers(const tinygltf::Model& model) {
     size_t length = 0;
-    join_bases(model, &length);
+    join_bases(buffer_lengths(model), &length);
     for (const tinygltf::Buffer& b : model.buffers) {
         if (b.extras.Type() != tinygltf::NULL_TYPE) {
             return false;  // a joined buffer has no place for them
@@ -212,7 +251,7 @@ bool SceneSerializer::CanJoinBuffers(const tinygltf::Model& model) {
 }
 
 bool SceneSerializer::Write(tinygltf::Model& model, const std::string& path, bool joinBuffers,
-                            std::string* error) {
+                            bool closeGaps, std::string* error) {
     // The serialiser writes an object with no properties as null, which no reader accepts:
     // such a node gets its (default) translation written out, such a scene a name.
     for (tinygltf::Node& n : model.nodes) {
@@ -231,5 +270,5 @@ bool SceneSerializer::Write(tinygltf::Model& model, const std::string& path, boo
     }
     tinygltf::TinyGLTF writer;
     writer.SetImageWriter(write_image_bytes, nullptr);
-    return write_safely(&writer, &model, IsBinaryPath(path), joinBuffers, path, error);
+    return write_safely(&writer, &model, IsBinaryPath(path), joinBuffers, closeGaps, path, error);
 }

@@ -20,7 +20,9 @@ class SceneSerializer {
     // False with `error` naming the file when it cannot be written. For a .glb, `joinBuffers`
     // writes every buffer into the binary chunk, one after another at 16-byte boundaries, with
     // the buffer views moved accordingly in the file (the model itself keeps its buffers);
-    // without it only buffer 0 goes there.
+    // without it only buffer 0 goes there. With `closeGaps` the bytes of a buffer that no view
+    // covers are left out (ModelCompactor::LiveSpans): a .glb leaves them out as it is written,
+    // otherwise they are taken out of the model first.
     static bool Write(tinygltf::Model& model, const std::string& path, bool joinBuffers,
-                      std::string* error);
+                      bool closeGaps, std::string* error);
 };

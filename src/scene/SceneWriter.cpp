@@ -45,6 +45,8 @@ bool SceneWriter::Write(const std::string& path, std::string* error) {
         return false;
     }
     if (!targets.empty()) {
+        // The bytes of the views removed with the old channels are left out as the file is
+        // written (a .glb never moves them).
         ModelCompactor compactor(m_);
         compactor.RemoveUnusedAccessors(removeOldChannels(&targets));
         appendSamplers(&targets, SceneSerializer::IsBinaryPath(path));
@@ -52,6 +54,7 @@ bool SceneWriter::Write(const std::string& path, std::string* error) {
         doc_.ClearTouched();
     }
     bool join = false;
+    const bool closeGaps = ModelCompactor(m_).RenumberingSafe();
     if (!SceneSerializer::IsBinaryPath(path)) {
         joinPathBuffers();
     } else {
@@ -61,7 +64,7 @@ bool SceneWriter::Write(const std::string& path, std::string* error) {
         join = compactor.RenumberingSafe() && SceneSerializer::CanJoinBuffers(m_);
         compactor.PackIntoFirstBuffer(!join);
     }
-    return SceneSerializer::Write(m_, path, join, error);
+    return SceneSerializer::Write(m_, path, join, closeGaps, error);
 }
 
 bool SceneWriter::buildTargets(std::vector<Target>* targets, std::string* why) {

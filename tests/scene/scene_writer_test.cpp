@@ -408,6 +408,46 @@ TEST_F(SceneWriterTest, StoresInTurnKeepOneBufferForTheNewAnimation) {
 }
 
 // Keys before time 0 are cut off: the curve starts at 0 with its value there. No time or
+// The bytes of the animation a store replaces are left out of the file, .glb or .gltf, and the
+// bytes on either side of them come back as they were.
+TEST_F(SceneWriterTest, ReplacedAnimationBytesAreLeftOut) {
+    ModelBuilder b;
+    std::vector<float> points(3000), times(1000), moves(3000);
+    for (size_t i = 0; i < points.size(); ++i)
+        points[i] = float(i), moves[i] = float(i % 7);
+    for (size_t i = 0; i < times.size(); ++i)
+        times[i] = float(i) / 30;
+    auto mesh = [&](int node) {  // 12 KB of points
+        tinygltf::Primitive p;
+        p.mode = TINYGLTF_MODE_POINTS;
+        p.attributes["POSITION"] = b.Floats(points, 3, 0, true);
+        b.m.meshes.emplace_back().primitives.push_back(p);
+        b.m.nodes[size_t(node)].mesh = int(b.m.meshes.size()) - 1;
+    };
+    mesh(b.Node("a"));
+    b.Channel(0, 0, "translation", times, moves);  // 16 KB between the meshes
+    mesh(b.Node("c"));
+    Open(b);
+    const size_t read = scene.source->document()->model().buffers[0].data.size();
+    for (int axis = 0; axis < 3; ++axis)
+        Key("a", axis, {{0, 1, 1, 1}, {6000, 2, 1, 1}});
+    for (const char* name : {"out.glb", "out.gltf"}) {
+        auto back = StoreAndRead(name);
+        size_t bytes = 0;
+        for (const tinygltf::Buffer& buffer : back->model().buffers)
+            bytes += buffer.data.size();
+        EXPECT_LT(bytes, read - 15000) << name;
+        for (const tinygltf::Mesh& m : back->model().meshes) {
+            std::vector<float> got;
+            std::string why;
+            ASSERT_TRUE(SceneChecker::ReadFloats(
+                back->model(), m.primitives[0].attributes.at("POSITION"), 3, &got, &why))
+                << why;
+            EXPECT_EQ(got, points) << name;
+        }
+    }
+}
+
 // minimum is written as -0.
 TEST_F(SceneWriterTest, CurvesStartAtZeroWithoutNegativeZeros) {
     OneNode();
