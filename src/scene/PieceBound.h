@@ -1,12 +1,15 @@
 #pragma once
 
+#include <algorithm>
+#include <cmath>
+
 // How many equal parts a cubic quaternion piece needs to stay within a tolerance of a rotation
 // whose Euler half-angles run along cubics over the piece. The rotation is the product of one
 // turn per axis, exp(h(u) e) for the axis e and half-angle h, so the size of its fourth
 // derivative is bounded by that of the exponential of the half-angles' summed derivative bounds
 // (A⁴ + 6A²B + 3B² + 4AC for bounds A, B, C on the first three derivatives), and a cubic
 // Hermite piece misses by at most a 384th of that. Each cut into n parts brings the bound down
-// by about n⁴.
+// by about n⁴. Inline: a store asks it once for every piece of every turning curve.
 class PieceBound {
   public:
     // More parts than this for one piece and the rotation is left to sampling.
@@ -14,14 +17,52 @@ class PieceBound {
 
     // Adds one axis's half-angle over the piece (radians): from p0 to p1, with slopes m0 and m1
     // in radians per piece (the slope per second times the piece's duration).
-    void Add(double p0, double p1, double m0, double m1);
+    void Add(double p0, double p1, double m0, double m1) {
+        const double b = 3 * (p1 - p0) - 2 * m0 - m1, a = 2 * (p0 - p1) + m0 + m1;
+        // The slope m0 + 2bu + 3au² peaks at an end or where the second derivative 2b + 6au
+        // is zero; clamped to the piece, that point gives an end's slope (m0 or m1) when it
+        // lies outside, so all three can be taken without asking which.
+        const double u = a != 0 ? std::min(1.0, std::max(0.0, -b / (3 * a))) : 0.0;
+        first_ += std::max({std::fabs(m0), std::fabs(m1), std::fabs(m0 + u * (2 * b + 3 * a * u))});
+        second_ += std::max(std::fabs(2 * b), std::fabs(2 * b + 6 * a));
+        third_ += std::fabs(6 * a);
+    }
 
     // The parts the piece from time t0 to t1 (seconds) needs to stay within `allowedRadians`
     // of the rotation, allowing for its knots' times being stored as floats; 0 when no number
     // up to kMaxParts will do. With `oneAxis` (only one half-angle was added, between fixed
     // rotations) only the error across the rotation's path counts, which is the smaller.
-    int Parts(double t0, double t1, double allowedRadians, bool oneAxis) const;
+    int Parts(double t0, double t1, double allowedRadians, bool oneAxis) const {
+        // The knots' times are floats: a piece may sit up to half a float step off at either
+        // end, moving what a player reads by the turning speed times that (and its tangents a
+        // little).
+        const double drift =
+            std::max(std::fabs(t0), std::fabs(t1)) * kHalfFloatStep * 2.6 * first_ / (t1 - t0);
+        double by = 1;  // 1 / parts, multiplied rather than divided: most pieces need one part
+        for (int parts = 1; parts <= kMaxParts; by = 1.0 / ++parts) {
+            const double A = first_ * by, B = second_ * by * by, C = third_ * by * by * by;
+            const double fourth = A * A * A * A + 6 * A * A * B + 3 * B * B + 4 * A * C;
+            // How far the piece strays from the rotation (as 4-vectors), and the part of that
+            // which turns it: for one axis, z = exp(i h) has z'''' = (h'^4 - 3h''^2 - 4h'h''' -
+            // 6i h'^2 h'') z, the part along z is normalised away, and across z the real part
+            // is scaled by the sine of how far h moves over the piece (at most A); otherwise
+            // all of it.
+            const double whole = (oneAxis ? kRoot2 : 1.0) * fourth * kBy384;
+            const double across =
+                oneAxis ? ((A * A * A * A + 3 * B * B + 4 * A * C) * A + 6 * A * A * B) * kBy384
+                        : whole;
+            // 2 (across / (1 - whole) + drift) <= allowedRadians, without dividing
+            if (whole < 0.5 && 2 * (across + drift * (1 - whole)) <= allowedRadians * (1 - whole)) {
+                return parts;
+            }
+        }
+        return 0;
+    }
 
   private:
+    static constexpr double kHalfFloatStep = 1.0 / (1 << 24);  // of a float, relative to it
+    static constexpr double kBy384 = 1.0 / 384;
+    static constexpr double kRoot2 = 1.4142135623730951;
+
     double first_ = 0, second_ = 0, third_ = 0;  // summed bounds, by u over the piece
 };
