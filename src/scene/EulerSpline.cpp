@@ -106,11 +106,8 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
     }
 
     BuiltSampler s;
-    s.interpolation = "CUBICSPLINE";
-    s.width = 4;
-    s.times.resize(knots);
+    float* v = s.SizeQuaternionKnots(knots);
     float* time = s.times.data();
-    float* v = s.SizeValues(knots * 12);
     // One knot: its time, the half-angles there and their slopes on either side. The
     // rotation's derivative by one half-angle is the product with that axis's cosine and sine
     // turned a quarter ahead, (-sin, cos).

@@ -19,6 +19,14 @@ struct BuiltSampler {
         valueBytes.resize(count * sizeof(float));
         return reinterpret_cast<float*>(valueBytes.data());
     }
+    // Makes room for `knots` CUBICSPLINE quaternion knots (times, and in-tangent, value and
+    // out-tangent each) and returns where their values go.
+    float* SizeQuaternionKnots(size_t knots) {
+        interpolation = "CUBICSPLINE";
+        width = 4;
+        times.resize(knots);
+        return SizeValues(knots * 12);
+    }
     const float* Values() const { return reinterpret_cast<const float*>(valueBytes.data()); }
     size_t ValueCount() const { return valueBytes.size() / sizeof(float); }
 };

@@ -69,11 +69,8 @@ bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* o
         }
     }
     BuiltSampler s;
-    s.interpolation = "CUBICSPLINE";
-    s.width = 4;
-    s.times.resize(knots);
+    float* v = s.SizeQuaternionKnots(knots);
     float* time = s.times.data();
-    float* v = s.SizeValues(knots * 12);
     // One knot: its time, the half-angle there and its slopes (half-angle radians per second).
     // The rotation is cos(h) P + sin(h) Q, its derivative by h -sin(h) P + cos(h) Q.
     auto put = [&](double at, double half, double arrive, double depart) {
