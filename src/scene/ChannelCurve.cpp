@@ -337,10 +337,10 @@ size_t ChannelCurve::TrimBefore(double seconds) {
     Key& next = keys_[first];
     double in = InSlope(first), out = OutSlope(first);
     next.in = kExplicit;
-    next.inSlope = in;
+    next.inSlope = float(in);
     if (next.out == kSmooth || (next.out == kLinear && first + 1 == keys_.size())) {
         next.out = kExplicit;
-        next.outSlope = out;
+        next.outSlope = float(out);
     }
     bool atCut = std::fabs(next.time - seconds) <= kSameTime;
     Key cut;
@@ -348,10 +348,10 @@ size_t ChannelCurve::TrimBefore(double seconds) {
         cut.time = seconds;
         cut.value = Evaluate(seconds);
         cut.in = kExplicit;
-        cut.inSlope = SlopeAt(seconds, false);
+        cut.inSlope = float(SlopeAt(seconds, false));
         bool step = keys_[first - 1].out == kStep;
         cut.out = step ? kStep : kExplicit;
-        cut.outSlope = step ? 0.0 : SlopeAt(seconds, true);
+        cut.outSlope = step ? 0.0f : float(SlopeAt(seconds, true));
     }
     keys_.erase(keys_.begin(), keys_.begin() + long(first));
     if (!atCut) {
@@ -389,8 +389,8 @@ bool ChannelCurve::FromApplyArrays(int count, const CueTime* times, const float*
                        values[i],
                        KindFromCode(in ? in[i] : KLWire::kLinear),
                        KindFromCode(out ? out[i] : KLWire::kLinear),
-                       0.0,
-                       0.0};
+                       0.0f,
+                       0.0f};
         }
         Keys& operator++() {
             ++i;

@@ -10,20 +10,23 @@
 // (a step holds the left key's value); before the first key and after the last the curve holds.
 class ChannelCurve : public OrChannel {
   public:
-    enum Kind {
+    enum Kind : unsigned char {
         kSmooth = 0,    // Catmull-Rom slope through the neighbouring keys
         kLinear = 1,    // slope of the straight line to the neighbour on that side
         kFlat = 2,      // zero slope
         kStep = 3,      // (out side only) hold the value until the next key
         kExplicit = 4,  // slope given in inSlope/outSlope (units per second)
     };
+    // 32 bytes: an applied keyset makes hundreds of thousands of them. Explicit slopes come
+    // from a file's float tangents, or from the curve itself at a cut at time 0, and are
+    // written to files as floats, so floats hold them.
     struct Key {
         double time = 0;  // seconds
         double value = 0;
         Kind in = kLinear;
         Kind out = kLinear;
-        double inSlope = 0;  // for kExplicit, units per second
-        double outSlope = 0;
+        float inSlope = 0;  // for kExplicit, units per second
+        float outSlope = 0;
     };
 
     // Seconds: keys closer than this are at one time.

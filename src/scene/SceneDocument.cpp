@@ -363,8 +363,8 @@ bool SceneDocument::readSampler(const tinygltf::AnimationSampler& s, int path,
             key.in = cubic ? ChannelCurve::kExplicit : ChannelCurve::kLinear;
             key.out = cubic ? ChannelCurve::kExplicit
                             : (step ? ChannelCurve::kStep : ChannelCurve::kLinear);
-            key.inSlope = inSlope[a];
-            key.outSlope = outSlope[a];
+            key.inSlope = float(inSlope[a]);
+            key.outSlope = float(outSlope[a]);
             (*keys)[size_t(a)].push_back(key);
         }
     }
