@@ -157,6 +157,22 @@ struct TurnCase {
     std::vector<StoreKey> keys[3];  // RX RY RZ: ticks (6000 a second), degrees, tangent codes;
                                     // none: held at an angle of its own
 };
+// A head keyed every three frames on every axis, swinging by `scale` times a few degrees about
+// rest angles of its own, with every kind of tangent.
+TurnCase Head(const char* name, float scale, const char* interpolation, bool cut) {
+    const float rest[3] = {0, 10, -5};
+    const float swing[3][5] = {{0, 4, -3, 5, 0}, {0, 4, -4, 2, 0}, {0, 3, -3, 0, -1}};
+    const int tangents[3][5][2] = {{{0, 0}, {0, 1}, {1, 2}, {2, 0}, {0, 0}},
+                                   {{1, 1}, {0, 0}, {0, 2}, {2, 1}, {1, 0}},
+                                   {{2, 0}, {0, 0}, {0, 1}, {1, 1}, {0, 0}}};
+    TurnCase c{name, false, interpolation, cut, {}};
+    for (int axis = 0; axis < 3; ++axis) {
+        for (int k = 0; k < 5; ++k)
+            c.keys[axis].push_back({600 * k, rest[axis] + scale * swing[axis][k],
+                                    tangents[axis][k][0], tangents[axis][k][1]});
+    }
+    return c;
+}
 void PrintTo(const TurnCase& c, std::ostream* os) {
     *os << c.name;
 }
@@ -237,38 +253,9 @@ INSTANTIATE_TEST_SUITE_P(
                  {{{0, 0, 1, 1}, {3000, 40, 1, 1}, {9000, -10, 1, 1}}, {}, {}}},
         // A head nodding, shaking and tilting at once, keyed every three frames on every axis:
         // pieces cut finely enough would outnumber the frames, so it is sampled.
-        TurnCase{
-            "ThreeAxesDense",
-            false,
-            "LINEAR",
-            false,
-            {{{0, 0, 0, 0}, {600, 4, 0, 1}, {1200, -3, 1, 2}, {1800, 5, 2, 0}, {2400, 0, 0, 0}},
-             {{0, 10, 1, 1}, {600, 14, 0, 0}, {1200, 6, 0, 2}, {1800, 12, 2, 1}, {2400, 10, 1, 0}},
-             {{0, -5, 2, 0},
-              {600, -2, 0, 0},
-              {1200, -8, 0, 1},
-              {1800, -5, 1, 1},
-              {2400, -6, 0, 0}}}},
-        // The same head swaying gently: cubic pieces, some cut.
-        TurnCase{"ThreeAxesGentle",
-                 false,
-                 "CUBICSPLINE",
-                 true,
-                 {{{0, 0, 0, 0},
-                   {600, 0.4f, 0, 1},
-                   {1200, -0.3f, 1, 2},
-                   {1800, 0.5f, 2, 0},
-                   {2400, 0, 0, 0}},
-                  {{0, 10, 1, 1},
-                   {600, 10.4f, 0, 0},
-                   {1200, 9.6f, 0, 2},
-                   {1800, 10.2f, 2, 1},
-                   {2400, 10, 1, 0}},
-                  {{0, -5, 2, 0},
-                   {600, -4.7f, 0, 0},
-                   {1200, -5.8f, 0, 1},
-                   {1800, -5, 1, 1},
-                   {2400, -5.1f, 0, 0}}}},
+        Head("ThreeAxesDense", 1, "LINEAR", false),
+        // The same head swaying a tenth as far: cubic pieces, some cut.
+        Head("ThreeAxesGentle", 0.1f, "CUBICSPLINE", true),
         // Big tumbles about two axes keyed at different times: pieces at the union of the key
         // times, cut into parts where they turn fast.
         TurnCase{"TwoAxesAtDifferentTimes",
