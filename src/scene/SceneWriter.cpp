@@ -44,24 +44,26 @@ bool SceneWriter::Write(const std::string& path, std::string* error) {
         *error = "Cannot write scene file [" + path + "]: " + why;
         return false;
     }
+    const bool binary = SceneSerializer::IsBinaryPath(path);
+    ModelCompactor compactor(m_);
+    // Whether buffers and their bytes may be renumbered and moved: no extension in use could
+    // refer to them by index or offset. Bytes no view covers are then left out of the file.
+    const bool closeGaps = compactor.RenumberingSafe();
     if (!targets.empty()) {
         // The bytes of the views removed with the old channels are left out as the file is
         // written (a .glb never moves them).
-        ModelCompactor compactor(m_);
         compactor.RemoveUnusedAccessors(removeOldChannels(&targets));
-        appendSamplers(&targets, SceneSerializer::IsBinaryPath(path));
+        appendSamplers(&targets, binary);
         compactor.RemoveUnusedBuffers();
         doc_.ClearTouched();
     }
     bool join = false;
-    const bool closeGaps = ModelCompactor(m_).RenumberingSafe();
-    if (!SceneSerializer::IsBinaryPath(path)) {
+    if (!binary) {
         joinPathBuffers();
     } else {
         // Every buffer goes into the binary chunk: joined as the file is written where the
         // serialiser can (no copy of the bytes), else moved into buffer 0 first.
-        ModelCompactor compactor(m_);
-        join = compactor.RenumberingSafe() && SceneSerializer::CanJoinBuffers(m_);
+        join = closeGaps && SceneSerializer::CanJoinBuffers(m_);
         compactor.PackIntoFirstBuffer(!join);
     }
     return SceneSerializer::Write(m_, path, join, closeGaps, error);
