@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstddef>
+#include <iterator>
 
 #include "toolkit/CueTime.h"
 
@@ -370,15 +372,40 @@ bool ChannelCurve::FromApplyArrays(int count, const CueTime* times, const float*
             return false;
         }
     }
-    // Filled in place, field by field: a curve of thousands of keys is written once.
-    keys->resize(size_t(count));
-    Key* k = keys->data();
-    for (int i = 0; i < count; ++i, ++k) {
-        k->time = times[i].Seconds();
-        k->value = values[i];
-        k->in = KindFromCode(inTangents ? inTangents[i] : KLWire::kLinear);
-        k->out = KindFromCode(outTangents ? outTangents[i] : KLWire::kLinear);
-    }
+    // Each key made where it goes, from an iterator over the arrays: a curve of thousands of
+    // keys is written once, not cleared first.
+    struct Keys {
+        using iterator_category = std::forward_iterator_tag;
+        using value_type = Key;
+        using difference_type = std::ptrdiff_t;
+        using pointer = const Key*;
+        using reference = Key;
+        const CueTime* times;
+        const float* values;
+        const int *in, *out;
+        int i;
+        Key operator*() const {
+            return Key{times[i].Seconds(),
+                       values[i],
+                       KindFromCode(in ? in[i] : KLWire::kLinear),
+                       KindFromCode(out ? out[i] : KLWire::kLinear),
+                       0.0f,
+                       0.0f};
+        }
+        Keys& operator++() {
+            ++i;
+            return *this;
+        }
+        Keys operator++(int) {
+            Keys was = *this;
+            ++i;
+            return was;
+        }
+        bool operator==(const Keys& o) const { return i == o.i; }
+        bool operator!=(const Keys& o) const { return i != o.i; }
+    };
+    keys->assign(Keys{times, values, inTangents, outTangents, 0},
+                 Keys{times, values, inTangents, outTangents, count});
     // Apply gives its keys in time order: sorting (which allocates) only when they are not.
     auto earlier = [](const Key& a, const Key& b) { return a.time < b.time; };
     if (!std::is_sorted(keys->begin(), keys->end(), earlier)) {
