@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <iterator>
 
+#include "scene/CurveCursor.h"
 #include "toolkit/CueTime.h"
 
 double ChannelCurve::segmentSlope(size_t i) const {
@@ -199,85 +200,10 @@ bool ChannelCurve::Constant() const {
 
 void ChannelCurve::EvaluateSorted(const std::vector<double>& times,
                                   std::vector<double>* out) const {
-    SampleSorted(times, out, nullptr, nullptr);
-}
-
-void ChannelCurve::SampleSorted(const std::vector<double>& times, std::vector<double>* values,
-                                std::vector<double>* arriving, std::vector<double>* leaving) const {
-    const size_t count = times.size(), n = keys_.size();
-    for (std::vector<double>* v : {values, arriving, leaving}) {
-        if (v) {
-            v->resize(count);
-        }
-    }
-    size_t i = 0;       // keys before i lie at or before the current time (within rounding)
-    size_t cached = n;  // the segment whose coefficients follow (n: none yet)
-    bool step = false, straight = false;
-    double t0 = 0, dt = 1, v0 = 0, v1 = 0, m0 = 0, m1 = 0;
-    for (size_t k = 0; k < count; ++k) {
-        const double seconds = times[k];
-        double value = n == 0 ? 0.0 : keys_.front().value, in = 0, out = 0;
-        if (n > 0 && !std::isnan(seconds)) {
-            // Within float rounding of a key is at the key, as in Evaluate.
-            const double eps = 1e-9 + std::fabs(seconds) * 1.2e-7;
-            while (i < n && keys_[i].time <= seconds + eps) {
-                ++i;
-            }
-            if (i == 0) {
-                // held before the first key
-            } else if (std::fabs(seconds - keys_[i - 1].time) <= eps) {
-                const size_t j = i - 1;  // at key j: the slopes of the segments on either side
-                value = keys_[j].value;
-                if (leaving) {
-                    out = j + 1 < n && keys_[j].out != kStep ? OutSlope(j) : 0.0;
-                }
-                if (arriving) {
-                    in = j > 0 && keys_[j - 1].out != kStep ? InSlope(j) : 0.0;
-                }
-            } else if (i == n) {
-                value = keys_.back().value;  // held after the last key
-            } else {
-                const size_t j = i - 1;  // inside the segment from key j to j + 1
-                if (cached != j) {
-                    // The segment's coefficients once for all the times inside it.
-                    cached = j;
-                    const Key& a = keys_[j];
-                    const Key& b = keys_[j + 1];
-                    step = a.out == kStep;
-                    straight = a.out == kLinear && b.in == kLinear;
-                    t0 = a.time;
-                    dt = b.time - a.time;
-                    v0 = a.value;
-                    v1 = b.value;
-                    m0 = step || straight ? 0.0 : OutSlope(j) * dt;
-                    m1 = step || straight ? 0.0 : InSlope(j + 1) * dt;
-                }
-                if (step) {
-                    value = v0;
-                } else if (straight) {
-                    value = v0 + (v1 - v0) * ((seconds - t0) / dt);  // as segment() has it
-                    in = out = (v1 - v0) / dt;
-                } else {
-                    const double u = (seconds - t0) / dt, u2 = u * u, u3 = u2 * u;
-                    value = (2 * u3 - 3 * u2 + 1) * v0 + (u3 - 2 * u2 + u) * m0 +
-                            (-2 * u3 + 3 * u2) * v1 + (u3 - u2) * m1;
-                    if (arriving || leaving) {
-                        in = out = ((6 * u2 - 6 * u) * (v0 - v1) + (3 * u2 - 4 * u + 1) * m0 +
-                                    (3 * u2 - 2 * u) * m1) /
-                                   dt;
-                    }
-                }
-            }
-        }
-        if (values) {
-            (*values)[k] = value;
-        }
-        if (arriving) {
-            (*arriving)[k] = in;
-        }
-        if (leaving) {
-            (*leaving)[k] = out;
-        }
+    out->resize(times.size());
+    CurveCursor cursor(*this);
+    for (size_t k = 0; k < times.size(); ++k) {
+        (*out)[k] = cursor.At(times[k]).value;
     }
 }
 

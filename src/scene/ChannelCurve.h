@@ -58,11 +58,6 @@ class ChannelCurve : public OrChannel {
     // The curve's derivative (units per second) at `seconds`, from the right (`outgoing`) or
     // from the left; zero where the curve holds, and at a step.
     double SlopeAt(double seconds, bool outgoing) const;
-    // Evaluate, SlopeAt(t, false) and SlopeAt(t, true) at each of `times` (seconds, ascending)
-    // into those of `values`, `arriving` and `leaving` that are not null, in one pass over the
-    // keys, each segment's coefficients worked out once.
-    void SampleSorted(const std::vector<double>& times, std::vector<double>* values,
-                      std::vector<double>* arriving, std::vector<double>* leaving) const;
     // True when the curve has the same value everywhere.
     bool Constant() const;
     // True when every segment is a straight line (both ends linear) or every one a step.

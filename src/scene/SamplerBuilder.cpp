@@ -4,6 +4,7 @@
 #include <cmath>
 
 #include "scene/ChannelCurve.h"
+#include "scene/CurveCursor.h"
 #include "scene/EulerRotation.h"
 #include "scene/EulerSpline.h"
 #include "scene/SampleReducer.h"
@@ -260,26 +261,30 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     // A piece of a cubic is a cubic: cutting every axis at the union of the key times keeps
     // each axis exact, with the slope on either side of every cut.
     out->interpolation = "CUBICSPLINE";
-    std::vector<double> times = unionTimes();
-    std::vector<double> axis[3], in[3], leave[3];
-    for (int a = 0; a < 3; ++a) {
-        if (curves_[a]) {
-            curves_[a]->SampleSorted(times, &axis[a], &in[a], &leave[a]);
-        } else {
-            axis[a].assign(times.size(), rest_[a]);
-            in[a].assign(times.size(), 0.0);
-            leave[a].assign(times.size(), 0.0);
-        }
-    }
+    const std::vector<double> times = unionTimes();
     const size_t n = times.size();
     out->times.resize(n);
-    float* v = out->SizeValues(n * 9);
-    for (size_t k = 0; k < n; ++k, v += 9) {
+    float* const values = out->SizeValues(n * 9);
+    for (size_t k = 0; k < n; ++k) {
         out->times[k] = stored(times[k]);
-        for (int a = 0; a < 3; ++a) {
-            v[a] = stored(in[a][k]);
-            v[3 + a] = stored(axis[a][k]);
-            v[6 + a] = stored(leave[a][k]);
+    }
+    // Axis by axis into the interleaved values: in-tangents, values, out-tangents of each knot.
+    for (int a = 0; a < 3; ++a) {
+        float* v = values + 3 + a;
+        if (!curves_[a]) {
+            for (size_t k = 0; k < n; ++k, v += 9) {
+                v[-3] = 0.0f;
+                v[0] = stored(rest_[a]);
+                v[3] = 0.0f;
+            }
+            continue;
+        }
+        CurveCursor cursor(*curves_[a]);
+        for (size_t k = 0; k < n; ++k, v += 9) {
+            const CurveCursor::Point p = cursor.At(times[k]);
+            v[-3] = stored(p.arriving);
+            v[0] = stored(p.value);
+            v[3] = stored(p.leaving);
         }
     }
 }

@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "scene/ChannelCurve.h"
+#include "scene/CurveCursor.h"
 #include "scene/EulerRotation.h"
 #include "scene/KLChannel.h"
 #include "scene/KLSplineChannel.h"
@@ -49,14 +50,14 @@ TEST_P(CurveEvaluate, GivesTheHermiteValueItsSlopeAndTheSameInOnePass) {
     }
     times.push_back(c.keys().back().time + 5);
     std::sort(times.begin(), times.end());
-    std::vector<double> values, arriving, leaving;
-    c.SampleSorted(times, &values, &arriving, &leaving);
-    ASSERT_EQ(values.size(), times.size());
-    for (size_t i = 0; i < times.size(); ++i) {
-        double t = times[i];
-        EXPECT_NEAR(values[i], c.Evaluate(t), 1e-12) << "at " << t;
-        EXPECT_NEAR(arriving[i], c.SlopeAt(t, false), 1e-9) << "at " << t;
-        EXPECT_NEAR(leaving[i], c.SlopeAt(t, true), 1e-9) << "at " << t;
+    CurveCursor cursor(c);
+    std::vector<double> values;
+    for (double t : times) {
+        const CurveCursor::Point p = cursor.At(t);
+        values.push_back(p.value);
+        EXPECT_NEAR(p.value, c.Evaluate(t), 1e-12) << "at " << t;
+        EXPECT_NEAR(p.arriving, c.SlopeAt(t, false), 1e-9) << "at " << t;
+        EXPECT_NEAR(p.leaving, c.SlopeAt(t, true), 1e-9) << "at " << t;
     }
     std::vector<double> only;
     c.EvaluateSorted(times, &only);

@@ -267,6 +267,34 @@ INSTANTIATE_TEST_SUITE_P(
                   {{9000, -40, 0, 0}, {21000, 60, 2, 2}, {45000, 30, 0, 0}}}}),
     [](const auto& info) { return std::string(info.param.name); });
 
+// A keyset turning X every three frames over a head that the file turns about Y every frame:
+// the file's key times are floats, the keyset's are not, and where they meet (every third frame)
+// they are one knot, not a reason to sample the whole turn.
+TEST_F(SceneWriterTest, AxesKeyedOnOneFloatTimeShareAKnot) {
+    OneNode();
+    std::vector<StoreKey> x;
+    for (int k = 0; k <= 20; ++k)
+        x.push_back({600 * k, float(3 * std::sin(k * 0.7)), k % 3, (k + 1) % 3});
+    Key("a", 3, x);
+    Key("a", 5, {{0, -20, 1, 1}});
+    std::vector<ChannelCurve::Key> y(31);
+    for (int k = 0; k <= 30; ++k)
+        y[size_t(k)].time = double(float(k / 30.0)), y[size_t(k)].value = 8 * std::cos(k * 0.2);
+    SceneDocument& doc = *scene.source->document();
+    doc.SetCurve(0, 4, y, true);
+    Written rot = WrittenSampler(StoreAndRead("out.glb")->model(), 0, "rotation");
+    EXPECT_EQ(rot.interpolation, "CUBICSPLINE");
+    // A knot at every key time of either axis (and some between, where a piece is cut).
+    for (int k = 0; k <= 30; ++k)
+        EXPECT_EQ(std::count(rot.times.begin(), rot.times.end(), float(k / 30.0)), 1) << k;
+    for (int k = 11; k <= 20; ++k)
+        EXPECT_EQ(std::count(rot.times.begin(), rot.times.end(), float(k * 0.1)), 1) << k;
+    for (double f = 0; f <= 60; ++f)
+        ASSERT_NO_FATAL_FAILURE(ExpectRotationAt(doc, rot, f / 30));
+    for (int k = 0; k <= 20; ++k)
+        ASSERT_NO_FATAL_FAILURE(ExpectRotationAt(doc, rot, k * 0.1));
+}
+
 // A skinned figure whose animation lives in a buffer of its own: replacing that animation
 // leaves the buffer empty, and an empty buffer is removed, not written with byteLength 0.
 TEST_F(SceneWriterTest, ABufferLeftEmptyIsRemoved) {
