@@ -3,8 +3,10 @@
 //   ParseAndExtract     load, then 60 key shapes sampled over the ~200 channels below "face"
 //   StoreUnchanged      load and store with nothing changed
 //   StoreChannels       load, 10 x 30 channels of 2,000 keys stored, then store
-//   StoreChannelsMixedAxes   the same with axes chosen so that every curve must be sampled
-// The two store cases check afterwards that the stored scene holds the stored keys' values.
+//   StoreChannelsMixedAxes   the same with translation and rotation channels on each node
+//   StoreChannelsKeyedApart  the same on nodes whose other axes the file keys at other times
+// (see store_channels). The store cases check afterwards that the stored scene holds the
+// stored keys' values.
 // At the end the ratios StoreChannels* / StoreUnchanged (target under 1.5) and
 // ParseAndExtract / Parse (target under 1.3) are printed.
 #include <benchmark/benchmark.h>
@@ -78,9 +80,16 @@ const std::string& scene_path() {
             std::vector<float> t, r;
             for (int k = 0; k < kKeys; ++k) {
                 double s = std::sin(k * 0.1 + n);
-                t.insert(t.end(), {float(s), float(k * 0.01), 0.0f});
-                double h = s * 0.5;
-                r.insert(r.end(), {float(std::sin(h)), 0.0f, 0.0f, float(std::cos(h))});
+                // Nodes 0..99 move in X and Y and turn about X only; nodes 100..199 also move
+                // in Z and turn about Y.
+                const bool allAxes = n >= 100 && n < 200;
+                t.insert(t.end(), {float(s), float(k * 0.01),
+                                   allAxes ? float(0.1 * std::cos(k * 0.07 + n)) : 0.0f});
+                double h = s * 0.5, g = allAxes ? 0.2 * std::cos(k * 0.05 + n) : 0.0;
+                // (cos g + j sin g)(cos h + i sin h): a turn about X by 2h, then about Y by 2g
+                r.insert(r.end(), {float(std::cos(g) * std::sin(h)), float(std::sin(g) * std::cos(h)),
+                                   float(-std::sin(g) * std::sin(h)),
+                                   float(std::cos(g) * std::cos(h))});
             }
             const char* paths[2] = {"translation", "rotation"};
             std::vector<float>* values[2] = {&t, &r};
@@ -162,10 +171,18 @@ void BM_StoreUnchanged(benchmark::State& state) {
 
 // 10 keysets x 30 channels, each channel 2,000 keys (one every 3 frames, mixed tangents),
 // stored on 100 nodes. As apply does, the channels of one keyset share their key times.
-// `mixedAxes` 0: keysets 0..7 drive TX TY TZ of their 10 nodes and keysets 8..9 RX RY RZ;
-// 1: every node gets TX TY and RX, so that its other axes keep the file's own key times and
-// everything must be sampled at every frame (the costliest case).
-void store_channels(benchmark::State& state, bool mixedAxes) {
+// Shared: keysets 0..7 drive TX TY TZ of nodes 0..79 and keysets 8..9 RX RY RZ of nodes 80..99,
+// so that every path is written at the applied keys.
+// MixedAxes: every node 0..99 gets TX TY and RX, translation and rotation on one node; the
+// file holds its other axes still (TZ 0, no turn about Y or Z), so the translation is written at
+// the applied keys and the rotation turns about one axis.
+// KeyedApart: the same channels on nodes 100..199, whose other axes the file moves at its own
+// key times (a key every frame for 8 s): each path is written at the union of both key times,
+// the rotation turning about three axes.
+enum class Layout { Shared, MixedAxes, KeyedApart };
+void store_channels(benchmark::State& state, Layout layout) {
+    const bool mixedAxes = layout != Layout::Shared;
+    const int firstNode = layout == Layout::KeyedApart ? 100 : 0;
     std::vector<CueTime> times;
     std::vector<float> values;
     std::vector<int> in, out;
@@ -179,7 +196,7 @@ void store_channels(benchmark::State& state, bool mixedAxes) {
         KLWireSource src(scene_path().c_str());
         std::unique_ptr<OrDagNode> root(src.RootNode());
         for (int i = 0; i < 300; ++i) {
-            int keyset = i / 30, node = i / 3, axis = i % 3;
+            int keyset = i / 30, node = firstNode + i / 3, axis = i % 3;
             int channel = mixedAxes ? (axis == 2 ? 3 : axis) : (keyset < 8 ? axis : 3 + axis);
             std::string name = "n" + std::to_string(node);
             std::unique_ptr<OrDagNode> n(KLWire::FetchDagNode(root.get(), name.c_str()));
@@ -195,7 +212,8 @@ void store_channels(benchmark::State& state, bool mixedAxes) {
     std::string error;
     auto back = SceneDocument::Load(out_path(), &error);
     const std::pair<int, int> checked[] = {{0, 0}, {0, mixedAxes ? 3 : 1}, {95, mixedAxes ? 1 : 4}};
-    for (auto [node, channel] : checked) {
+    for (auto [offset, channel] : checked) {
+        const int node = firstNode + offset;
         const ChannelCurve* curve = back ? back->Curve(node, channel) : nullptr;
         for (int k : {0, 1, 2, 999, 1998, 1999}) {
             double got = curve ? curve->Evaluate(times[size_t(k)].Seconds()) : 1e9;
@@ -210,10 +228,13 @@ void store_channels(benchmark::State& state, bool mixedAxes) {
 }
 
 void BM_StoreChannels(benchmark::State& state) {
-    store_channels(state, false);
+    store_channels(state, Layout::Shared);
 }
 void BM_StoreChannelsMixedAxes(benchmark::State& state) {
-    store_channels(state, true);
+    store_channels(state, Layout::MixedAxes);
+}
+void BM_StoreChannelsKeyedApart(benchmark::State& state) {
+    store_channels(state, Layout::KeyedApart);
 }
 
 BENCHMARK(BM_Parse)->Unit(benchmark::kMillisecond)->MinTime(3);
@@ -223,6 +244,10 @@ BENCHMARK(BM_ParseAndExtract)->Unit(benchmark::kMillisecond)->MinTime(3);
 BENCHMARK(BM_StoreUnchanged)->Unit(benchmark::kMillisecond)->MinTime(3)->MeasureProcessCPUTime();
 BENCHMARK(BM_StoreChannels)->Unit(benchmark::kMillisecond)->MinTime(3)->MeasureProcessCPUTime();
 BENCHMARK(BM_StoreChannelsMixedAxes)
+    ->Unit(benchmark::kMillisecond)
+    ->MinTime(3)
+    ->MeasureProcessCPUTime();
+BENCHMARK(BM_StoreChannelsKeyedApart)
     ->Unit(benchmark::kMillisecond)
     ->MinTime(3)
     ->MeasureProcessCPUTime();
@@ -279,6 +304,7 @@ int main(int argc, char** argv) {
     };
     ratio("BM_StoreChannels", "BM_StoreUnchanged", 1.5);
     ratio("BM_StoreChannelsMixedAxes", "BM_StoreUnchanged", 1.5);
+    ratio("BM_StoreChannelsKeyedApart", "BM_StoreUnchanged", 1.5);
     ratio("BM_ParseAndExtract", "BM_Parse", 1.3);
     std::remove(scene_path().c_str());
     std::remove(out_path().c_str());
