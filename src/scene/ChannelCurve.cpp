@@ -189,9 +189,16 @@ double ChannelCurve::slopeAfter(size_t after, double seconds, double eps, bool o
 }
 
 bool ChannelCurve::Constant() const {
+    // With every value the same, smooth, linear and flat slopes are all zero: only a slope
+    // given explicitly can move the curve between its keys.
+    for (const Key& k : keys_) {
+        if (k.value != keys_.front().value) {
+            return false;
+        }
+    }
     for (size_t i = 0; i + 1 < keys_.size(); ++i) {
-        if (keys_[i].value != keys_[i + 1].value ||
-            (keys_[i].out != kStep && (OutSlope(i) != 0 || InSlope(i + 1) != 0))) {
+        if (keys_[i].out != kStep && ((keys_[i].out == kExplicit && keys_[i].outSlope != 0) ||
+                                      (keys_[i + 1].in == kExplicit && keys_[i + 1].inSlope != 0))) {
             return false;
         }
     }

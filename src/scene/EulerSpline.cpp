@@ -71,26 +71,55 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
     if (n < 2 || n > maxKnots) {
         return false;
     }
-    std::vector<CurveCursor> cursors;
-    cursors.reserve(3);
-    int cursorOf[3] = {-1, -1, -1};
+    // Each axis's half-angle and its slopes (radians per second) at every knot.
+    std::vector<double> half[3], arrive[3], leave[3];
     for (int a = 0; a < 3; ++a) {
-        if (curves_[a]) {
-            cursorOf[a] = int(cursors.size());
-            cursors.emplace_back(*curves_[a]);
+        half[a].resize(n);
+        arrive[a].resize(n);
+        leave[a].resize(n);
+        if (!curves_[a]) {
+            std::fill(half[a].begin(), half[a].end(), angles_[a] * kHalfRadians);
+            continue;
+        }
+        CurveCursor cursor(*curves_[a]);
+        for (size_t k = 0; k < n; ++k) {
+            const CurveCursor::Point p = cursor.At(times[k]);
+            half[a][k] = p.value * kHalfRadians;
+            arrive[a][k] = p.arriving * kHalfRadians;
+            leave[a][k] = p.leaving * kHalfRadians;
         }
     }
+    // The parts of each piece.
     const double allowed = toleranceDegrees * 3.14159265358979323846 / 180;
-    // Room for one knot per time; a piece cut into parts makes more (and more room).
+    std::vector<unsigned char> parts;
+    const size_t knots = PieceBound::PartsOfPieces(
+        n - 1,
+        [&](size_t k) {
+            const double dt = times[k + 1] - times[k];
+            PieceBound bound;
+            for (int a = 0; a < 3; ++a) {
+                const double m0 = leave[a][k] * dt, m1 = arrive[a][k + 1] * dt;
+                // (an axis that holds across the piece adds nothing)
+                if (half[a][k] != half[a][k + 1] || m0 != 0 || m1 != 0) {
+                    bound.Add(half[a][k], half[a][k + 1], m0, m1);
+                }
+            }
+            return bound;
+        },
+        [&](size_t k) { return times[k]; }, allowed, false, maxKnots, &parts);
+    if (knots == 0) {
+        return false;
+    }
+
     BuiltSampler s;
-    s.SizeQuaternionKnots(n);
-    size_t knots = 0;
+    float* v = s.SizeQuaternionKnots(knots);
+    float* time = s.times.data();
     // Each axis's last half-angle and its cosine and sine: an axis that holds (before its first
     // key, after its last, or without a curve) needs them once.
     double lastHalf[3] = {NAN, NAN, NAN}, c[3] = {1, 1, 1}, sn[3] = {0, 0, 0};
-    // One knot: its time, the half-angles there and their slopes on either side (radians per
-    // second). The rotation's derivative by one half-angle is the product with that axis's
-    // cosine and sine turned a quarter ahead, (-sin, cos).
+    // One knot: its time, the half-angles there and their slopes on either side. The
+    // rotation's derivative by one half-angle is the product with that axis's cosine and sine
+    // turned a quarter ahead, (-sin, cos).
     auto put = [&](double at, const double h[3], const double in[3], const double out[3]) {
         double q[4], dIn[4] = {0, 0, 0, 0}, dOut[4] = {0, 0, 0, 0};
         for (int a = 0; a < 3; ++a) {
@@ -114,74 +143,39 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
                 dOut[i] += dq[i] * out[a];
             }
         }
-        s.times[knots] = stored(at);
-        float* v = reinterpret_cast<float*>(s.valueBytes.data()) + knots * 12;
-        for (int i = 0; i < 4; ++i) {
-            v[i] = stored(dIn[i]);
-            v[4 + i] = stored(q[i]);
-            v[8 + i] = stored(dOut[i]);
+        *time++ = stored(at);
+        for (int i = 0; i < 4; ++i, ++v) {
+            v[0] = stored(dIn[i]);
+            v[4] = stored(q[i]);
+            v[8] = stored(dOut[i]);
         }
-        ++knots;
+        v += 8;
     };
-    // Knot by knot, each piece checked against the bound as its end is reached: every axis's
-    // half-angle and slopes at the piece's start (`h0`, `leave0`) and end.
-    double h0[3] = {0, 0, 0}, leave0[3] = {0, 0, 0};
     for (size_t k = 0; k < n; ++k) {
-        double h[3], in[3], out[3];
-        for (int a = 0; a < 3; ++a) {
-            if (cursorOf[a] >= 0) {
-                const CurveCursor::Point p = cursors[size_t(cursorOf[a])].At(times[k]);
-                h[a] = p.value * kHalfRadians;
-                in[a] = p.arriving * kHalfRadians;
-                out[a] = p.leaving * kHalfRadians;
-            } else {
-                h[a] = angles_[a] * kHalfRadians;
-                in[a] = out[a] = 0;
-            }
-        }
-        if (k > 0) {
-            const double dt = times[k] - times[k - 1];
-            PieceBound bound;
-            double m0[3], m1[3];
-            for (int a = 0; a < 3; ++a) {
-                m0[a] = leave0[a] * dt;
-                m1[a] = in[a] * dt;
-                // (an axis that holds across the piece adds nothing)
-                if (h0[a] != h[a] || m0[a] != 0 || m1[a] != 0) {
-                    bound.Add(h0[a], h[a], m0[a], m1[a]);
-                }
-            }
-            const int parts = bound.Parts(times[k - 1], times[k], allowed, false);
-            if (parts == 0 || knots + size_t(parts) + (n - k - 1) > maxKnots) {
-                return false;
-            }
-            if (parts > 1) {
-                const size_t room = knots + size_t(parts) + (n - k - 1);
-                if (room > s.times.size()) {
-                    s.times.resize(room);
-                    s.SizeValues(room * 12);
-                }
-                // The cut points: on each axis's cubic in u = 0..1.
-                double b[3], a3[3];
-                for (int a = 0; a < 3; ++a) {
-                    b[a] = 3 * (h[a] - h0[a]) - 2 * m0[a] - m1[a];
-                    a3[a] = 2 * (h0[a] - h[a]) + m0[a] + m1[a];
-                }
-                for (int j = 1; j < parts; ++j) {
-                    const double u = double(j) / parts;
-                    double hu[3], slope[3];
-                    for (int a = 0; a < 3; ++a) {
-                        hu[a] = h0[a] + u * (m0[a] + u * (b[a] + u * a3[a]));
-                        slope[a] = (m0[a] + u * (2 * b[a] + 3 * a3[a] * u)) / dt;
-                    }
-                    put(times[k - 1] + u * dt, hu, slope, slope);
-                }
-            }
-        }
+        const double h[3] = {half[0][k], half[1][k], half[2][k]};
+        const double in[3] = {arrive[0][k], arrive[1][k], arrive[2][k]};
+        const double out[3] = {leave[0][k], leave[1][k], leave[2][k]};
         put(times[k], h, in, out);
+        if (k + 1 == n || parts[k] == 1) {
+            continue;
+        }
+        // The cut points of a piece cut into parts: on each axis's cubic in u = 0..1.
+        const double dt = times[k + 1] - times[k];
+        double m0[3], b[3], a3[3];
         for (int a = 0; a < 3; ++a) {
-            h0[a] = h[a];
-            leave0[a] = out[a];
+            const double p0 = half[a][k], p1 = half[a][k + 1], m1 = arrive[a][k + 1] * dt;
+            m0[a] = leave[a][k] * dt;
+            b[a] = 3 * (p1 - p0) - 2 * m0[a] - m1;
+            a3[a] = 2 * (p0 - p1) + m0[a] + m1;
+        }
+        for (int j = 1; j < parts[k]; ++j) {
+            const double u = double(j) / parts[k];
+            double hu[3], slope[3];
+            for (int a = 0; a < 3; ++a) {
+                hu[a] = half[a][k] + u * (m0[a] + u * (b[a] + u * a3[a]));
+                slope[a] = (m0[a] + u * (2 * b[a] + 3 * a3[a] * u)) / dt;
+            }
+            put(times[k] + u * dt, hu, slope, slope);
         }
     }
     for (size_t j = 1; j < knots; ++j) {

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstddef>
+#include <vector>
 
 // How many equal parts a cubic quaternion piece needs to stay within a tolerance of a rotation
 // whose Euler half-angles run along cubics over the piece. The rotation is the product of one
@@ -33,11 +35,28 @@ class PieceBound {
     // up to kMaxParts will do. With `oneAxis` (only one half-angle was added, between fixed
     // rotations) only the error across the rotation's path counts, which is the smaller.
     int Parts(double t0, double t1, double allowedRadians, bool oneAxis) const {
-        // The knots' times are floats: a piece may sit up to half a float step off at either
-        // end, moving what a player reads by the turning speed times that (and its tangents a
-        // little).
-        const double drift =
-            std::max(std::fabs(t0), std::fabs(t1)) * kHalfFloatStep * 2.6 * first_ / (t1 - t0);
+        return PartsAllowing(Drift(std::max(std::fabs(t0), std::fabs(t1)), first_, t1 - t0),
+                             allowedRadians, oneAxis);
+    }
+
+    // How far a piece may stray because its knots' times are floats: a knot may sit up to half
+    // a float step off its time (at most `latest` seconds), moving what a player reads by the
+    // turning speed (`first` radians over `dt` seconds) times that, and its tangents a little.
+    static double Drift(double latest, double first, double dt) {
+        return latest * kHalfFloatStep * 2.6 * first / dt;
+    }
+    // The turning speed the bound allows over a piece of `dt` seconds (radians per second).
+    double Speed(double dt) const { return first_ / dt; }
+    // Widens the bound to cover `other` as well: a curve whose widest bound needs one part
+    // (with the drift of its fastest piece at its latest time) needs one in every piece.
+    void Widen(const PieceBound& other) {
+        first_ = std::max(first_, other.first_);
+        second_ = std::max(second_, other.second_);
+        third_ = std::max(third_, other.third_);
+    }
+
+    // Parts, for a piece that float times may move by `drift` radians.
+    int PartsAllowing(double drift, double allowedRadians, bool oneAxis) const {
         double by = 1;  // 1 / parts, multiplied rather than divided: most pieces need one part
         for (int parts = 1; parts <= kMaxParts; by = 1.0 / ++parts) {
             const double A = first_ * by, B = second_ * by * by, C = third_ * by * by * by;
@@ -57,6 +76,51 @@ class PieceBound {
             }
         }
         return 0;
+    }
+
+    // The parts of each of `pieces` pieces into `parts`, and the knots they make (one more
+    // than the parts), or 0 when a piece needs more than kMaxParts or the knots would number
+    // more than `maxKnots`. `boundOf(i)` is piece i's bound and `timeOf(i)` the time it starts
+    // (piece i ends at timeOf(i + 1)). The pieces are taken in blocks, and a block whose widest
+    // bound, drifting as its fastest piece at its latest time, needs one part needs one in
+    // every piece: most blocks of a lip-sync curve do, without asking piece by piece.
+    template <class BoundOf, class TimeOf>
+    static size_t PartsOfPieces(size_t pieces, const BoundOf& boundOf, const TimeOf& timeOf,
+                                double allowedRadians, bool oneAxis, size_t maxKnots,
+                                std::vector<unsigned char>* parts) {
+        constexpr size_t kBlock = 32;
+        parts->assign(pieces, 1);
+        size_t knots = 1;
+        for (size_t start = 0; start < pieces; start += kBlock) {
+            const size_t end = std::min(pieces, start + kBlock);
+            PieceBound bounds[kBlock], widest;
+            double fastest = 0;
+            for (size_t i = start; i < end; ++i) {
+                const PieceBound& b = bounds[i - start] = boundOf(i);
+                widest.Widen(b);
+                fastest = std::max(fastest, b.Speed(timeOf(i + 1) - timeOf(i)));
+            }
+            // (the fastest a hair faster: a piece's own drift rounds in another order)
+            const double latest = std::max(std::fabs(timeOf(start)), std::fabs(timeOf(end)));
+            if (widest.PartsAllowing(Drift(latest, fastest * (1 + 1e-12), 1.0), allowedRadians,
+                                     oneAxis) == 1) {
+                knots += end - start;
+            } else {
+                for (size_t i = start; i < end; ++i) {
+                    const int p =
+                        bounds[i - start].Parts(timeOf(i), timeOf(i + 1), allowedRadians, oneAxis);
+                    if (p == 0) {
+                        return 0;
+                    }
+                    (*parts)[i] = static_cast<unsigned char>(p);
+                    knots += size_t(p);
+                }
+            }
+            if (knots > maxKnots) {
+                return 0;
+            }
+        }
+        return knots;
     }
 
   private:

@@ -47,8 +47,6 @@ bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* o
     const double allowed = toleranceDegrees * kPi / 180;
     // Each key's slopes, in half-angle radians per second, and each piece's number of parts.
     std::vector<double> in, leave;
-    std::vector<int> parts(n - 1);
-    size_t knots = 1;
     curve_.Slopes(&in, &leave);
     for (size_t i = 0; i < n; ++i) {
         in[i] *= kHalfRadians;
@@ -58,15 +56,20 @@ bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* o
         if (keys[i].out == ChannelCurve::kStep) {
             return false;  // a jump at the next key, which a spline cannot make
         }
-        const double dt = keys[i + 1].time - keys[i].time;
-        PieceBound bound;
-        bound.Add(keys[i].value * kHalfRadians, keys[i + 1].value * kHalfRadians, leave[i] * dt,
+    }
+    std::vector<unsigned char> parts;
+    const size_t knots = PieceBound::PartsOfPieces(
+        n - 1,
+        [&](size_t i) {
+            const double dt = keys[i + 1].time - keys[i].time;
+            PieceBound b;
+            b.Add(keys[i].value * kHalfRadians, keys[i + 1].value * kHalfRadians, leave[i] * dt,
                   in[i + 1] * dt);
-        parts[i] = bound.Parts(keys[i].time, keys[i + 1].time, allowed, true);
-        knots += size_t(parts[i]);
-        if (parts[i] == 0 || knots > maxKnots) {
-            return false;
-        }
+            return b;
+        },
+        [&](size_t i) { return keys[i].time; }, allowed, true, maxKnots, &parts);
+    if (knots == 0) {
+        return false;
     }
     BuiltSampler s;
     float* v = s.SizeQuaternionKnots(knots);

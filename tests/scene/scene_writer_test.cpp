@@ -159,6 +159,14 @@ struct TurnCase {
 };
 // A head keyed every three frames on every axis, swinging by `scale` times a few degrees about
 // rest angles of its own, with every kind of tangent.
+// A jaw keyed every three frames for ten seconds, barely moving but for one wide swing late
+// on: only the pieces of that swing are cut.
+TurnCase LateSwing(const char* name, float swing) {
+    TurnCase c{name, false, "CUBICSPLINE", true, {}};
+    for (int k = 0; k < 100; ++k)
+        c.keys[0].push_back({600 * k, k == 77 ? swing : 0.2f * std::sin(k * 0.9f), k % 3, k % 2});
+    return c;
+}
 TurnCase Head(const char* name, float scale, const char* interpolation, bool cut) {
     const float rest[3] = {0, 10, -5};
     const float swing[3][5] = {{0, 4, -3, 5, 0}, {0, 4, -4, 2, 0}, {0, 3, -3, 0, -1}};
@@ -254,6 +262,7 @@ INSTANTIATE_TEST_SUITE_P(
         // A head nodding, shaking and tilting at once, keyed every three frames on every axis:
         // pieces cut finely enough would outnumber the frames, so it is sampled.
         Head("ThreeAxesDense", 1, "LINEAR", false),
+        LateSwing("OneWideSwingLate", 25),
         // The same head swaying a tenth as far: cubic pieces, some cut.
         Head("ThreeAxesGentle", 0.1f, "CUBICSPLINE", true),
         // Big tumbles about two axes keyed at different times: pieces at the union of the key
