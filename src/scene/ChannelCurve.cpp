@@ -293,6 +293,36 @@ size_t ChannelCurve::TrimBefore(double seconds) {
     return first;
 }
 
+std::vector<double> ChannelCurve::UnionTimes(const ChannelCurve* const curves[], size_t count) {
+    std::vector<double> all, merged;
+    for (size_t c = 0; c < count; ++c) {
+        if (!curves[c]) {
+            continue;
+        }
+        const std::vector<Key>& keys = curves[c]->keys_;
+        merged.resize(all.size() + keys.size());
+        size_t i = 0, j = 0, at = 0;
+        while (i < all.size() && j < keys.size()) {
+            merged[at++] = keys[j].time < all[i] ? keys[j++].time : all[i++];
+        }
+        for (; i < all.size(); ++i) {
+            merged[at++] = all[i];
+        }
+        for (; j < keys.size(); ++j) {
+            merged[at++] = keys[j].time;
+        }
+        all.swap(merged);
+    }
+    size_t kept = 0;
+    for (double t : all) {
+        if (kept == 0 || float(t) > float(all[kept - 1])) {
+            all[kept++] = t;
+        }
+    }
+    all.resize(kept);
+    return all;
+}
+
 bool ChannelCurve::FromApplyArrays(int count, const CueTime* times, const float* values,
                                    const int* inTangents, const int* outTangents,
                                    std::vector<Key>* keys) {

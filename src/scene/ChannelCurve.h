@@ -71,6 +71,10 @@ class ChannelCurve : public OrChannel {
     // (slopes that depended on a dropped key are made explicit). Returns the keys dropped.
     size_t TrimBefore(double seconds);
 
+    // Every key time of the `count` curves (null ones left out), ascending; times that round
+    // to one float (as a file stores them) are one time, the earliest.
+    static std::vector<double> UnionTimes(const ChannelCurve* const curves[], size_t count);
+
     // The curve kind of a scene tangent code (KLWire::Tangent); unknown codes are linear.
     static Kind KindFromCode(int code) {
         return code == KLWire::kSmooth ? kSmooth : (code == KLWire::kFlat ? kFlat : kLinear);

@@ -35,38 +35,17 @@ EulerSpline::EulerSpline(const ChannelCurve* const curves[3], const double angle
 }
 
 bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) const {
-    // Every axis's key times, once each; a spline cannot jump, so no axis may step.
-    std::vector<double> times, merged;
+    // A spline cannot jump, so no axis may step.
     for (const ChannelCurve* c : curves_) {
-        if (!c) {
-            continue;
-        }
-        const auto& keys = c->keys();
-        for (size_t k = 0; k + 1 < keys.size(); ++k) {
-            if (keys[k].out == ChannelCurve::kStep) {
+        for (size_t k = 0; c && k + 1 < c->keys().size(); ++k) {
+            if (c->keys()[k].out == ChannelCurve::kStep) {
                 return false;
             }
         }
-        merged.resize(times.size() + keys.size());
-        auto at = merged.begin();
-        auto from = times.begin();
-        for (const ChannelCurve::Key& k : keys) {
-            while (from != times.end() && *from < k.time) {
-                *at++ = *from++;
-            }
-            if (from == times.end() || *from != k.time) {
-                *at++ = k.time;
-            }
-        }
-        at = std::copy(from, times.end(), at);
-        merged.resize(size_t(at - merged.begin()));
-        times.swap(merged);
     }
-    // Key times of different axes that round to one float are one knot: each axis is
-    // evaluated there as at its own key (within float rounding, see ChannelCurve).
-    times.erase(std::unique(times.begin(), times.end(),
-                            [](double a, double b) { return float(a) == float(b); }),
-                times.end());
+    // Every axis's key times; those that round to one float are one knot, each axis read there
+    // as at its own key (within float rounding, see CurveCursor).
+    const std::vector<double> times = ChannelCurve::UnionTimes(curves_, 3);
     const size_t n = times.size();
     if (n < 2 || n > maxKnots) {
         return false;

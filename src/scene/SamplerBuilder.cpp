@@ -261,7 +261,7 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     // A piece of a cubic is a cubic: cutting every axis at the union of the key times keeps
     // each axis exact, with the slope on either side of every cut.
     out->interpolation = "CUBICSPLINE";
-    const std::vector<double> times = unionTimes();
+    const std::vector<double> times = ChannelCurve::UnionTimes(curves_, 3);
     const size_t n = times.size();
     out->times.resize(n);
     float* const values = out->SizeValues(n * 9);
@@ -304,30 +304,6 @@ size_t SamplerBuilder::sampledAtMost() const {
     return size_t(std::min(double(kMaxSampledFrames), std::max(0.0, frames) + keys));
 }
 
-std::vector<double> SamplerBuilder::unionTimes() const {
-    std::vector<double> all, one, merged;
-    for (const ChannelCurve* c : curves_) {
-        if (!c) {
-            continue;
-        }
-        one.clear();
-        for (const ChannelCurve::Key& k : c->keys()) {
-            one.push_back(k.time);
-        }
-        merged.resize(all.size() + one.size());
-        std::merge(all.begin(), all.end(), one.begin(), one.end(), merged.begin());
-        all.swap(merged);
-    }
-    std::vector<double> out;
-    out.reserve(all.size());
-    for (double t : all) {
-        if (out.empty() || float(t) > float(out.back())) {
-            out.push_back(t);
-        }
-    }
-    return out;
-}
-
 std::vector<char> SamplerBuilder::plainSpans(const std::vector<double>& keys,
                                              double straightUpTo) const {
     std::vector<char> still(keys.empty() ? 0 : keys.size() - 1, 1);
@@ -362,7 +338,7 @@ std::vector<char> SamplerBuilder::plainSpans(const std::vector<double>& keys,
 
 bool SamplerBuilder::candidateTimes(std::vector<double>* out, double straightUpTo,
                                     std::string* why) const {
-    std::vector<double> keys = unionTimes();
+    std::vector<double> keys = ChannelCurve::UnionTimes(curves_, 3);
     std::vector<char> still = plainSpans(keys, straightUpTo);
     // Count first, so that a curve that would need too many samples costs no memory.
     double count = double(keys.size());

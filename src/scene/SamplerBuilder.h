@@ -78,8 +78,6 @@ class SamplerBuilder {
     void unionCubic(BuiltSampler* out) const;
     // About how many frames and keys sampling would look at (kMaxSampledFrames at most).
     size_t sampledAtMost() const;
-    // Every axis key time, ascending, one per distinct float.
-    std::vector<double> unionTimes() const;
     // The union key times plus the whole frames inside every span that is not plain (see
     // plainSpans); false when that is more than kMaxSampledFrames.
     bool candidateTimes(std::vector<double>* times, double straightUpTo, std::string* why) const;
