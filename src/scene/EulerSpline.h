@@ -6,7 +6,8 @@ class ChannelCurve;
 struct BuiltSampler;
 
 // A rotation whose Euler angles move about more than one axis, written as CUBICSPLINE
-// quaternion pieces at the union of its axes' key times. Between two of those times every axis
+// quaternion pieces at the union of its axes' key times (times that round to one float being
+// one knot, see ChannelCurve::UnionTimes). Between two of those times every axis
 // runs along one cubic, so each knot's value and slopes follow from the angles and their slopes
 // there, and a piece whose bound on how far it (normalised, as players do) strays from the
 // rotation exceeds the tolerance is cut into equal parts (see PieceBound).
@@ -18,9 +19,9 @@ class EulerSpline {
 
     // Writes the knots into `out` (CUBICSPLINE, in-tangent, value, out-tangent per knot), each
     // piece within `toleranceDegrees` of the rotation at every time it covers, allowing for the
-    // knots' times being stored as floats. False, with `out` untouched, when an axis steps,
-    // two key times fall on one float, a piece would need more than PieceBound::kMaxParts
-    // parts, or the knots would number more than `maxKnots`.
+    // knots' times being stored as floats. False, with `out` untouched, when an axis steps, a
+    // piece would need more than PieceBound::kMaxParts parts, the knots would number more than
+    // `maxKnots`, or two of them (the cuts of a piece a float step long) fall on one float.
     bool Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) const;
 
   private:
