@@ -87,9 +87,9 @@ const std::string& scene_path() {
                                    allAxes ? float(0.1 * std::cos(k * 0.07 + n)) : 0.0f});
                 double h = s * 0.5, g = allAxes ? 0.2 * std::cos(k * 0.05 + n) : 0.0;
                 // (cos g + j sin g)(cos h + i sin h): a turn about X by 2h, then about Y by 2g
-                r.insert(r.end(), {float(std::cos(g) * std::sin(h)), float(std::sin(g) * std::cos(h)),
-                                   float(-std::sin(g) * std::sin(h)),
-                                   float(std::cos(g) * std::cos(h))});
+                r.insert(r.end(),
+                         {float(std::cos(g) * std::sin(h)), float(std::sin(g) * std::cos(h)),
+                          float(-std::sin(g) * std::sin(h)), float(std::cos(g) * std::cos(h))});
             }
             const char* paths[2] = {"translation", "rotation"};
             std::vector<float>* values[2] = {&t, &r};

@@ -197,8 +197,9 @@ bool ChannelCurve::Constant() const {
         }
     }
     for (size_t i = 0; i + 1 < keys_.size(); ++i) {
-        if (keys_[i].out != kStep && ((keys_[i].out == kExplicit && keys_[i].outSlope != 0) ||
-                                      (keys_[i + 1].in == kExplicit && keys_[i + 1].inSlope != 0))) {
+        if (keys_[i].out != kStep &&
+            ((keys_[i].out == kExplicit && keys_[i].outSlope != 0) ||
+             (keys_[i + 1].in == kExplicit && keys_[i + 1].inSlope != 0))) {
             return false;
         }
     }

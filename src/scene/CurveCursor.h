@@ -59,9 +59,9 @@ class CurveCursor {
             const double u = (seconds - t0_) / dt_, u2 = u * u, u3 = u2 * u;
             p.value = (2 * u3 - 3 * u2 + 1) * v0_ + (u3 - 2 * u2 + u) * m0_ +
                       (-2 * u3 + 3 * u2) * v1_ + (u3 - u2) * m1_;
-            p.arriving = p.leaving =
-                ((6 * u2 - 6 * u) * (v0_ - v1_) + (3 * u2 - 4 * u + 1) * m0_ + (3 * u2 - 2 * u) * m1_) /
-                dt_;
+            p.arriving = p.leaving = ((6 * u2 - 6 * u) * (v0_ - v1_) + (3 * u2 - 4 * u + 1) * m0_ +
+                                      (3 * u2 - 2 * u) * m1_) /
+                                     dt_;
         }
         return p;
     }

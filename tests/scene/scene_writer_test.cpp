@@ -262,6 +262,7 @@ INSTANTIATE_TEST_SUITE_P(
         // A head nodding, shaking and tilting at once, keyed every three frames on every axis:
         // pieces cut finely enough would outnumber the frames, so it is sampled.
         Head("ThreeAxesDense", 1, "LINEAR", false),
+        // Gentle for ten seconds but for one wide swing: only that swing's pieces are cut.
         LateSwing("OneWideSwingLate", 25),
         // The same head swaying a tenth as far: cubic pieces, some cut.
         Head("ThreeAxesGentle", 0.1f, "CUBICSPLINE", true),
