@@ -301,6 +301,12 @@ std::vector<double> ChannelCurve::UnionTimes(const ChannelCurve* const curves[],
             continue;
         }
         const std::vector<Key>& keys = curves[c]->keys_;
+        // Axes of one keyset share their key times: nothing to merge.
+        if (keys.size() == all.size() &&
+            std::equal(all.begin(), all.end(), keys.begin(),
+                       [](double t, const Key& k) { return t == k.time; })) {
+            continue;
+        }
         merged.resize(all.size() + keys.size());
         size_t i = 0, j = 0, at = 0;
         while (i < all.size() && j < keys.size()) {
