@@ -39,6 +39,15 @@ wait_until_not() {
     done
     return 1
 }
+# Presses the key until a window of that title shows (up to three times, 5 s each): a key
+# pressed while the window is still being mapped can be lost.
+press_for() {
+    for _ in 1 2 3; do
+        xdotool key "$1"
+        timeout 5 xdotool search --sync --onlyvisible --name "^$2\$" >/dev/null && return 0
+    done
+    fail "$1 did not open \"$2\""
+}
 # In the browser of that title, replaces the path typed and presses Return; waits until it goes.
 choose() {
     local browser
@@ -65,12 +74,12 @@ main=$(wait_window "Chirrup: mouth")
 xdotool mousemove --window "$main" 600 600
 
 # Ctrl+O opens the demo track, Ctrl+S saves it under a new name.
-xdotool key ctrl+o
+press_for ctrl+o "Open Track"
 choose "Open Track" "$work/project/misc_data/demo.track"
 kill -0 "$pid" 2>/dev/null || fail "the program ended while opening the track"
 xdotool mousemove --window "$main" 600 600
 shot e2e-track-opened
-xdotool key ctrl+s
+press_for ctrl+s "Save Track As"
 choose "Save Track As" "$work/project/misc_data/saved.track"
 [ -s "$work/project/misc_data/saved.track" ] || fail "the track was not saved"
 grep -q "keytrack" "$work/project/misc_data/saved.track" || fail "the saved track has no key tracks"
