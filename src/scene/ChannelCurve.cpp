@@ -6,6 +6,7 @@
 #include <iterator>
 
 #include "scene/CurveCursor.h"
+#include "scene/HermiteSegment.h"
 #include "toolkit/CueTime.h"
 
 double ChannelCurve::segmentSlope(size_t i) const {
@@ -91,19 +92,10 @@ double ChannelCurve::MaxSlope() const {
         if (keys_[i].out == kStep) {
             continue;
         }
-        // The segment's cubic in u = 0..1: its slope m0 + 2bu + 3au^2 peaks at an end or at
-        // u = -b / 3a.
         const double dt = keys_[i + 1].time - keys_[i].time;
-        const double m0 = out[i] * dt, m1 = in[i + 1] * dt,
-                     dv = keys_[i + 1].value - keys_[i].value;
-        const double b = 3 * dv - 2 * m0 - m1, a = -2 * dv + m0 + m1;
-        double peak = std::max(std::fabs(m0), std::fabs(m1));
-        const double u = a != 0 ? -b / (3 * a) : -1;
-        if (u > 0 && u < 1) {
-            peak = std::max(peak, std::fabs(m0 + 2 * b * u + 3 * a * u * u));
-        }
         if (dt > 0) {
-            most = std::max(most, peak / dt);
+            const HermiteCubic h(keys_[i].value, keys_[i + 1].value, out[i] * dt, in[i + 1] * dt);
+            most = std::max(most, h.PeakSlope() / dt);
         }
     }
     return most;
@@ -142,11 +134,7 @@ double ChannelCurve::segment(size_t i, double seconds) const {
     if (a.out == kLinear && b.in == kLinear) {
         return a.value + (b.value - a.value) * u;  // exact straight line
     }
-    double m0 = OutSlope(i) * dt;
-    double m1 = InSlope(i + 1) * dt;
-    double u2 = u * u, u3 = u2 * u;
-    return (2 * u3 - 3 * u2 + 1) * a.value + (u3 - 2 * u2 + u) * m0 + (-2 * u3 + 3 * u2) * b.value +
-           (u3 - u2) * m1;
+    return HermiteSegment(a.value, b.value, OutSlope(i) * dt, InSlope(i + 1) * dt, u);
 }
 
 double ChannelCurve::SlopeAt(double seconds, bool outgoing) const {
@@ -181,11 +169,8 @@ double ChannelCurve::slopeAfter(size_t after, double seconds, double eps, bool o
     if (a.out == kLinear && b.in == kLinear) {
         return (b.value - a.value) / dt;
     }
-    double u = (seconds - a.time) / dt;
-    double m0 = OutSlope(i) * dt, m1 = InSlope(i + 1) * dt;
-    return ((6 * u * u - 6 * u) * (a.value - b.value) + (3 * u * u - 4 * u + 1) * m0 +
-            (3 * u * u - 2 * u) * m1) /
-           dt;
+    const double u = (seconds - a.time) / dt;
+    return HermiteSlope(a.value, b.value, OutSlope(i) * dt, InSlope(i + 1) * dt, u) / dt;
 }
 
 bool ChannelCurve::Constant() const {

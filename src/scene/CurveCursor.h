@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "scene/ChannelCurve.h"
+#include "scene/HermiteSegment.h"
 
 // Reads a key curve at times that never go back: its value there and its slopes arriving and
 // leaving (units per second), every key's slopes worked out once and each segment's cubic once
@@ -56,12 +57,9 @@ class CurveCursor {
             p.value = v0_ + (v1_ - v0_) * ((seconds - t0_) / dt_);  // as Evaluate has it
             p.arriving = p.leaving = (v1_ - v0_) / dt_;
         } else {
-            const double u = (seconds - t0_) / dt_, u2 = u * u, u3 = u2 * u;
-            p.value = (2 * u3 - 3 * u2 + 1) * v0_ + (u3 - 2 * u2 + u) * m0_ +
-                      (-2 * u3 + 3 * u2) * v1_ + (u3 - u2) * m1_;
-            p.arriving = p.leaving = ((6 * u2 - 6 * u) * (v0_ - v1_) + (3 * u2 - 4 * u + 1) * m0_ +
-                                      (3 * u2 - 2 * u) * m1_) /
-                                     dt_;
+            const double u = (seconds - t0_) / dt_;
+            p.value = HermiteSegment(v0_, v1_, m0_, m1_, u);
+            p.arriving = p.leaving = HermiteSlope(v0_, v1_, m0_, m1_, u) / dt_;
         }
         return p;
     }

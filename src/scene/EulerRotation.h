@@ -9,6 +9,8 @@ class EulerRotation {
   public:
     using Vec3 = std::array<double, 3>;
     using Quat = std::array<double, 4>;
+    // A quaternion turns by half its angle: the half-angle in radians of one degree.
+    static constexpr double kHalfRadiansPerDegree = 3.14159265358979323846 / 360;
 
     // Euler degrees of `q` (normalised first; a zero quaternion is the identity), each angle
     // in [-180, 180].

@@ -6,16 +6,13 @@
 
 #include "scene/ChannelCurve.h"
 #include "scene/CurveCursor.h"
+#include "scene/EulerRotation.h"
+#include "scene/HermiteSegment.h"
 #include "scene/PieceBound.h"
 #include "scene/SamplerBuilder.h"
 
 namespace {
-constexpr double kHalfRadians = 3.14159265358979323846 / 360;  // half-angle radians per degree
-
-// Stored floats: a negative zero is written as zero.
-float stored(double v) {
-    return float(v) + 0.0f;
-}
+constexpr double kHalfRadians = EulerRotation::kHalfRadiansPerDegree;
 
 // qz * qy * qx, as EulerRotation::ToQuaternion, from each axis's half-angle cosine and sine.
 // Inlined: called for every knot, and a call's results would come back through memory.
@@ -122,11 +119,11 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
                 dOut[i] += dq[i] * out[a];
             }
         }
-        *time++ = stored(at);
+        *time++ = BuiltSampler::Stored(at);
         for (int i = 0; i < 4; ++i, ++v) {
-            v[0] = stored(dIn[i]);
-            v[4] = stored(q[i]);
-            v[8] = stored(dOut[i]);
+            v[0] = BuiltSampler::Stored(dIn[i]);
+            v[4] = BuiltSampler::Stored(q[i]);
+            v[8] = BuiltSampler::Stored(dOut[i]);
         }
         v += 8;
     };
@@ -140,19 +137,16 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
         }
         // The cut points of a piece cut into parts: on each axis's cubic in u = 0..1.
         const double dt = times[k + 1] - times[k];
-        double m0[3], b[3], a3[3];
-        for (int a = 0; a < 3; ++a) {
-            const double p0 = half[a][k], p1 = half[a][k + 1], m1 = arrive[a][k + 1] * dt;
-            m0[a] = leave[a][k] * dt;
-            b[a] = 3 * (p1 - p0) - 2 * m0[a] - m1;
-            a3[a] = 2 * (p0 - p1) + m0[a] + m1;
-        }
+        const HermiteCubic piece[3] = {
+            {half[0][k], half[0][k + 1], leave[0][k] * dt, arrive[0][k + 1] * dt},
+            {half[1][k], half[1][k + 1], leave[1][k] * dt, arrive[1][k + 1] * dt},
+            {half[2][k], half[2][k + 1], leave[2][k] * dt, arrive[2][k + 1] * dt}};
         for (int j = 1; j < parts[k]; ++j) {
             const double u = double(j) / parts[k];
             double hu[3], slope[3];
             for (int a = 0; a < 3; ++a) {
-                hu[a] = half[a][k] + u * (m0[a] + u * (b[a] + u * a3[a]));
-                slope[a] = (m0[a] + u * (2 * b[a] + 3 * a3[a] * u)) / dt;
+                hu[a] = piece[a].At(u);
+                slope[a] = piece[a].SlopeAt(u) / dt;
             }
             put(times[k] + u * dt, hu, slope, slope);
         }

@@ -5,6 +5,8 @@
 #include <cstddef>
 #include <vector>
 
+#include "scene/HermiteSegment.h"
+
 // How many equal parts a cubic quaternion piece needs to stay within a tolerance of a rotation
 // whose Euler half-angles run along cubics over the piece. The rotation is the product of one
 // turn per axis, exp(h(u) e) for the axis e and half-angle h, so the size of its fourth
@@ -20,14 +22,10 @@ class PieceBound {
     // Adds one axis's half-angle over the piece (radians): from p0 to p1, with slopes m0 and m1
     // in radians per piece (the slope per second times the piece's duration).
     void Add(double p0, double p1, double m0, double m1) {
-        const double b = 3 * (p1 - p0) - 2 * m0 - m1, a = 2 * (p0 - p1) + m0 + m1;
-        // The slope m0 + 2bu + 3au² peaks at an end or where the second derivative 2b + 6au
-        // is zero; clamped to the piece, that point gives an end's slope (m0 or m1) when it
-        // lies outside, so all three can be taken without asking which.
-        const double u = a != 0 ? std::min(1.0, std::max(0.0, -b / (3 * a))) : 0.0;
-        first_ += std::max({std::fabs(m0), std::fabs(m1), std::fabs(m0 + u * (2 * b + 3 * a * u))});
-        second_ += std::max(std::fabs(2 * b), std::fabs(2 * b + 6 * a));
-        third_ += std::fabs(6 * a);
+        const HermiteCubic h(p0, p1, m0, m1);
+        first_ += h.PeakSlope();
+        second_ += std::max(std::fabs(2 * h.b), std::fabs(2 * h.b + 6 * h.a));
+        third_ += std::fabs(6 * h.a);
     }
 
     // The parts the piece from time t0 to t1 (seconds) needs to stay within `allowedRadians`

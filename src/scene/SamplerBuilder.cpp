@@ -11,10 +11,6 @@
 #include "scene/TurnSpline.h"
 
 namespace {
-// Stored floats: a negative zero is written as zero.
-float stored(double v) {
-    return float(v) + 0.0f;
-}
 
 // The share of a tolerance that the choice of samples may use; the rest is left for the
 // rounding of what is stored as floats (a quaternion moves by about 1e-5 degrees, a value by
@@ -115,9 +111,9 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
     out->times.reserve(kept.size());
     float* v = out->SizeValues(kept.size() * 3);
     for (size_t k : kept) {
-        out->times.push_back(stored(times[k]));
+        out->times.push_back(BuiltSampler::Stored(times[k]));
         for (int a = 0; a < 3; ++a) {
-            *v++ = stored(axis[a].empty() ? rest_[a] : atStored[a][k]);
+            *v++ = BuiltSampler::Stored(axis[a].empty() ? rest_[a] : atStored[a][k]);
         }
     }
     return true;
@@ -158,7 +154,7 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
     auto angle = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : axis[a][k]; };
     auto end = [&](int a, size_t k) { return axis[a].empty() ? rest_[a] : atStored[a][k]; };
     const SampleReducer reducer(times, kRotationToleranceDegrees * kFitShare - drift);
-    const double halfRadians = 3.14159265358979323846 / 360;
+    const double halfRadians = EulerRotation::kHalfRadiansPerDegree;
     out->interpolation = "LINEAR";
     if (movingAxes <= 1) {
         // One axis turning between fixed ones: the rotation is a fixed one, a turn about that
@@ -195,10 +191,10 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
                                              0
                                     ? -1.0
                                     : 1.0;
-            out->times[n] = stored(times[k]);
+            out->times[n] = BuiltSampler::Stored(times[k]);
             for (size_t i = 0; i < 4; ++i) {
                 previous[i] = q[i] * side;
-                v[i] = stored(previous[i]);
+                v[i] = BuiltSampler::Stored(previous[i]);
             }
         }
         return true;
@@ -221,9 +217,9 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
                 x = -x;
             }
         }
-        out->times[n] = stored(times[kept[n]]);
+        out->times[n] = BuiltSampler::Stored(times[kept[n]]);
         for (size_t i = 0; i < 4; ++i) {
-            v[i] = stored(r[i]);
+            v[i] = BuiltSampler::Stored(r[i]);
         }
         previous = r;
     }
@@ -237,7 +233,7 @@ void SamplerBuilder::keysExact(BuiltSampler* out) const {
     out->times.resize(n);
     float* const values = out->SizeValues(n * stride);
     for (size_t k = 0; k < n; ++k) {
-        out->times[k] = stored(lead[k].time);
+        out->times[k] = BuiltSampler::Stored(lead[k].time);
     }
     // Axis by axis into the interleaved values: in-tangents, values, out-tangents of each key.
     std::vector<double> in, leave;
@@ -248,10 +244,10 @@ void SamplerBuilder::keysExact(BuiltSampler* out) const {
         }
         float* v = values + (cubic ? 3 : 0) + a;
         for (size_t k = 0; k < n; ++k, v += stride) {
-            v[0] = stored(c ? c->keys()[k].value : rest_[a]);
+            v[0] = BuiltSampler::Stored(c ? c->keys()[k].value : rest_[a]);
             if (cubic) {
-                v[-3] = c ? stored(in[k]) : 0.0f;
-                v[3] = c ? stored(leave[k]) : 0.0f;
+                v[-3] = c ? BuiltSampler::Stored(in[k]) : 0.0f;
+                v[3] = c ? BuiltSampler::Stored(leave[k]) : 0.0f;
             }
         }
     }
@@ -266,7 +262,7 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     out->times.resize(n);
     float* const values = out->SizeValues(n * 9);
     for (size_t k = 0; k < n; ++k) {
-        out->times[k] = stored(times[k]);
+        out->times[k] = BuiltSampler::Stored(times[k]);
     }
     // Axis by axis into the interleaved values: in-tangents, values, out-tangents of each knot.
     for (int a = 0; a < 3; ++a) {
@@ -274,7 +270,7 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
         if (!curves_[a]) {
             for (size_t k = 0; k < n; ++k, v += 9) {
                 v[-3] = 0.0f;
-                v[0] = stored(rest_[a]);
+                v[0] = BuiltSampler::Stored(rest_[a]);
                 v[3] = 0.0f;
             }
             continue;
@@ -282,9 +278,9 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
         CurveCursor cursor(*curves_[a]);
         for (size_t k = 0; k < n; ++k, v += 9) {
             const CurveCursor::Point p = cursor.At(times[k]);
-            v[-3] = stored(p.arriving);
-            v[0] = stored(p.value);
-            v[3] = stored(p.leaving);
+            v[-3] = BuiltSampler::Stored(p.arriving);
+            v[0] = BuiltSampler::Stored(p.value);
+            v[3] = BuiltSampler::Stored(p.leaving);
         }
     }
 }

@@ -28,6 +28,8 @@ struct BuiltSampler {
         return SizeValues(knots * 12);
     }
     const float* Values() const { return reinterpret_cast<const float*>(valueBytes.data()); }
+    // A time or value as it is written: a float, a negative zero written as zero.
+    static float Stored(double v) { return float(v) + 0.0f; }
     size_t ValueCount() const { return valueBytes.size() / sizeof(float); }
 };
 

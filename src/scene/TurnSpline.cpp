@@ -4,17 +4,15 @@
 #include <cmath>
 
 #include "scene/ChannelCurve.h"
+#include "scene/EulerRotation.h"
+#include "scene/HermiteSegment.h"
 #include "scene/PieceBound.h"
 #include "scene/SamplerBuilder.h"
 
 namespace {
 constexpr double kPi = 3.14159265358979323846;
-constexpr double kHalfRadians = kPi / 360;  // half-angle radians per degree
+constexpr double kHalfRadians = EulerRotation::kHalfRadiansPerDegree;
 
-// Stored floats: a negative zero is written as zero.
-float stored(double v) {
-    return float(v) + 0.0f;
-}
 }  // namespace
 
 TurnSpline::TurnSpline(const ChannelCurve& curve, int axis, const double angles[3])
@@ -83,11 +81,11 @@ bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* o
             q[c] = ch * p_[c] + sh * q_[c];
             dq[c] = ch * q_[c] - sh * p_[c];
         }
-        *time++ = stored(at);
+        *time++ = BuiltSampler::Stored(at);
         for (int c = 0; c < 4; ++c, ++v) {
-            v[0] = stored(dq[c] * arrive);
-            v[4] = stored(q[c]);
-            v[8] = stored(dq[c] * depart);
+            v[0] = BuiltSampler::Stored(dq[c] * arrive);
+            v[4] = BuiltSampler::Stored(q[c]);
+            v[8] = BuiltSampler::Stored(dq[c] * depart);
         }
         v += 8;
     };
@@ -99,14 +97,12 @@ bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* o
         }
         // The cut points of a piece cut into parts: on the piece's cubic in u = 0..1.
         const double dt = keys[i + 1].time - keys[i].time;
-        const double p0 = half, p1 = keys[i + 1].value * kHalfRadians;
-        const double m0 = leave[i] * dt, m1 = in[i + 1] * dt;
-        const double b = 3 * (p1 - p0) - 2 * m0 - m1, a = 2 * (p0 - p1) + m0 + m1;
+        const HermiteCubic piece(half, keys[i + 1].value * kHalfRadians, leave[i] * dt,
+                                 in[i + 1] * dt);
         for (int j = 1; j < parts[i]; ++j) {
             const double u = double(j) / parts[i];
-            const double h = p0 + u * (m0 + u * (b + u * a));
-            const double slope = (m0 + u * (2 * b + 3 * a * u)) / dt;
-            put(keys[i].time + u * dt, h, slope, slope);
+            const double slope = piece.SlopeAt(u) / dt;
+            put(keys[i].time + u * dt, piece.At(u), slope, slope);
         }
     }
     for (size_t j = 1; j < knots; ++j) {
