@@ -9,55 +9,6 @@
 #include "scene/HermiteSegment.h"
 #include "toolkit/CueTime.h"
 
-double ChannelCurve::segmentSlope(size_t i) const {
-    const Key& a = keys_[i];
-    const Key& b = keys_[i + 1];
-    double dt = b.time - a.time;
-    return dt > 0 ? (b.value - a.value) / dt : 0.0;
-}
-
-double ChannelCurve::smoothSlope(size_t i) const {
-    size_t n = keys_.size();
-    if (n < 2) {
-        return 0.0;
-    }
-    size_t lo = i == 0 ? 0 : i - 1;
-    size_t hi = i + 1 < n ? i + 1 : n - 1;
-    double dt = keys_[hi].time - keys_[lo].time;
-    return dt > 0 ? (keys_[hi].value - keys_[lo].value) / dt : 0.0;
-}
-
-namespace {
-// A key side's slope by its tangent kind: `smooth` the slope through the neighbouring keys,
-// `linear` the straight line to the neighbour on that side, `given` the explicit slope.
-double side_slope(ChannelCurve::Kind kind, double smooth, double linear, double given) {
-    switch (kind) {
-        case ChannelCurve::kSmooth:
-            return smooth;
-        case ChannelCurve::kLinear:
-            return linear;
-        case ChannelCurve::kExplicit:
-            return given;
-        case ChannelCurve::kFlat:
-        case ChannelCurve::kStep:
-            break;
-    }
-    return 0.0;
-}
-}  // namespace
-
-double ChannelCurve::OutSlope(size_t i) const {
-    const Key& k = keys_[i];
-    return side_slope(k.out, k.out == kSmooth ? smoothSlope(i) : 0.0,
-                      k.out == kLinear && i + 1 < keys_.size() ? segmentSlope(i) : 0.0, k.outSlope);
-}
-
-double ChannelCurve::InSlope(size_t i) const {
-    const Key& k = keys_[i];
-    return side_slope(k.in, k.in == kSmooth ? smoothSlope(i) : 0.0,
-                      k.in == kLinear && i > 0 ? segmentSlope(i - 1) : 0.0, k.inSlope);
-}
-
 void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) const {
     const size_t n = keys_.size();
     in->resize(n);
@@ -65,21 +16,10 @@ void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) con
     double before = 0.0;  // the slope of the segment arriving at key i
     for (size_t i = 0; i < n; ++i) {
         const Key& k = keys_[i];
-        // As segmentSlope(i) and smoothSlope(i), written out so that they are inlined.
-        double after = 0.0;
-        if (i + 1 < n) {
-            const double dt = keys_[i + 1].time - k.time;
-            after = dt > 0 ? (keys_[i + 1].value - k.value) / dt : 0.0;
-        }
-        double smooth = 0.0;
-        if ((k.in == kSmooth || k.out == kSmooth) && n >= 2) {
-            const Key& lo = keys_[i == 0 ? 0 : i - 1];
-            const Key& hi = keys_[i + 1 < n ? i + 1 : n - 1];
-            const double dt = hi.time - lo.time;
-            smooth = dt > 0 ? (hi.value - lo.value) / dt : 0.0;
-        }
-        (*in)[i] = side_slope(k.in, smooth, before, k.inSlope);
-        (*out)[i] = side_slope(k.out, smooth, after, k.outSlope);
+        const double after = i + 1 < n ? segmentSlope(i) : 0.0;
+        const double smooth = k.in == kSmooth || k.out == kSmooth ? smoothSlope(i) : 0.0;
+        (*in)[i] = SideSlope(k.in, smooth, before, k.inSlope);
+        (*out)[i] = SideSlope(k.out, smooth, after, k.outSlope);
         before = after;
     }
 }

@@ -48,9 +48,19 @@ class ChannelCurve : public OrChannel {
     double eval(double frame) const override;
 
     // The slope (units per second) with which the curve leaves key `i` (out) or arrives at it
-    // (in), resolved from the tangent kinds; a step leaves with slope 0.
-    double OutSlope(size_t i) const;
-    double InSlope(size_t i) const;
+    // (in), resolved from the tangent kinds; a step leaves with slope 0. Inline: a store reads
+    // them for every key it writes.
+    double OutSlope(size_t i) const {
+        const Key& k = keys_[i];
+        return SideSlope(k.out, k.out == kSmooth ? smoothSlope(i) : 0.0,
+                         k.out == kLinear && i + 1 < keys_.size() ? segmentSlope(i) : 0.0,
+                         k.outSlope);
+    }
+    double InSlope(size_t i) const {
+        const Key& k = keys_[i];
+        return SideSlope(k.in, k.in == kSmooth ? smoothSlope(i) : 0.0,
+                         k.in == kLinear && i > 0 ? segmentSlope(i - 1) : 0.0, k.inSlope);
+    }
     // InSlope and OutSlope of every key, in one pass (each segment's slope worked out once).
     void Slopes(std::vector<double>* in, std::vector<double>* out) const;
     // A bound on the size of the curve's slope anywhere (units per second).
@@ -89,8 +99,38 @@ class ChannelCurve : public OrChannel {
 
   private:
     double segment(size_t i, double seconds) const;  // inside the segment from key i to i + 1
-    double smoothSlope(size_t i) const;
-    double segmentSlope(size_t i) const;  // of the straight line from key i to key i + 1
+    // The slope through the neighbours of key i.
+    double smoothSlope(size_t i) const {
+        const size_t n = keys_.size();
+        if (n < 2) {
+            return 0.0;
+        }
+        const Key& lo = keys_[i == 0 ? 0 : i - 1];
+        const Key& hi = keys_[i + 1 < n ? i + 1 : n - 1];
+        const double dt = hi.time - lo.time;
+        return dt > 0 ? (hi.value - lo.value) / dt : 0.0;
+    }
+    // The slope of the straight line from key i to key i + 1.
+    double segmentSlope(size_t i) const {
+        const double dt = keys_[i + 1].time - keys_[i].time;
+        return dt > 0 ? (keys_[i + 1].value - keys_[i].value) / dt : 0.0;
+    }
+    // A key side's slope by its tangent `kind`: `smooth` the slope through the neighbouring
+    // keys, `linear` the straight line to the neighbour on that side, `given` the explicit one.
+    static double SideSlope(Kind kind, double smooth, double linear, double given) {
+        switch (kind) {
+            case kSmooth:
+                return smooth;
+            case kLinear:
+                return linear;
+            case kExplicit:
+                return given;
+            case kFlat:
+            case kStep:
+                break;
+        }
+        return 0.0;
+    }
     // SlopeAt, given the index of the first key after `seconds` (plus `eps`, the rounding).
     double slopeAfter(size_t after, double seconds, double eps, bool outgoing) const;
 

@@ -8,8 +8,9 @@
 #include "scene/HermiteSegment.h"
 
 // Reads a key curve at times that never go back: its value there and its slopes arriving and
-// leaving (units per second), every key's slopes worked out once and each segment's cubic once
-// for all the times inside it. A time within float rounding of a key is at the key (as
+// leaving (units per second), each segment's cubic worked out once for all the times inside it
+// and a key's slopes when it is reached (in one pass over the keys, which a store makes while
+// they are still in the cache). A time within float rounding of a key is at the key (as
 // ChannelCurve::Evaluate has it), where the slopes are those of the segments on either side; a
 // step leaves with slope 0. Inline: a store reads every axis of a path at every knot.
 class CurveCursor {
@@ -19,9 +20,8 @@ class CurveCursor {
     };
 
     // `curve` is borrowed.
-    explicit CurveCursor(const ChannelCurve& curve) : keys_(curve.keys()), cached_(keys_.size()) {
-        curve.Slopes(&in_, &out_);
-    }
+    explicit CurveCursor(const ChannelCurve& curve)
+        : curve_(curve), keys_(curve.keys()), cached_(keys_.size()) {}
 
     // The curve at `seconds`, which is not earlier than the time asked before.
     Point At(double seconds) {
@@ -40,8 +40,8 @@ class CurveCursor {
         const size_t j = i_ - 1;
         if (std::fabs(seconds - keys_[j].time) <= eps) {
             p.value = keys_[j].value;
-            p.leaving = j + 1 < n && keys_[j].out != ChannelCurve::kStep ? out_[j] : 0.0;
-            p.arriving = j > 0 && keys_[j - 1].out != ChannelCurve::kStep ? in_[j] : 0.0;
+            p.leaving = j + 1 < n ? curve_.OutSlope(j) : 0.0;  // (0 for a step)
+            p.arriving = j > 0 && keys_[j - 1].out != ChannelCurve::kStep ? curve_.InSlope(j) : 0.0;
             return p;
         }
         if (i_ == n) {
@@ -76,14 +76,14 @@ class CurveCursor {
         dt_ = b.time - a.time;
         v0_ = a.value;
         v1_ = b.value;
-        m0_ = step_ || straight_ ? 0.0 : out_[j] * dt_;
-        m1_ = step_ || straight_ ? 0.0 : in_[j + 1] * dt_;
+        m0_ = step_ || straight_ ? 0.0 : curve_.OutSlope(j) * dt_;
+        m1_ = step_ || straight_ ? 0.0 : curve_.InSlope(j + 1) * dt_;
     }
 
+    const ChannelCurve& curve_;
     const std::vector<ChannelCurve::Key>& keys_;
-    std::vector<double> in_, out_;  // every key's slopes
-    size_t i_ = 0;                  // keys before i_ lie at or before the last time asked
-    size_t cached_;                 // the segment whose coefficients follow (none: the key count)
+    size_t i_ = 0;   // keys before i_ lie at or before the last time asked
+    size_t cached_;  // the segment whose coefficients follow (none: the key count)
     bool step_ = false, straight_ = false;
     double t0_ = 0, dt_ = 1, v0_ = 0, v1_ = 0, m0_ = 0, m1_ = 0;
 };

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <memory>
 #include <vector>
 
 #include "scene/ChannelCurve.h"
@@ -13,6 +14,12 @@
 
 namespace {
 constexpr double kHalfRadians = EulerRotation::kHalfRadiansPerDegree;
+
+// One knot of the union: each axis's half-angle there (radians) and its slopes arriving and
+// leaving (radians per second).
+struct Knot {
+    double half[3], arrive[3], leave[3];
+};
 
 // qz * qy * qx, as EulerRotation::ToQuaternion, from each axis's half-angle cosine and sine.
 // Inlined: called for every knot, and a call's results would come back through memory.
@@ -47,22 +54,23 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
     if (n < 2 || n > maxKnots) {
         return false;
     }
-    // Each axis's half-angle and its slopes (radians per second) at every knot.
-    std::vector<double> half[3], arrive[3], leave[3];
+    // Each axis's half-angle and its slopes at every knot (every field is written, so the
+    // records are not cleared first).
+    const std::unique_ptr<Knot[]> at(new Knot[n]);
     for (int a = 0; a < 3; ++a) {
-        half[a].resize(n);
-        arrive[a].resize(n);
-        leave[a].resize(n);
         if (!curves_[a]) {
-            std::fill(half[a].begin(), half[a].end(), angles_[a] * kHalfRadians);
+            for (size_t k = 0; k < n; ++k) {
+                at[k].half[a] = angles_[a] * kHalfRadians;
+                at[k].arrive[a] = at[k].leave[a] = 0;
+            }
             continue;
         }
         CurveCursor cursor(*curves_[a]);
         for (size_t k = 0; k < n; ++k) {
             const CurveCursor::Point p = cursor.At(times[k]);
-            half[a][k] = p.value * kHalfRadians;
-            arrive[a][k] = p.arriving * kHalfRadians;
-            leave[a][k] = p.leaving * kHalfRadians;
+            at[k].half[a] = p.value * kHalfRadians;
+            at[k].arrive[a] = p.arriving * kHalfRadians;
+            at[k].leave[a] = p.leaving * kHalfRadians;
         }
     }
     // The parts of each piece.
@@ -73,11 +81,12 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
         [&](size_t k) {
             const double dt = times[k + 1] - times[k];
             PieceBound bound;
+            const Knot &from = at[k], &to = at[k + 1];
             for (int a = 0; a < 3; ++a) {
-                const double m0 = leave[a][k] * dt, m1 = arrive[a][k + 1] * dt;
+                const double m0 = from.leave[a] * dt, m1 = to.arrive[a] * dt;
                 // (an axis that holds across the piece adds nothing)
-                if (half[a][k] != half[a][k + 1] || m0 != 0 || m1 != 0) {
-                    bound.Add(half[a][k], half[a][k + 1], m0, m1);
+                if (from.half[a] != to.half[a] || m0 != 0 || m1 != 0) {
+                    bound.Add(from.half[a], to.half[a], m0, m1);
                 }
             }
             return bound;
@@ -128,19 +137,18 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
         v += 8;
     };
     for (size_t k = 0; k < n; ++k) {
-        const double h[3] = {half[0][k], half[1][k], half[2][k]};
-        const double in[3] = {arrive[0][k], arrive[1][k], arrive[2][k]};
-        const double out[3] = {leave[0][k], leave[1][k], leave[2][k]};
-        put(times[k], h, in, out);
+        const Knot& from = at[k];
+        put(times[k], from.half, from.arrive, from.leave);
         if (k + 1 == n || parts[k] == 1) {
             continue;
         }
         // The cut points of a piece cut into parts: on each axis's cubic in u = 0..1.
         const double dt = times[k + 1] - times[k];
+        const Knot& to = at[k + 1];
         const HermiteCubic piece[3] = {
-            {half[0][k], half[0][k + 1], leave[0][k] * dt, arrive[0][k + 1] * dt},
-            {half[1][k], half[1][k + 1], leave[1][k] * dt, arrive[1][k + 1] * dt},
-            {half[2][k], half[2][k + 1], leave[2][k] * dt, arrive[2][k + 1] * dt}};
+            {from.half[0], to.half[0], from.leave[0] * dt, to.arrive[0] * dt},
+            {from.half[1], to.half[1], from.leave[1] * dt, to.arrive[1] * dt},
+            {from.half[2], to.half[2], from.leave[2] * dt, to.arrive[2] * dt}};
         for (int j = 1; j < parts[k]; ++j) {
             const double u = double(j) / parts[k];
             double hu[3], slope[3];
