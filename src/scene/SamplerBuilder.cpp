@@ -42,12 +42,15 @@ SamplerBuilder::SamplerBuilder(const ChannelCurve* const curves[3], const double
 }
 
 bool SamplerBuilder::sharedTimes() const {
+    // (the key counts first: axes keyed apart usually differ in them)
     for (const ChannelCurve* c : curves_) {
-        if (!c) {
-            continue;
-        }
-        if (c->keys().size() != lead_->keys().size()) {
+        if (c && c->keys().size() != lead_->keys().size()) {
             return false;
+        }
+    }
+    for (const ChannelCurve* c : curves_) {
+        if (!c || c == lead_) {
+            continue;
         }
         for (size_t k = 0; k < c->keys().size(); ++k) {
             if (float(c->keys()[k].time) != float(lead_->keys()[k].time)) {
@@ -264,23 +267,23 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     for (size_t k = 0; k < n; ++k) {
         out->times[k] = BuiltSampler::Stored(times[k]);
     }
-    // Axis by axis into the interleaved values: in-tangents, values, out-tangents of each knot.
-    for (int a = 0; a < 3; ++a) {
-        float* v = values + 3 + a;
-        if (!curves_[a]) {
-            for (size_t k = 0; k < n; ++k, v += 9) {
-                v[-3] = 0.0f;
-                v[0] = BuiltSampler::Stored(rest_[a]);
-                v[3] = 0.0f;
+    // Knot by knot, the axes side by side: in-tangents, values, out-tangents of each knot.
+    const ChannelCurve none;
+    CurveCursor cursor[3] = {CurveCursor(curves_[0] ? *curves_[0] : none),
+                             CurveCursor(curves_[1] ? *curves_[1] : none),
+                             CurveCursor(curves_[2] ? *curves_[2] : none)};
+    float* v = values;
+    for (size_t k = 0; k < n; ++k, v += 9) {
+        for (int a = 0; a < 3; ++a) {
+            if (!curves_[a]) {
+                v[a] = v[6 + a] = 0.0f;
+                v[3 + a] = BuiltSampler::Stored(rest_[a]);
+                continue;
             }
-            continue;
-        }
-        CurveCursor cursor(*curves_[a]);
-        for (size_t k = 0; k < n; ++k, v += 9) {
-            const CurveCursor::Point p = cursor.At(times[k]);
-            v[-3] = BuiltSampler::Stored(p.arriving);
-            v[0] = BuiltSampler::Stored(p.value);
-            v[3] = BuiltSampler::Stored(p.leaving);
+            const CurveCursor::Point p = cursor[a].At(times[k]);
+            v[a] = BuiltSampler::Stored(p.arriving);
+            v[3 + a] = BuiltSampler::Stored(p.value);
+            v[6 + a] = BuiltSampler::Stored(p.leaving);
         }
     }
 }
