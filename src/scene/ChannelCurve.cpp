@@ -9,17 +9,18 @@
 #include "scene/HermiteSegment.h"
 #include "toolkit/CueTime.h"
 
-void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out) const {
+void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out, size_t from) const {
     const size_t n = keys_.size();
-    in->resize(n);
-    out->resize(n);
-    double before = 0.0;  // the slope of the segment arriving at key i
-    for (size_t i = 0; i < n; ++i) {
+    in->resize(n > from ? n - from : 0);
+    out->resize(in->size());
+    // the slope of the segment arriving at key i
+    double before = from > 0 && from < n ? segmentSlope(from - 1) : 0.0;
+    for (size_t i = from; i < n; ++i) {
         const Key& k = keys_[i];
         const double after = i + 1 < n ? segmentSlope(i) : 0.0;
         const double smooth = k.in == kSmooth || k.out == kSmooth ? smoothSlope(i) : 0.0;
-        (*in)[i] = SideSlope(k.in, smooth, before, k.inSlope);
-        (*out)[i] = SideSlope(k.out, smooth, after, k.outSlope);
+        (*in)[i - from] = SideSlope(k.in, smooth, before, k.inSlope);
+        (*out)[i - from] = SideSlope(k.out, smooth, after, k.outSlope);
         before = after;
     }
 }

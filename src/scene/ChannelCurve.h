@@ -61,8 +61,9 @@ class ChannelCurve : public OrChannel {
         return SideSlope(k.in, k.in == kSmooth ? smoothSlope(i) : 0.0,
                          k.in == kLinear && i > 0 ? segmentSlope(i - 1) : 0.0, k.inSlope);
     }
-    // InSlope and OutSlope of every key, in one pass (each segment's slope worked out once).
-    void Slopes(std::vector<double>* in, std::vector<double>* out) const;
+    // InSlope and OutSlope of every key from key `from` on (element i for key from + i), in one
+    // pass (each segment's slope worked out once).
+    void Slopes(std::vector<double>* in, std::vector<double>* out, size_t from = 0) const;
     // A bound on the size of the curve's slope anywhere (units per second).
     double MaxSlope() const;
     // The curve's derivative (units per second) at `seconds`, from the right (`outgoing`) or

@@ -11,6 +11,7 @@
 #include "scene/HermiteSegment.h"
 #include "scene/PieceBound.h"
 #include "scene/SamplerBuilder.h"
+#include "scene/TurnSpline.h"
 
 namespace {
 constexpr double kHalfRadians = EulerRotation::kHalfRadiansPerDegree;
@@ -50,9 +51,26 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
     // Every axis's key times; those that round to one float are one knot, each axis read there
     // as at its own key (within float rounding, see CurveCursor).
     const std::vector<double> times = ChannelCurve::UnionTimes(curves_, 3);
-    const size_t n = times.size();
-    if (n < 2 || n > maxKnots) {
+    if (times.size() < 2 || times.size() > maxKnots) {
         return false;
+    }
+    // Where every axis but one has stopped (after its last key), the rotation turns about that
+    // one between fixed ones, which a TurnSpline writes from its keys at about half the cost:
+    // the knots here run up to the first of those keys (the joint), the tail's from there.
+    size_t n = times.size();
+    BuiltSampler tail;
+    int axis;
+    size_t firstKey;
+    double held[3];
+    if (tailFrom(&axis, &firstKey, held)) {
+        const double joint = curves_[axis]->keys()[firstKey].time;
+        const size_t at =
+            size_t(std::lower_bound(times.begin(), times.end(), joint) - times.begin());
+        if (at < times.size() && times[at] == joint &&
+            TurnSpline(*curves_[axis], axis, held, firstKey)
+                .Build(toleranceDegrees, maxKnots, &tail)) {
+            n = at + 1;
+        }
     }
     // Each axis's half-angle and its slopes at every knot (every field is written, so the
     // records are not cleared first).
@@ -96,8 +114,13 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
         return false;
     }
 
+    // (the tail's first knot is the joint, which is written here)
+    const size_t tailKnots = tail.times.empty() ? 0 : tail.times.size() - 1;
+    if (knots + tailKnots > maxKnots) {
+        return false;
+    }
     BuiltSampler s;
-    float* v = s.SizeQuaternionKnots(knots);
+    float* v = s.SizeQuaternionKnots(knots + tailKnots);
     float* time = s.times.data();
     // Each axis's last half-angle and its cosine and sine: an axis that holds (before its first
     // key, after its last, or without a curve) needs them once.
@@ -164,6 +187,46 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
             return false;  // two knots on one float time
         }
     }
+    if (tailKnots > 0) {
+        std::copy(tail.times.begin() + 1, tail.times.end(), time);
+        std::copy(tail.Values() + 12, tail.Values() + tail.ValueCount(), v);
+    }
     *out = std::move(s);
+    return true;
+}
+
+bool EulerSpline::tailFrom(int* axis, size_t* firstKey, double held[3]) const {
+    // The axis keyed last, and the time at which the others stop (their last key).
+    int last = -1;
+    for (int a = 0; a < 3; ++a) {
+        if (curves_[a] &&
+            (last < 0 || curves_[a]->keys().back().time > curves_[last]->keys().back().time)) {
+            last = a;
+        }
+    }
+    double stop = -HUGE_VAL;
+    for (int a = 0; a < 3; ++a) {
+        if (a != last && curves_[a]) {
+            stop = std::max(stop, curves_[a]->keys().back().time);
+        }
+        held[a] = a != last && curves_[a] ? curves_[a]->keys().back().value : angles_[a];
+    }
+    if (last < 0 || stop == -HUGE_VAL) {
+        return false;
+    }
+    // Its first key on a float time after that, with at least one piece after it.
+    const std::vector<ChannelCurve::Key>& keys = curves_[last]->keys();
+    size_t first =
+        size_t(std::upper_bound(keys.begin(), keys.end(), stop,
+                                [](double t, const ChannelCurve::Key& k) { return t < k.time; }) -
+               keys.begin());
+    while (first < keys.size() && !(float(keys[first].time) > float(stop))) {
+        ++first;
+    }
+    if (first + 1 >= keys.size()) {
+        return false;
+    }
+    *axis = last;
+    *firstKey = first;
     return true;
 }

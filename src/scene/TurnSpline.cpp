@@ -15,8 +15,8 @@ constexpr double kHalfRadians = EulerRotation::kHalfRadiansPerDegree;
 
 }  // namespace
 
-TurnSpline::TurnSpline(const ChannelCurve& curve, int axis, const double angles[3])
-    : curve_(curve) {
+TurnSpline::TurnSpline(const ChannelCurve& curve, int axis, const double angles[3], size_t firstKey)
+    : curve_(curve), first_(firstKey) {
     double c[3], s[3];
     for (int a = 0; a < 3; ++a) {
         c[a] = std::cos(angles[a] * kHalfRadians);
@@ -37,15 +37,16 @@ TurnSpline::TurnSpline(const ChannelCurve& curve, int axis, const double angles[
 }
 
 bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) const {
-    const auto& keys = curve_.keys();
-    const size_t n = keys.size();
+    // The keys from the first one written on.
+    const size_t n = curve_.keys().size() > first_ ? curve_.keys().size() - first_ : 0;
     if (n < 2) {
         return false;
     }
+    const ChannelCurve::Key* const keys = curve_.keys().data() + first_;
     const double allowed = toleranceDegrees * kPi / 180;
     // Each key's slopes, in half-angle radians per second, and each piece's number of parts.
     std::vector<double> in, leave;
-    curve_.Slopes(&in, &leave);
+    curve_.Slopes(&in, &leave, first_);
     for (size_t i = 0; i < n; ++i) {
         in[i] *= kHalfRadians;
         leave[i] *= kHalfRadians;

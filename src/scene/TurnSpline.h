@@ -14,8 +14,10 @@ struct BuiltSampler;
 class TurnSpline {
   public:
     // `curve` (degrees, borrowed) turns Euler axis `axis` (0 X, 1 Y, 2 Z); `angles` holds the
-    // fixed angles of the other two (degrees; angles[axis] is not used).
-    TurnSpline(const ChannelCurve& curve, int axis, const double angles[3]);
+    // fixed angles of the other two (degrees; angles[axis] is not used). The knots are the
+    // curve's keys from `firstKey` on (a rotation whose other axes stop turning there, see
+    // EulerSpline).
+    TurnSpline(const ChannelCurve& curve, int axis, const double angles[3], size_t firstKey = 0);
 
     // Writes the knots into `out` (CUBICSPLINE, in-tangent, value, out-tangent per knot), each
     // piece within `toleranceDegrees` of the rotation at every time it covers, allowing for the
@@ -26,5 +28,6 @@ class TurnSpline {
 
   private:
     const ChannelCurve& curve_;
+    size_t first_;
     double p_[4], q_[4];  // the rotation at turning half-angle h is cos(h) p_ + sin(h) q_
 };

@@ -279,7 +279,9 @@ INSTANTIATE_TEST_SUITE_P(
 
 // A keyset turning X every three frames over a head that the file turns about Y every frame:
 // the file's key times are floats, the keyset's are not, and where they meet (every third frame)
-// they are one knot, not a reason to sample the whole turn.
+// they are one knot, not a reason to sample the whole turn. The file's turn stops after 1 s and
+// the keyset's goes on to 2 s, about X alone between the held Y and Z: that second half is
+// written from the X keys as a one-axis turn, joined to the first at X's first key after 1 s.
 TEST_F(SceneWriterTest, AxesKeyedOnOneFloatTimeShareAKnot) {
     OneNode();
     std::vector<StoreKey> x;
