@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <memory>
+#include <optional>
 #include <vector>
 
 #include "scene/ChannelCurve.h"
@@ -58,7 +59,8 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
     // one between fixed ones, which a TurnSpline writes from its keys at about half the cost:
     // the knots here run up to the first of those keys (the joint), the tail's from there.
     size_t n = times.size();
-    BuiltSampler tail;
+    std::optional<TurnSpline> tail;
+    size_t tailKnots = 0;
     int axis;
     size_t firstKey;
     double held[3];
@@ -66,10 +68,14 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
         const double joint = curves_[axis]->keys()[firstKey].time;
         const size_t at =
             size_t(std::lower_bound(times.begin(), times.end(), joint) - times.begin());
-        if (at < times.size() && times[at] == joint &&
-            TurnSpline(*curves_[axis], axis, held, firstKey)
-                .Build(toleranceDegrees, maxKnots, &tail)) {
-            n = at + 1;
+        if (at < times.size() && times[at] == joint) {
+            tail.emplace(*curves_[axis], axis, held, firstKey);
+            tailKnots = tail->Plan(toleranceDegrees, maxKnots);
+            if (tailKnots > 0) {
+                n = at + 1;
+            } else {
+                tail.reset();
+            }
         }
     }
     // Each axis's half-angle and its slopes at every knot (every field is written, so the
@@ -114,13 +120,13 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
         return false;
     }
 
-    // (the tail's first knot is the joint, which is written here)
-    const size_t tailKnots = tail.times.empty() ? 0 : tail.times.size() - 1;
-    if (knots + tailKnots > maxKnots) {
+    // (the tail's first knot is the joint, the last here)
+    const size_t total = tail ? knots - 1 + tailKnots : knots;
+    if (total > maxKnots) {
         return false;
     }
     BuiltSampler s;
-    float* v = s.SizeQuaternionKnots(knots + tailKnots);
+    float* v = s.SizeQuaternionKnots(total);
     float* time = s.times.data();
     // Each axis's last half-angle and its cosine and sine: an axis that holds (before its first
     // key, after its last, or without a curve) needs them once.
@@ -187,9 +193,8 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
             return false;  // two knots on one float time
         }
     }
-    if (tailKnots > 0) {
-        std::copy(tail.times.begin() + 1, tail.times.end(), time);
-        std::copy(tail.Values() + 12, tail.Values() + tail.ValueCount(), v);
+    if (tail && !tail->Write(time - 1, v - 12)) {
+        return false;
     }
     *out = std::move(s);
     return true;

@@ -36,43 +36,44 @@ TurnSpline::TurnSpline(const ChannelCurve& curve, int axis, const double angles[
     }
 }
 
-bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) const {
+size_t TurnSpline::Plan(double toleranceDegrees, size_t maxKnots) {
+    knots_ = 0;
     // The keys from the first one written on.
     const size_t n = curve_.keys().size() > first_ ? curve_.keys().size() - first_ : 0;
     if (n < 2) {
-        return false;
+        return 0;
     }
     const ChannelCurve::Key* const keys = curve_.keys().data() + first_;
-    const double allowed = toleranceDegrees * kPi / 180;
-    // Each key's slopes, in half-angle radians per second, and each piece's number of parts.
-    std::vector<double> in, leave;
-    curve_.Slopes(&in, &leave, first_);
-    for (size_t i = 0; i < n; ++i) {
-        in[i] *= kHalfRadians;
-        leave[i] *= kHalfRadians;
-    }
     for (size_t i = 0; i + 1 < n; ++i) {
         if (keys[i].out == ChannelCurve::kStep) {
-            return false;  // a jump at the next key, which a spline cannot make
+            return 0;  // a jump at the next key, which a spline cannot make
         }
     }
-    std::vector<unsigned char> parts;
-    const size_t knots = PieceBound::PartsOfPieces(
+    // Each key's slopes, in half-angle radians per second, and each piece's number of parts.
+    curve_.Slopes(&in_, &leave_, first_);
+    for (size_t i = 0; i < n; ++i) {
+        in_[i] *= kHalfRadians;
+        leave_[i] *= kHalfRadians;
+    }
+    knots_ = PieceBound::PartsOfPieces(
         n - 1,
         [&](size_t i) {
             const double dt = keys[i + 1].time - keys[i].time;
             PieceBound b;
-            b.Add(keys[i].value * kHalfRadians, keys[i + 1].value * kHalfRadians, leave[i] * dt,
-                  in[i + 1] * dt);
+            b.Add(keys[i].value * kHalfRadians, keys[i + 1].value * kHalfRadians, leave_[i] * dt,
+                  in_[i + 1] * dt);
             return b;
         },
-        [&](size_t i) { return keys[i].time; }, allowed, true, maxKnots, &parts);
-    if (knots == 0) {
-        return false;
-    }
-    BuiltSampler s;
-    float* v = s.SizeQuaternionKnots(knots);
-    float* time = s.times.data();
+        [&](size_t i) { return keys[i].time; }, toleranceDegrees * kPi / 180, true, maxKnots,
+        &parts_);
+    return knots_;
+}
+
+bool TurnSpline::Write(float* times, float* values) const {
+    const size_t n = in_.size();
+    const ChannelCurve::Key* const keys = curve_.keys().data() + first_;
+    float* time = times;
+    float* v = values;
     // One knot: its time, the half-angle there and its slopes (half-angle radians per second).
     // The rotation is cos(h) P + sin(h) Q, its derivative by h -sin(h) P + cos(h) Q.
     auto put = [&](double at, double half, double arrive, double depart) {
@@ -92,24 +93,36 @@ bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* o
     };
     for (size_t i = 0; i < n; ++i) {
         const double half = keys[i].value * kHalfRadians;
-        put(keys[i].time, half, in[i], leave[i]);
-        if (i + 1 == n || parts[i] == 1) {
+        put(keys[i].time, half, in_[i], leave_[i]);
+        if (i + 1 == n || parts_[i] == 1) {
             continue;
         }
         // The cut points of a piece cut into parts: on the piece's cubic in u = 0..1.
         const double dt = keys[i + 1].time - keys[i].time;
-        const HermiteCubic piece(half, keys[i + 1].value * kHalfRadians, leave[i] * dt,
-                                 in[i + 1] * dt);
-        for (int j = 1; j < parts[i]; ++j) {
-            const double u = double(j) / parts[i];
+        const HermiteCubic piece(half, keys[i + 1].value * kHalfRadians, leave_[i] * dt,
+                                 in_[i + 1] * dt);
+        for (int j = 1; j < parts_[i]; ++j) {
+            const double u = double(j) / parts_[i];
             const double slope = piece.SlopeAt(u) / dt;
             put(keys[i].time + u * dt, piece.At(u), slope, slope);
         }
     }
-    for (size_t j = 1; j < knots; ++j) {
-        if (!(s.times[j] > s.times[j - 1])) {
+    for (size_t j = 1; j < knots_; ++j) {
+        if (!(times[j] > times[j - 1])) {
             return false;  // two knots on one float time
         }
+    }
+    return true;
+}
+
+bool TurnSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) {
+    if (Plan(toleranceDegrees, maxKnots) == 0) {
+        return false;
+    }
+    BuiltSampler s;
+    float* values = s.SizeQuaternionKnots(knots_);
+    if (!Write(s.times.data(), values)) {
+        return false;
     }
     *out = std::move(s);
     return true;

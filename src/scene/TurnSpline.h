@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <vector>
 
 class ChannelCurve;
 struct BuiltSampler;
@@ -19,15 +20,24 @@ class TurnSpline {
     // EulerSpline).
     TurnSpline(const ChannelCurve& curve, int axis, const double angles[3], size_t firstKey = 0);
 
-    // Writes the knots into `out` (CUBICSPLINE, in-tangent, value, out-tangent per knot), each
-    // piece within `toleranceDegrees` of the rotation at every time it covers, allowing for the
-    // knots' times being stored as floats. False, with `out` untouched, when the curve steps,
-    // has two keys on one float time, a piece would need more than PieceBound::kMaxParts parts, or
-    // the knots would number more than `maxKnots`.
-    bool Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out) const;
+    // The knots the spline needs, each piece within `toleranceDegrees` of the rotation at every
+    // time it covers, allowing for the knots' times being stored as floats; 0 when the curve
+    // steps, a piece would need more than PieceBound::kMaxParts parts, or the knots would number
+    // more than `maxKnots`.
+    size_t Plan(double toleranceDegrees, size_t maxKnots);
+    // Writes the planned knots: their times into `times`, and into `values` their in-tangent,
+    // value and out-tangent (12 floats a knot). False when two fall on one float time.
+    bool Write(float* times, float* values) const;
+    // Plan and Write into `out` (CUBICSPLINE); false, with `out` untouched, when either fails.
+    bool Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* out);
 
   private:
     const ChannelCurve& curve_;
     size_t first_;
     double p_[4], q_[4];  // the rotation at turning half-angle h is cos(h) p_ + sin(h) q_
+    // What Plan worked out: each key's slopes (half-angle radians per second), each piece's
+    // parts and the knots they make.
+    std::vector<double> in_, leave_;
+    std::vector<unsigned char> parts_;
+    size_t knots_ = 0;
 };
