@@ -2,9 +2,9 @@
 
 #include <algorithm>
 #include <atomic>
+#include <cstdint>
 #include <cstring>
 #include <map>
-#include <string_view>
 #include <thread>
 #include <unordered_map>
 
@@ -32,6 +32,19 @@ int path_index(const std::string& path) {
         }
     }
     return -1;
+}
+
+// What samplers that share their key times are looked up by: the count of the times and a
+// few of them, evenly spread (a match is confirmed byte for byte, so this only has to tell
+// most different times apart; hashing every time cost more than the rare false match).
+size_t times_key(const std::vector<float>& times) {
+    size_t key = times.size();
+    for (size_t i = 0; i < 16 && !times.empty(); ++i) {
+        uint32_t bits;
+        std::memcpy(&bits, &times[i * (times.size() - 1) / 15], sizeof bits);
+        key = key * 1000003 ^ bits;
+    }
+    return key;
 }
 }  // namespace
 
@@ -259,7 +272,7 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets, bool binary) {
         m_.bufferViews.emplace_back();  // filled in once its bytes are all there
         m_.accessors.reserve(m_.accessors.size() + 2 * targets->size());
         // Samplers with the same key times (the paths one keyset drives share them) share one
-        // input accessor: found by a hash of the times, confirmed byte for byte.
+        // input accessor: found by their times' key, confirmed byte for byte.
         std::unordered_multimap<size_t, int> inputs;
         for (Target& t : *targets) {
             if (t.sampler.times.empty()) {
@@ -269,8 +282,7 @@ void SceneWriter::appendSamplers(std::vector<Target>* targets, bool binary) {
             const BuiltSampler& s = t.sampler;
             tinygltf::AnimationSampler sampler;
             const size_t timeBytes = s.times.size() * sizeof(float);
-            const size_t hash = std::hash<std::string_view>()(
-                std::string_view(reinterpret_cast<const char*>(s.times.data()), timeBytes));
+            const size_t hash = times_key(s.times);
             auto same = inputs.equal_range(hash);
             for (auto it = same.first; it != same.second && sampler.input < 0; ++it) {
                 const tinygltf::Accessor& a = m_.accessors[size_t(it->second)];

@@ -4,7 +4,9 @@
 #include <algorithm>
 #include <cmath>
 #include <filesystem>
+#include <map>
 #include <stdexcept>
+#include <string>
 #include <tuple>
 
 #include "scene/SamplerBuilder.h"
@@ -305,6 +307,32 @@ TEST_F(SceneWriterTest, AxesKeyedOnOneFloatTimeShareAKnot) {
         ASSERT_NO_FATAL_FAILURE(ExpectRotationAt(doc, rot, f / 30));
     for (int k = 0; k <= 20; ++k)
         ASSERT_NO_FATAL_FAILURE(ExpectRotationAt(doc, rot, k * 0.1));
+}
+
+// Paths keyed at the same times share one input accessor; a path whose times differ only in a
+// key that the lookup of shared times does not look at gets its own, with its own times.
+TEST_F(SceneWriterTest, PathsAtTheSameTimesShareTheirInput) {
+    OneNode();
+    std::vector<StoreKey> keys;
+    for (int k = 0; k < 20; ++k)
+        keys.push_back({600 * k, 0.5f * float(k % 3), 1, 1});
+    std::vector<StoreKey> shifted = keys;
+    shifted[4].ticks += 100;
+    Key("a", 0, keys);
+    Key("a", 3, keys);
+    Key("a", 6, shifted);
+    auto back = StoreAndRead();
+    std::map<std::string, int> input;
+    for (const tinygltf::Animation& anim : back->model().animations) {
+        for (const tinygltf::AnimationChannel& c : anim.channels)
+            input[c.target_path] = anim.samplers[size_t(c.sampler)].input;
+    }
+    EXPECT_EQ(input["translation"], input["rotation"]);
+    EXPECT_NE(input["scale"], input["translation"]);
+    Written scale = WrittenSampler(back->model(), 0, "scale");
+    ASSERT_EQ(scale.times.size(), 20u);
+    EXPECT_EQ(scale.times[4], float(2500 / 6000.0));
+    EXPECT_EQ(WrittenSampler(back->model(), 0, "rotation").times[4], float(2400 / 6000.0));
 }
 
 // A skinned figure whose animation lives in a buffer of its own: replacing that animation
