@@ -267,13 +267,17 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     for (size_t k = 0; k < n; ++k) {
         out->times[k] = BuiltSampler::Stored(times[k]);
     }
-    // Knot by knot, the axes side by side: in-tangents, values, out-tangents of each knot.
+    // Up to the tail (see sharedTail) knot by knot through a cursor on each axis, the axes side
+    // by side: in-tangents, values, out-tangents of each knot.
+    size_t joint = n, firstKey = 0;
+    bool going[3] = {false, false, false};
+    const bool tail = sharedTail(times, &joint, &firstKey, going);
     const ChannelCurve none;
     CurveCursor cursor[3] = {CurveCursor(curves_[0] ? *curves_[0] : none),
                              CurveCursor(curves_[1] ? *curves_[1] : none),
                              CurveCursor(curves_[2] ? *curves_[2] : none)};
     float* v = values;
-    for (size_t k = 0; k < n; ++k, v += 9) {
+    for (size_t k = 0; k < (tail ? joint + 1 : n); ++k, v += 9) {
         for (int a = 0; a < 3; ++a) {
             if (!curves_[a]) {
                 v[a] = v[6 + a] = 0.0f;
@@ -286,6 +290,79 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
             v[6 + a] = BuiltSampler::Stored(p.leaving);
         }
     }
+    if (!tail) {
+        return;
+    }
+    // The tail: the going axes at their own keys after the joint, the others held.
+    const size_t count = n - joint - 1;
+    std::vector<double> in, leave;
+    for (int a = 0; a < 3; ++a) {
+        float* w = v + a;
+        if (!going[a]) {
+            const float held =
+                BuiltSampler::Stored(curves_[a] ? curves_[a]->keys().back().value : rest_[a]);
+            for (size_t k = 0; k < count; ++k, w += 9) {
+                w[0] = w[6] = 0.0f;
+                w[3] = held;
+            }
+            continue;
+        }
+        const ChannelCurve::Key* key = curves_[a]->keys().data() + firstKey + 1;
+        curves_[a]->Slopes(&in, &leave, firstKey + 1);
+        leave.back() = 0;  // (nothing leaves the last key, as a cursor has it)
+        for (size_t k = 0; k < count; ++k, w += 9) {
+            w[0] = BuiltSampler::Stored(in[k]);
+            w[3] = BuiltSampler::Stored(key[k].value);
+            w[6] = BuiltSampler::Stored(leave[k]);
+        }
+    }
+}
+
+bool SamplerBuilder::sharedTail(const std::vector<double>& times, size_t* joint, size_t* firstKey,
+                                bool going[3]) const {
+    // The axes keyed to the end, and the time at which the others stop (their last key).
+    double latest = -HUGE_VAL, stop = -HUGE_VAL;
+    for (const ChannelCurve* c : curves_) {
+        latest = c ? std::max(latest, c->keys().back().time) : latest;
+    }
+    const ChannelCurve* lead = nullptr;
+    for (int a = 0; a < 3; ++a) {
+        const ChannelCurve* c = curves_[a];
+        going[a] = c && float(c->keys().back().time) == float(latest);
+        lead = going[a] && !lead ? c : lead;
+        stop = c && !going[a] ? std::max(stop, c->keys().back().time) : stop;
+    }
+    if (!lead || stop == -HUGE_VAL) {
+        return false;
+    }
+    // The lead's first key on a float time after that (the joint), with keys after it that
+    // every going axis shares (as many keys, on the same float times).
+    const std::vector<ChannelCurve::Key>& keys = lead->keys();
+    size_t first =
+        size_t(std::upper_bound(keys.begin(), keys.end(), stop,
+                                [](double t, const ChannelCurve::Key& k) { return t < k.time; }) -
+               keys.begin());
+    while (first < keys.size() && !(float(keys[first].time) > float(stop))) {
+        ++first;
+    }
+    if (first + 2 > keys.size() || keys.size() - first > times.size()) {
+        return false;
+    }
+    for (int a = 0; a < 3; ++a) {
+        const std::vector<ChannelCurve::Key>& other = curves_[a] ? curves_[a]->keys() : keys;
+        if (going[a] && other.size() != keys.size()) {
+            return false;
+        }
+        for (size_t k = first; going[a] && &other != &keys && k < keys.size(); ++k) {
+            if (float(other[k].time) != float(keys[k].time)) {
+                return false;
+            }
+        }
+    }
+    // After the stop the union holds just those keys, one knot each.
+    *joint = times.size() - (keys.size() - first);
+    *firstKey = first;
+    return float(times[*joint]) == float(keys[first].time);
 }
 
 size_t SamplerBuilder::sampledAtMost() const {

@@ -110,6 +110,33 @@ TEST_F(SceneWriterTest, AxesAtDifferentTimesAreCubicPiecesAtTheUnionOfKeyTimes) 
     }
 }
 
+// Two axes of one keyset going on after a third, keyed apart, has stopped: from the third's last
+// key on, the knots are the keyset's keys, each axis still exact at every frame.
+TEST_F(SceneWriterTest, AxesGoingOnTogetherAfterAnotherStopsStayExact) {
+    OneNode();
+    std::vector<StoreKey> x, y, z;
+    for (int k = 0; k <= 20; ++k) {
+        x.push_back({600 * k, float(std::sin(k * 0.7)), k % 3, (k + 1) % 3});
+        y.push_back({600 * k, float(std::cos(k * 0.4)), (k + 2) % 3, k % 3});
+    }
+    for (int k = 0; k <= 15; ++k)
+        z.push_back({200 * k, float(0.1 * k * k), 2, 2});
+    Key("a", 0, x);
+    Key("a", 1, y);
+    Key("a", 2, z);
+    auto back = StoreAndRead();
+    Written w = WrittenSampler(back->model(), 0, "translation");
+    EXPECT_EQ(w.interpolation, "CUBICSPLINE");
+    // The union: every Z key (every frame to 0.5 s) and every X and Y key after it.
+    ASSERT_EQ(w.times.size(), 16u + 15u);
+    const SceneDocument& doc = *scene.source->document();
+    for (int f = 0; f <= 66; ++f) {
+        for (int c : {0, 1, 2})
+            ASSERT_NEAR(back->Curve(0, c)->eval(f), doc.Curve(0, c)->eval(f), 1e-5)
+                << "channel " << c << " frame " << f;
+    }
+}
+
 // Sampled curves (rotation; translation mixing steps with axes at other times) stay within
 // tolerance at every frame and key, with fewer samples than frames.
 TEST_F(SceneWriterTest, SampledCurvesStayWithinToleranceAtEveryFrameAndKey) {
