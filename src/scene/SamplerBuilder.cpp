@@ -79,9 +79,10 @@ bool SamplerBuilder::BuildVector(BuiltSampler* out, std::string* why) const {
         }
         allLinear = allLinear && c->AllLinear();
         allStep = allStep && c->AllStep();
-        for (size_t k = 0; k + 1 < c->keys().size(); ++k) {
-            anyStep = anyStep || c->keys()[k].out == ChannelCurve::kStep;
-        }
+        anyStep = anyStep || std::any_of(c->keys().begin(), c->keys().end() - 1,
+                                         [](const ChannelCurve::Key& k) {
+                                             return k.out == ChannelCurve::kStep;
+                                         });
     }
     bool shared = sharedTimes();
     if (shared && (allLinear || allStep || !anyStep)) {
