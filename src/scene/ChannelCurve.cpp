@@ -220,28 +220,32 @@ size_t ChannelCurve::TrimBefore(double seconds) {
     return first;
 }
 
-std::vector<double> ChannelCurve::UnionTimes(const ChannelCurve* const curves[], size_t count) {
+std::vector<double> ChannelCurve::UnionTimes(const ChannelCurve* const curves[], size_t count,
+                                             double until) {
     std::vector<double> all, merged;
     for (size_t c = 0; c < count; ++c) {
         if (!curves[c]) {
             continue;
         }
         const std::vector<Key>& keys = curves[c]->keys_;
+        const size_t end =
+            size_t(std::upper_bound(keys.begin(), keys.end(), until,
+                                    [](double t, const Key& k) { return t < k.time; }) -
+                   keys.begin());
         // Axes of one keyset share their key times: nothing to merge.
-        if (keys.size() == all.size() &&
-            std::equal(all.begin(), all.end(), keys.begin(),
-                       [](double t, const Key& k) { return t == k.time; })) {
+        if (end == all.size() && std::equal(all.begin(), all.end(), keys.begin(),
+                                            [](double t, const Key& k) { return t == k.time; })) {
             continue;
         }
-        merged.resize(all.size() + keys.size());
+        merged.resize(all.size() + end);
         size_t i = 0, j = 0, at = 0;
-        while (i < all.size() && j < keys.size()) {
+        while (i < all.size() && j < end) {
             merged[at++] = keys[j].time < all[i] ? keys[j++].time : all[i++];
         }
         for (; i < all.size(); ++i) {
             merged[at++] = all[i];
         }
-        for (; j < keys.size(); ++j) {
+        for (; j < end; ++j) {
             merged[at++] = keys[j].time;
         }
         all.swap(merged);

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cmath>
 #include <vector>
 
 #include "scene/KLWire.h"
@@ -82,9 +83,10 @@ class ChannelCurve : public OrChannel {
     // (slopes that depended on a dropped key are made explicit). Returns the keys dropped.
     size_t TrimBefore(double seconds);
 
-    // Every key time of the `count` curves (null ones left out), ascending; times that round
-    // to one float (as a file stores them) are one time, the earliest.
-    static std::vector<double> UnionTimes(const ChannelCurve* const curves[], size_t count);
+    // Every key time of the `count` curves (null ones left out) up to `until`, ascending; times
+    // that round to one float (as a file stores them) are one time, the earliest.
+    static std::vector<double> UnionTimes(const ChannelCurve* const curves[], size_t count,
+                                          double until = HUGE_VAL);
 
     // The curve kind of a scene tangent code (KLWire::Tangent); unknown codes are linear.
     static Kind KindFromCode(int code) {

@@ -49,34 +49,34 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
             }
         }
     }
-    // Every axis's key times; those that round to one float are one knot, each axis read there
-    // as at its own key (within float rounding, see CurveCursor).
-    const std::vector<double> times = ChannelCurve::UnionTimes(curves_, 3);
-    if (times.size() < 2 || times.size() > maxKnots) {
-        return false;
-    }
     // Where every axis but one has stopped (after its last key), the rotation turns about that
     // one between fixed ones, which a TurnSpline writes from its keys at about half the cost:
     // the knots here run up to the first of those keys (the joint), the tail's from there.
-    size_t n = times.size();
     std::optional<TurnSpline> tail;
     size_t tailKnots = 0;
+    double joint = HUGE_VAL;
     int axis;
     size_t firstKey;
     double held[3];
     if (tailFrom(&axis, &firstKey, held)) {
-        const double joint = curves_[axis]->keys()[firstKey].time;
-        const size_t at =
-            size_t(std::lower_bound(times.begin(), times.end(), joint) - times.begin());
-        if (at < times.size() && times[at] == joint) {
-            tail.emplace(*curves_[axis], axis, held, firstKey);
-            tailKnots = tail->Plan(toleranceDegrees, maxKnots);
-            if (tailKnots > 0) {
-                n = at + 1;
-            } else {
-                tail.reset();
-            }
+        tail.emplace(*curves_[axis], axis, held, firstKey);
+        tailKnots = tail->Plan(toleranceDegrees, maxKnots);
+        if (tailKnots > 0) {
+            joint = curves_[axis]->keys()[firstKey].time;
+        } else {
+            tail.reset();
         }
+    }
+    // Every axis's key times up to there; those that round to one float are one knot, each
+    // axis read there as at its own key (within float rounding, see CurveCursor).
+    std::vector<double> times = ChannelCurve::UnionTimes(curves_, 3, joint);
+    if (tail && !(times.size() >= 2 && float(times.back()) == float(joint))) {
+        tail.reset();
+        times = ChannelCurve::UnionTimes(curves_, 3);
+    }
+    const size_t n = times.size();
+    if (n < 2 || n > maxKnots) {
+        return false;
     }
     // Each axis's half-angle and its slopes at every knot (every field is written, so the
     // records are not cleared first).

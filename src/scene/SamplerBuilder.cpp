@@ -261,24 +261,32 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     // A piece of a cubic is a cubic: cutting every axis at the union of the key times keeps
     // each axis exact, with the slope on either side of every cut.
     out->interpolation = "CUBICSPLINE";
-    const std::vector<double> times = ChannelCurve::UnionTimes(curves_, 3);
-    const size_t n = times.size();
-    out->times.resize(n);
-    float* const values = out->SizeValues(n * 9);
-    for (size_t k = 0; k < n; ++k) {
+    // Up to the tail (see sharedTail), the union of the key times, read knot by knot through a
+    // cursor on each axis, the axes side by side: in-tangents, values, out-tangents.
+    size_t firstKey = 0;
+    bool going[3] = {false, false, false};
+    const ChannelCurve* lead = sharedTail(&firstKey, going);
+    const double joint = lead ? lead->keys()[firstKey].time : HUGE_VAL;
+    std::vector<double> times = ChannelCurve::UnionTimes(curves_, 3, joint);
+    if (lead && !(!times.empty() && float(times.back()) == float(joint))) {
+        lead = nullptr;
+        times = ChannelCurve::UnionTimes(curves_, 3);
+    }
+    const size_t head = times.size(), count = lead ? lead->keys().size() - firstKey - 1 : 0;
+    out->times.resize(head + count);
+    float* const values = out->SizeValues((head + count) * 9);
+    for (size_t k = 0; k < head; ++k) {
         out->times[k] = BuiltSampler::Stored(times[k]);
     }
-    // Up to the tail (see sharedTail) knot by knot through a cursor on each axis, the axes side
-    // by side: in-tangents, values, out-tangents of each knot.
-    size_t joint = n, firstKey = 0;
-    bool going[3] = {false, false, false};
-    const bool tail = sharedTail(times, &joint, &firstKey, going);
+    for (size_t k = 0; k < count; ++k) {
+        out->times[head + k] = BuiltSampler::Stored(lead->keys()[firstKey + 1 + k].time);
+    }
     const ChannelCurve none;
     CurveCursor cursor[3] = {CurveCursor(curves_[0] ? *curves_[0] : none),
                              CurveCursor(curves_[1] ? *curves_[1] : none),
                              CurveCursor(curves_[2] ? *curves_[2] : none)};
     float* v = values;
-    for (size_t k = 0; k < (tail ? joint + 1 : n); ++k, v += 9) {
+    for (size_t k = 0; k < head; ++k, v += 9) {
         for (int a = 0; a < 3; ++a) {
             if (!curves_[a]) {
                 v[a] = v[6 + a] = 0.0f;
@@ -291,11 +299,10 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
             v[6 + a] = BuiltSampler::Stored(p.leaving);
         }
     }
-    if (!tail) {
+    if (count == 0) {
         return;
     }
     // The tail: the going axes at their own keys after the joint, the others held.
-    const size_t count = n - joint - 1;
     std::vector<double> in, leave;
     for (int a = 0; a < 3; ++a) {
         float* w = v + a;
@@ -319,8 +326,7 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
     }
 }
 
-bool SamplerBuilder::sharedTail(const std::vector<double>& times, size_t* joint, size_t* firstKey,
-                                bool going[3]) const {
+const ChannelCurve* SamplerBuilder::sharedTail(size_t* firstKey, bool going[3]) const {
     // The axes keyed to the end, and the time at which the others stop (their last key).
     double latest = -HUGE_VAL, stop = -HUGE_VAL;
     for (const ChannelCurve* c : curves_) {
@@ -334,7 +340,7 @@ bool SamplerBuilder::sharedTail(const std::vector<double>& times, size_t* joint,
         stop = c && !going[a] ? std::max(stop, c->keys().back().time) : stop;
     }
     if (!lead || stop == -HUGE_VAL) {
-        return false;
+        return nullptr;
     }
     // The lead's first key on a float time after that (the joint), with keys after it that
     // every going axis shares (as many keys, on the same float times).
@@ -346,24 +352,22 @@ bool SamplerBuilder::sharedTail(const std::vector<double>& times, size_t* joint,
     while (first < keys.size() && !(float(keys[first].time) > float(stop))) {
         ++first;
     }
-    if (first + 2 > keys.size() || keys.size() - first > times.size()) {
-        return false;
+    if (first + 2 > keys.size()) {
+        return nullptr;
     }
     for (int a = 0; a < 3; ++a) {
         const std::vector<ChannelCurve::Key>& other = curves_[a] ? curves_[a]->keys() : keys;
         if (going[a] && other.size() != keys.size()) {
-            return false;
+            return nullptr;
         }
         for (size_t k = first; going[a] && &other != &keys && k < keys.size(); ++k) {
             if (float(other[k].time) != float(keys[k].time)) {
-                return false;
+                return nullptr;
             }
         }
     }
-    // After the stop the union holds just those keys, one knot each.
-    *joint = times.size() - (keys.size() - first);
     *firstKey = first;
-    return float(times[*joint]) == float(keys[first].time);
+    return lead;
 }
 
 size_t SamplerBuilder::sampledAtMost() const {

@@ -79,11 +79,10 @@ class SamplerBuilder {
     void keysExact(BuiltSampler* out) const;
     void unionCubic(BuiltSampler* out) const;
     // Where the axes keyed to the end (`going`) share their key times (one keyset's) after every
-    // other axis has stopped: the index in `times` (the union) of their first key after that,
-    // the joint, from which the knots are their keys, and its index in their curves; false when
-    // there is no such tail.
-    bool sharedTail(const std::vector<double>& times, size_t* joint, size_t* firstKey,
-                    bool going[3]) const;
+    // other axis has stopped: the first of them (the lead), whose key `firstKey` is their first
+    // after that (the joint), from which the knots are their keys; null when there is no such
+    // tail.
+    const ChannelCurve* sharedTail(size_t* firstKey, bool going[3]) const;
     // About how many frames and keys sampling would look at (kMaxSampledFrames at most).
     size_t sampledAtMost() const;
     // The union key times plus the whole frames inside every span that is not plain (see
