@@ -220,6 +220,16 @@ size_t ChannelCurve::TrimBefore(double seconds) {
     return first;
 }
 
+size_t ChannelCurve::FirstKeyAfter(double seconds) const {
+    size_t first = size_t(std::upper_bound(keys_.begin(), keys_.end(), seconds,
+                                           [](double t, const Key& k) { return t < k.time; }) -
+                          keys_.begin());
+    while (first < keys_.size() && !(float(keys_[first].time) > float(seconds))) {
+        ++first;
+    }
+    return first;
+}
+
 std::vector<double> ChannelCurve::UnionTimes(const ChannelCurve* const curves[], size_t count,
                                              double until) {
     std::vector<double> all, merged;

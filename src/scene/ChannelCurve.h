@@ -83,6 +83,10 @@ class ChannelCurve : public OrChannel {
     // (slopes that depended on a dropped key are made explicit). Returns the keys dropped.
     size_t TrimBefore(double seconds);
 
+    // The index of the first key whose time, as a file stores it (a float), is after that of
+    // `seconds`; the key count when there is none.
+    size_t FirstKeyAfter(double seconds) const;
+
     // Every key time of the `count` curves (null ones left out) up to `until`, ascending; times
     // that round to one float (as a file stores them) are one time, the earliest.
     static std::vector<double> UnionTimes(const ChannelCurve* const curves[], size_t count,

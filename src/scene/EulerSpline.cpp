@@ -221,13 +221,7 @@ bool EulerSpline::tailFrom(int* axis, size_t* firstKey, double held[3]) const {
     }
     // Its first key on a float time after that, with at least one piece after it.
     const std::vector<ChannelCurve::Key>& keys = curves_[last]->keys();
-    size_t first =
-        size_t(std::upper_bound(keys.begin(), keys.end(), stop,
-                                [](double t, const ChannelCurve::Key& k) { return t < k.time; }) -
-               keys.begin());
-    while (first < keys.size() && !(float(keys[first].time) > float(stop))) {
-        ++first;
-    }
+    const size_t first = curves_[last]->FirstKeyAfter(stop);
     if (first + 1 >= keys.size()) {
         return false;
     }

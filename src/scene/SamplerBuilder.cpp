@@ -345,13 +345,7 @@ const ChannelCurve* SamplerBuilder::sharedTail(size_t* firstKey, bool going[3]) 
     // The lead's first key on a float time after that (the joint), with keys after it that
     // every going axis shares (as many keys, on the same float times).
     const std::vector<ChannelCurve::Key>& keys = lead->keys();
-    size_t first =
-        size_t(std::upper_bound(keys.begin(), keys.end(), stop,
-                                [](double t, const ChannelCurve::Key& k) { return t < k.time; }) -
-               keys.begin());
-    while (first < keys.size() && !(float(keys[first].time) > float(stop))) {
-        ++first;
-    }
+    const size_t first = lead->FirstKeyAfter(stop);
     if (first + 2 > keys.size()) {
         return nullptr;
     }
