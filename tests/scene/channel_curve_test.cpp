@@ -107,6 +107,27 @@ TEST(ChannelCurve, SlopeSidesFrameRateAndMerge) {
     EXPECT_DOUBLE_EQ(c.keys()[1].value, 7);
 }
 
+// Key times of several curves as a file stores them, floats: times that round to one float are
+// one time (the earliest), a curve keyed where the union already is adds nothing, and the union
+// can stop at a time. The first key after a time skips keys on that time's float.
+TEST(ChannelCurve, UnionOfKeyTimesAndFirstKeyAfter) {
+    const double tenth = double(float(0.1));  // a file's 0.1, a little above the keyset's
+    ASSERT_NE(tenth, 0.1);
+    Curve a({{0, 0}, {0.1, 1}, {0.2, 0}, {0.3, 1}}), b({{tenth, 2}, {0.15, 1}, {0.35, 0}});
+    Curve same(a.keys());
+    const Curve* curves[] = {&a, nullptr, &b, &same};
+    EXPECT_EQ(Curve::UnionTimes(curves, 4), (std::vector<double>{0, 0.1, 0.15, 0.2, 0.3, 0.35}));
+    EXPECT_EQ(Curve::UnionTimes(curves, 4, 0.2), (std::vector<double>{0, 0.1, 0.15, 0.2}));
+    const Curve* fileFirst[] = {&b, &a};
+    EXPECT_EQ(Curve::UnionTimes(fileFirst, 2, 0.12), (std::vector<double>{0, 0.1}));
+    EXPECT_EQ(a.FirstKeyAfter(-1), 0u);
+    EXPECT_EQ(a.FirstKeyAfter(0.1), 2u);
+    EXPECT_EQ(a.FirstKeyAfter(tenth), 2u);
+    EXPECT_EQ(b.FirstKeyAfter(0.1), 1u);
+    EXPECT_EQ(a.FirstKeyAfter(0.25), 3u);
+    EXPECT_EQ(a.FirstKeyAfter(0.3), 4u);
+}
+
 // The angles apply X first, then Z: R = Rz(90) * Rx(90) takes +Y to +Z and +X to +Y (columns
 // of R); unwrapping moves each angle by whole turns towards the previous one.
 TEST(EulerRotation, OrderAndUnwrap) {
