@@ -8,10 +8,17 @@
 // (see store_channels). The store cases check afterwards that the stored scene holds the
 // stored keys' values.
 // At the end the ratios StoreChannels* / StoreUnchanged (target under 1.5) and
-// ParseAndExtract / Parse (target under 1.3) are printed.
+// ParseAndExtract / Parse (target under 1.3) are printed. Each store reuses the memory the one
+// before it freed, as a session that applies again and again does; with --fresh-heap the freed
+// memory is given back to the system between stores (untimed), so that each starts on fresh
+// memory as a batch run, a process of its own, does. With several repetitions,
+// --benchmark_enable_random_interleaving=true spreads each case's runs over the whole run, so
+// that a slow spell of a shared machine does not fall on one case alone.
 #include <benchmark/benchmark.h>
+#include <malloc.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cmath>
 #include <cstdio>
 #include <map>
@@ -34,6 +41,16 @@ constexpr int kAnimated = 300;
 constexpr int kVertices = 700;
 constexpr int kKeys = 240;
 constexpr int kFaceNodes = 34;  // 34 nodes x 6 animated channels: about 200 channels
+bool fresh_heap = false;        // --fresh-heap
+
+// Between two stores: with --fresh-heap, the freed memory goes back to the system.
+void between_stores(benchmark::State& state) {
+    if (fresh_heap) {
+        state.PauseTiming();
+        malloc_trim(0);
+        state.ResumeTiming();
+    }
+}
 
 // Writes the benchmark scene once per run; returns its path.
 const std::string& scene_path() {
@@ -162,10 +179,13 @@ void BM_ParseAndExtract(benchmark::State& state) {
 
 void BM_StoreUnchanged(benchmark::State& state) {
     for (auto _ : state) {
-        KLWireSource src(scene_path().c_str());
-        if (!src.Store(out_path().c_str())) {
-            state.SkipWithError("store failed");
+        {
+            KLWireSource src(scene_path().c_str());
+            if (!src.Store(out_path().c_str())) {
+                state.SkipWithError("store failed");
+            }
         }
+        between_stores(state);
     }
 }
 
@@ -193,20 +213,23 @@ void store_channels(benchmark::State& state, Layout layout) {
         out.push_back((k + 1) % 3);
     }
     for (auto _ : state) {
-        KLWireSource src(scene_path().c_str());
-        std::unique_ptr<OrDagNode> root(src.RootNode());
-        for (int i = 0; i < 300; ++i) {
-            int keyset = i / 30, node = firstNode + i / 3, axis = i % 3;
-            int channel = mixedAxes ? (axis == 2 ? 3 : axis) : (keyset < 8 ? axis : 3 + axis);
-            std::string name = "n" + std::to_string(node);
-            std::unique_ptr<OrDagNode> n(KLWire::FetchDagNode(root.get(), name.c_str()));
-            KLWire::alwaysClearChannel = 1;
-            KLWire::StoreChannel(n.get(), channel, 2000, times.data(), values.data(), in.data(),
-                                 nullptr, out.data(), nullptr);
+        {
+            KLWireSource src(scene_path().c_str());
+            std::unique_ptr<OrDagNode> root(src.RootNode());
+            for (int i = 0; i < 300; ++i) {
+                int keyset = i / 30, node = firstNode + i / 3, axis = i % 3;
+                int channel = mixedAxes ? (axis == 2 ? 3 : axis) : (keyset < 8 ? axis : 3 + axis);
+                std::string name = "n" + std::to_string(node);
+                std::unique_ptr<OrDagNode> n(KLWire::FetchDagNode(root.get(), name.c_str()));
+                KLWire::alwaysClearChannel = 1;
+                KLWire::StoreChannel(n.get(), channel, 2000, times.data(), values.data(), in.data(),
+                                     nullptr, out.data(), nullptr);
+            }
+            if (!src.Store(out_path().c_str())) {
+                state.SkipWithError("store failed");
+            }
         }
-        if (!src.Store(out_path().c_str())) {
-            state.SkipWithError("store failed");
-        }
+        between_stores(state);
     }
     // What was stored: the first and a rotated node's channels at a few of their keys.
     std::string error;
@@ -280,6 +303,14 @@ int main(int argc, char** argv) {
     // bench/batch-memory.sh).
     if (argc == 3 && std::string(argv[1]) == "--write-scene") {
         return std::rename(scene_path().c_str(), argv[2]) == 0 ? 0 : 1;
+    }
+    for (int i = 1; i < argc; ++i) {
+        if (std::string(argv[i]) == "--fresh-heap") {
+            fresh_heap = true;
+            std::copy(argv + i + 1, argv + argc, argv + i);
+            --argc;
+            break;
+        }
     }
     benchmark::Initialize(&argc, argv);
     std::printf("scene file: %s (%.1f MB)\n", scene_path().c_str(), [] {
