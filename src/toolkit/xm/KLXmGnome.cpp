@@ -7,6 +7,7 @@
 #include <Xm/ToggleB.h>
 #include <Xm/Xm.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstring>
 #include <vector>
@@ -203,7 +204,11 @@ Widget KLXmGnome::AddMenuToggle(Widget menu, const char* label, XtCallbackProc f
 void KLXmGnome::SetLabel(Widget widget, const std::string& text) {
     if (!widget)
         return;
-    XmString s = XmStringCreateLocalized(const_cast<char*>(text.c_str()));
+    // A label draws a tab character as nothing ("Select\tDagnode:" would read as one word):
+    // it is shown as a space.
+    std::string shown = text;
+    std::replace(shown.begin(), shown.end(), '\t', ' ');
+    XmString s = XmStringCreateLocalized(const_cast<char*>(shown.c_str()));
     XtVaSetValues(widget, XmNlabelString, s, nullptr);
     XmStringFree(s);
 }

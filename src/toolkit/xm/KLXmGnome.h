@@ -68,7 +68,8 @@ class KLXmGnome {
                                 XtPointer clientData, int position = -1);
     // Destroys the entries of `menu` after the first `keep`.
     static void EmptyMenu(Widget menu, int keep = 0);
-    // Sets the label string of a label or button (nothing for a null widget).
+    // Sets the label string of a label or button (nothing for a null widget); a tab shows as a
+    // space.
     static void SetLabel(Widget widget, const std::string& text);
 
     // Merges class-wide fallback resource lines (as in a resource file) into the display's

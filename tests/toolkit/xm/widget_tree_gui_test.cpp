@@ -90,4 +90,20 @@ TEST_F(WidgetTreeTest, MenuEntriesAreAddedAndEmptied) {
     EXPECT_EQ(Find(nullptr), nullptr);
 }
 
+// A tab in a label's text shows as a gap, not as nothing (as a Motif label draws it).
+TEST_F(WidgetTreeTest, ATabInALabelShowsAsAGap) {
+    Widget form = Find("testForm");
+    ASSERT_NE(form, nullptr);
+    Widget tabbed = XmCreateLabel(form, const_cast<char*>("tabbed"), nullptr, 0);
+    Widget plain = XmCreateLabel(form, const_cast<char*>("plain"), nullptr, 0);
+    KLXmGnome::SetLabel(tabbed, "Select\tDagnode:");
+    KLXmGnome::SetLabel(plain, "SelectDagnode:");
+    Dimension withTab = 0, without = 0;
+    XtVaGetValues(tabbed, XmNwidth, &withTab, nullptr);
+    XtVaGetValues(plain, XmNwidth, &without, nullptr);
+    EXPECT_GT(withTab, without);
+    XtDestroyWidget(tabbed);
+    XtDestroyWidget(plain);
+}
+
 }  // namespace
