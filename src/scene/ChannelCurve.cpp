@@ -230,6 +230,19 @@ size_t ChannelCurve::FirstKeyAfter(double seconds) const {
     return first;
 }
 
+double ChannelCurve::OthersStop(const ChannelCurve* const curves[], size_t count, bool going[]) {
+    double latest = -HUGE_VAL, stop = -HUGE_VAL;
+    for (size_t c = 0; c < count; ++c) {
+        latest = curves[c] ? std::max(latest, curves[c]->keys_.back().time) : latest;
+    }
+    for (size_t c = 0; c < count; ++c) {
+        const ChannelCurve* curve = curves[c];
+        going[c] = curve && float(curve->keys_.back().time) == float(latest);
+        stop = curve && !going[c] ? std::max(stop, curve->keys_.back().time) : stop;
+    }
+    return stop;
+}
+
 std::vector<double> ChannelCurve::UnionTimes(const ChannelCurve* const curves[], size_t count,
                                              double until) {
     std::vector<double> all, merged;

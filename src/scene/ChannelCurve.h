@@ -87,6 +87,11 @@ class ChannelCurve : public OrChannel {
     // `seconds`; the key count when there is none.
     size_t FirstKeyAfter(double seconds) const;
 
+    // Of the `count` curves (null ones left out), marks in `going` those keyed to the end (their
+    // last key on the latest float time) and returns when the others stop (the latest of their
+    // last keys); -HUGE_VAL when none stops before the end.
+    static double OthersStop(const ChannelCurve* const curves[], size_t count, bool going[]);
+
     // Every key time of the `count` curves (null ones left out) up to `until`, ascending; times
     // that round to one float (as a file stores them) are one time, the earliest.
     static std::vector<double> UnionTimes(const ChannelCurve* const curves[], size_t count,

@@ -165,10 +165,17 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
         }
         v += 8;
     };
+    // (with a tail, the joint is its first knot and written with it)
     for (size_t k = 0; k < n; ++k) {
         const Knot& from = at[k];
+        if (k + 1 == n) {
+            if (!tail) {
+                put(times[k], from.half, from.arrive, from.leave);
+            }
+            continue;
+        }
         put(times[k], from.half, from.arrive, from.leave);
-        if (k + 1 == n || parts[k] == 1) {
+        if (parts[k] == 1) {
             continue;
         }
         // The cut points of a piece cut into parts: on each axis's cubic in u = 0..1.
@@ -188,41 +195,38 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
             put(times[k] + u * dt, hu, slope, slope);
         }
     }
+    if (tail && !tail->Write(time, v)) {
+        return false;
+    }
     for (size_t j = 1; j < knots; ++j) {
         if (!(s.times[j] > s.times[j - 1])) {
             return false;  // two knots on one float time
         }
-    }
-    if (tail && !tail->Write(time - 1, v - 12)) {
-        return false;
     }
     *out = std::move(s);
     return true;
 }
 
 bool EulerSpline::tailFrom(int* axis, size_t* firstKey, double held[3]) const {
-    // The axis keyed last, and the time at which the others stop (their last key).
-    int last = -1;
+    // The one axis keyed to the end, and the time at which the others stop (their last key).
+    bool going[3];
+    const double stop = ChannelCurve::OthersStop(curves_, 3, going);
+    int last = -1, goingAxes = 0;
     for (int a = 0; a < 3; ++a) {
-        if (curves_[a] &&
-            (last < 0 || curves_[a]->keys().back().time > curves_[last]->keys().back().time)) {
+        if (going[a]) {
             last = a;
+            ++goingAxes;
         }
     }
-    double stop = -HUGE_VAL;
-    for (int a = 0; a < 3; ++a) {
-        if (a != last && curves_[a]) {
-            stop = std::max(stop, curves_[a]->keys().back().time);
-        }
-        held[a] = a != last && curves_[a] ? curves_[a]->keys().back().value : angles_[a];
-    }
-    if (last < 0 || stop == -HUGE_VAL) {
+    if (goingAxes != 1 || stop == -HUGE_VAL) {
         return false;
     }
+    for (int a = 0; a < 3; ++a) {
+        held[a] = a != last && curves_[a] ? curves_[a]->keys().back().value : angles_[a];
+    }
     // Its first key on a float time after that, with at least one piece after it.
-    const std::vector<ChannelCurve::Key>& keys = curves_[last]->keys();
     const size_t first = curves_[last]->FirstKeyAfter(stop);
-    if (first + 1 >= keys.size()) {
+    if (first + 1 >= curves_[last]->keys().size()) {
         return false;
     }
     *axis = last;

@@ -328,16 +328,10 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
 
 const ChannelCurve* SamplerBuilder::sharedTail(size_t* firstKey, bool going[3]) const {
     // The axes keyed to the end, and the time at which the others stop (their last key).
-    double latest = -HUGE_VAL, stop = -HUGE_VAL;
-    for (const ChannelCurve* c : curves_) {
-        latest = c ? std::max(latest, c->keys().back().time) : latest;
-    }
+    const double stop = ChannelCurve::OthersStop(curves_, 3, going);
     const ChannelCurve* lead = nullptr;
-    for (int a = 0; a < 3; ++a) {
-        const ChannelCurve* c = curves_[a];
-        going[a] = c && float(c->keys().back().time) == float(latest);
-        lead = going[a] && !lead ? c : lead;
-        stop = c && !going[a] ? std::max(stop, c->keys().back().time) : stop;
+    for (int a = 2; a >= 0; --a) {
+        lead = going[a] ? curves_[a] : lead;
     }
     if (!lead || stop == -HUGE_VAL) {
         return nullptr;
