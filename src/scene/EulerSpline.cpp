@@ -102,7 +102,7 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
     std::vector<unsigned char> parts;
     const size_t knots = PieceBound::PartsOfPieces(
         n - 1,
-        [&](size_t k) {
+        [&](size_t k, bool precise) {
             const double dt = times[k + 1] - times[k];
             PieceBound bound;
             const Knot &from = at[k], &to = at[k + 1];
@@ -110,7 +110,7 @@ bool EulerSpline::Build(double toleranceDegrees, size_t maxKnots, BuiltSampler* 
                 const double m0 = from.leave[a] * dt, m1 = to.arrive[a] * dt;
                 // (an axis that holds across the piece adds nothing)
                 if (from.half[a] != to.half[a] || m0 != 0 || m1 != 0) {
-                    bound.Add(from.half[a], to.half[a], m0, m1);
+                    bound.Add(from.half[a], to.half[a], m0, m1, precise);
                 }
             }
             return bound;

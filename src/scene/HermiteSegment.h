@@ -36,6 +36,11 @@ struct HermiteCubic {
         const double u = a != 0 ? std::min(1.0, std::max(0.0, -b / (3 * a))) : 0.0;
         return std::max({std::fabs(m0), std::fabs(m1), std::fabs(SlopeAt(u))});
     }
+    // A bound on the same without a division: the slope is m0 (1 - u) + m1 u - 3a u (1 - u),
+    // which strays from the line between the end slopes by at most 3|a|/4.
+    double SlopeBound() const {
+        return std::max(std::fabs(m0), std::fabs(m1)) + 0.75 * std::fabs(a);
+    }
 
     double p0, m0, m1, b, a;
 };

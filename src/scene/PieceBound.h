@@ -20,10 +20,12 @@ class PieceBound {
     static constexpr int kMaxParts = 16;
 
     // Adds one axis's half-angle over the piece (radians): from p0 to p1, with slopes m0 and m1
-    // in radians per piece (the slope per second times the piece's duration).
-    void Add(double p0, double p1, double m0, double m1) {
+    // in radians per piece (the slope per second times the piece's duration). Unless `precise`,
+    // the slope is bounded without a division, more loosely: enough to tell that a piece needs
+    // no cut, which is what most pieces are asked.
+    void Add(double p0, double p1, double m0, double m1, bool precise) {
         const HermiteCubic h(p0, p1, m0, m1);
-        first_ += h.PeakSlope();
+        first_ += precise ? h.PeakSlope() : h.SlopeBound();
         second_ += std::max(std::fabs(2 * h.b), std::fabs(2 * h.b + 6 * h.a));
         third_ += std::fabs(6 * h.a);
     }
@@ -43,8 +45,6 @@ class PieceBound {
     static double Drift(double latest, double first, double dt) {
         return latest * kHalfFloatStep * 2.6 * first / dt;
     }
-    // The turning speed the bound allows over a piece of `dt` seconds (radians per second).
-    double Speed(double dt) const { return first_ / dt; }
     // Widens the bound to cover `other` as well: a curve whose widest bound needs one part
     // (with the drift of its fastest piece at its latest time) needs one in every piece.
     void Widen(const PieceBound& other) {
@@ -78,10 +78,12 @@ class PieceBound {
 
     // The parts of each of `pieces` pieces into `parts`, and the knots they make (one more
     // than the parts), or 0 when a piece needs more than kMaxParts or the knots would number
-    // more than `maxKnots`. `boundOf(i)` is piece i's bound and `timeOf(i)` the time it starts
-    // (piece i ends at timeOf(i + 1)). The pieces are taken in blocks, and a block whose widest
-    // bound, drifting as its fastest piece at its latest time, needs one part needs one in
-    // every piece: most blocks of a lip-sync curve do, without asking piece by piece.
+    // more than `maxKnots`. `boundOf(i, precise)` is piece i's bound (see Add) and `timeOf(i)`
+    // the time it starts (piece i ends at timeOf(i + 1)). The pieces are taken in blocks, and a
+    // block whose widest loose bound, drifting as its fastest piece at its latest time, needs
+    // one part needs one in every piece: most blocks of a lip-sync curve do, without asking
+    // piece by piece. The others are asked piece by piece, with the precise bounds, so that
+    // the loose ones never add a cut.
     template <class BoundOf, class TimeOf>
     static size_t PartsOfPieces(size_t pieces, const BoundOf& boundOf, const TimeOf& timeOf,
                                 double allowedRadians, bool oneAxis, size_t maxKnots,
@@ -91,22 +93,31 @@ class PieceBound {
         size_t knots = 1;
         for (size_t start = 0; start < pieces; start += kBlock) {
             const size_t end = std::min(pieces, start + kBlock);
-            PieceBound bounds[kBlock], widest;
-            double fastest = 0;
+            PieceBound widest;
+            // The fastest piece's turn and duration: its speed is their quotient, compared by
+            // cross-multiplying (durations are positive).
+            double fastTurn = 0, fastDt = 1;
             for (size_t i = start; i < end; ++i) {
-                const PieceBound& b = bounds[i - start] = boundOf(i);
+                const PieceBound b = boundOf(i, false);
                 widest.Widen(b);
-                fastest = std::max(fastest, b.Speed(timeOf(i + 1) - timeOf(i)));
+                const double dt = timeOf(i + 1) - timeOf(i);
+                if (b.first_ * fastDt > fastTurn * dt) {
+                    fastTurn = b.first_;
+                    fastDt = dt;
+                }
             }
             // (the fastest a hair faster: a piece's own drift rounds in another order)
             const double latest = std::max(std::fabs(timeOf(start)), std::fabs(timeOf(end)));
-            if (widest.PartsAllowing(Drift(latest, fastest * (1 + 1e-12), 1.0), allowedRadians,
+            if (widest.PartsAllowing(Drift(latest, fastTurn * (1 + 1e-12), fastDt), allowedRadians,
                                      oneAxis) == 1) {
                 knots += end - start;
             } else {
                 for (size_t i = start; i < end; ++i) {
-                    const int p =
-                        bounds[i - start].Parts(timeOf(i), timeOf(i + 1), allowedRadians, oneAxis);
+                    const double t0 = timeOf(i), t1 = timeOf(i + 1);
+                    int p = boundOf(i, false).Parts(t0, t1, allowedRadians, oneAxis);
+                    if (p != 1) {
+                        p = boundOf(i, true).Parts(t0, t1, allowedRadians, oneAxis);
+                    }
                     if (p == 0) {
                         return 0;
                     }

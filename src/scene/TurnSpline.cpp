@@ -57,11 +57,11 @@ size_t TurnSpline::Plan(double toleranceDegrees, size_t maxKnots) {
     }
     knots_ = PieceBound::PartsOfPieces(
         n - 1,
-        [&](size_t i) {
+        [&](size_t i, bool precise) {
             const double dt = keys[i + 1].time - keys[i].time;
             PieceBound b;
             b.Add(keys[i].value * kHalfRadians, keys[i + 1].value * kHalfRadians, leave_[i] * dt,
-                  in_[i + 1] * dt);
+                  in_[i + 1] * dt, precise);
             return b;
         },
         [&](size_t i) { return keys[i].time; }, toleranceDegrees * kPi / 180, true, maxKnots,
