@@ -9,7 +9,8 @@
 #include "scene/HermiteSegment.h"
 #include "toolkit/CueTime.h"
 
-void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out, size_t from) const {
+void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out, size_t from,
+                          double scale) const {
     const size_t n = keys_.size();
     in->resize(n > from ? n - from : 0);
     out->resize(in->size());
@@ -19,8 +20,8 @@ void ChannelCurve::Slopes(std::vector<double>* in, std::vector<double>* out, siz
         const Key& k = keys_[i];
         const double after = i + 1 < n ? segmentSlope(i) : 0.0;
         const double smooth = k.in == kSmooth || k.out == kSmooth ? smoothSlope(i) : 0.0;
-        (*in)[i - from] = SideSlope(k.in, smooth, before, k.inSlope);
-        (*out)[i - from] = SideSlope(k.out, smooth, after, k.outSlope);
+        (*in)[i - from] = SideSlope(k.in, smooth, before, k.inSlope) * scale;
+        (*out)[i - from] = SideSlope(k.out, smooth, after, k.outSlope) * scale;
         before = after;
     }
 }

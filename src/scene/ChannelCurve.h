@@ -63,8 +63,9 @@ class ChannelCurve : public OrChannel {
                          k.in == kLinear && i > 0 ? segmentSlope(i - 1) : 0.0, k.inSlope);
     }
     // InSlope and OutSlope of every key from key `from` on (element i for key from + i), in one
-    // pass (each segment's slope worked out once).
-    void Slopes(std::vector<double>* in, std::vector<double>* out, size_t from = 0) const;
+    // pass (each segment's slope worked out once), each multiplied by `scale`.
+    void Slopes(std::vector<double>* in, std::vector<double>* out, size_t from = 0,
+                double scale = 1) const;
     // A bound on the size of the curve's slope anywhere (units per second).
     double MaxSlope() const;
     // The curve's derivative (units per second) at `seconds`, from the right (`outgoing`) or

@@ -50,11 +50,7 @@ size_t TurnSpline::Plan(double toleranceDegrees, size_t maxKnots) {
         }
     }
     // Each key's slopes, in half-angle radians per second, and each piece's number of parts.
-    curve_.Slopes(&in_, &leave_, first_);
-    for (size_t i = 0; i < n; ++i) {
-        in_[i] *= kHalfRadians;
-        leave_[i] *= kHalfRadians;
-    }
+    curve_.Slopes(&in_, &leave_, first_, kHalfRadians);
     knots_ = PieceBound::PartsOfPieces(
         n - 1,
         [&](size_t i, bool precise) {
@@ -78,18 +74,14 @@ bool TurnSpline::Write(float* times, float* values) const {
     // The rotation is cos(h) P + sin(h) Q, its derivative by h -sin(h) P + cos(h) Q.
     auto put = [&](double at, double half, double arrive, double depart) {
         const double ch = std::cos(half), sh = std::sin(half);
-        double q[4], dq[4];
-        for (int c = 0; c < 4; ++c) {
-            q[c] = ch * p_[c] + sh * q_[c];
-            dq[c] = ch * q_[c] - sh * p_[c];
-        }
         *time++ = BuiltSampler::Stored(at);
-        for (int c = 0; c < 4; ++c, ++v) {
-            v[0] = BuiltSampler::Stored(dq[c] * arrive);
-            v[4] = BuiltSampler::Stored(q[c]);
-            v[8] = BuiltSampler::Stored(dq[c] * depart);
+        for (int c = 0; c < 4; ++c) {
+            const double dq = ch * q_[c] - sh * p_[c];
+            v[c] = BuiltSampler::Stored(dq * arrive);
+            v[4 + c] = BuiltSampler::Stored(ch * p_[c] + sh * q_[c]);
+            v[8 + c] = BuiltSampler::Stored(dq * depart);
         }
-        v += 8;
+        v += 12;
     };
     for (size_t i = 0; i < n; ++i) {
         const double half = keys[i].value * kHalfRadians;
