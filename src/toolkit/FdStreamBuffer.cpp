@@ -1,5 +1,6 @@
 #include "toolkit/FdStreamBuffer.h"
 
+#include <fcntl.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -22,6 +23,13 @@ bool FdStreamBuffer::writeAll(const char* data, size_t size) {
         }
         data += n;
         size -= size_t(n);
+        written_ += size_t(n);
+    }
+    // Each few megabytes written, the disk is set to work on them while the rest is written,
+    // so that the flush at the end waits only for the last of them.
+    if (written_ - started_ >= kWritebackStep) {
+        ::sync_file_range(fd_, off_t(started_), off_t(written_ - started_), SYNC_FILE_RANGE_WRITE);
+        started_ = written_;
     }
     return true;
 }

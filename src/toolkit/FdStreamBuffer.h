@@ -26,7 +26,11 @@ class FdStreamBuffer : public std::streambuf {
     bool writeAll(const char* data, size_t size);
     bool drain();
 
+    static constexpr size_t kWritebackStep = size_t(4) << 20;
+
     int fd_;
     int error_ = 0;
+    size_t written_ = 0;  // bytes written so far
+    size_t started_ = 0;  // of them, those the disk was asked to write out
     std::vector<char> buffer_;
 };

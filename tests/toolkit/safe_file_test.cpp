@@ -56,16 +56,19 @@ class SafeFileTest : public TempDirTest, public ::testing::WithParamInterface<bo
     std::string target_;
 };
 
-// A new file gets the usual permissions and all its content (more than the stream's buffer;
-// writers that need a file name go through the descriptor path, as pictures do); a save that
-// is abandoned changes nothing; a replaced file keeps its permissions.
+// A new file gets the usual permissions and all its content (more than the stream's buffer,
+// in pieces that set the disk writing part-way; writers that need a file name go through the
+// descriptor path, as pictures do); a save that is abandoned changes nothing; a replaced file
+// keeps its permissions.
 TEST_P(SafeFileTest, CommitsWholeContentKeepingThePermissions) {
     const mode_t old = ::umask(027);
-    std::string first(3 << 20, 'x');
+    std::string first(9 << 20, 'x');
     first[12345] = '\n';
+    first[(6 << 20) + 7] = 'y';
     SafeFile created(target_);
     created.Stream() << "head ";
-    created.Stream().write(first.data(), std::streamsize(first.size()));
+    for (size_t at = 0; at < first.size(); at += 3 << 20)
+        created.Stream().write(first.data() + at, std::streamsize(3 << 20));
     const bool committed = created.Commit();
     ::umask(old);
     ASSERT_TRUE(committed) << created.ErrorText();
