@@ -5,8 +5,8 @@
 //   StoreChannels       load, 10 x 30 channels of 2,000 keys stored, then store
 //   StoreChannelsMixedAxes   the same with translation and rotation channels on each node
 //   StoreChannelsKeyedApart  the same on nodes whose other axes the file keys at other times
-// (see store_channels). The store cases check afterwards that the stored scene holds the
-// stored keys' values.
+// (see Layout). The store cases check afterwards that the stored scene holds the stored keys'
+// values.
 // At the end the ratios StoreChannels* / StoreUnchanged (target under 1.5) and
 // ParseAndExtract / Parse (target under 1.3) are printed. Each store reuses the memory the one
 // before it freed, as a session that applies again and again does; with --fresh-heap the freed
@@ -14,8 +14,13 @@
 // memory as a batch run, a process of its own, does. With several repetitions,
 // --benchmark_enable_random_interleaving=true spreads each case's runs over the whole run, so
 // that a slow spell of a shared machine does not fall on one case alone.
+// Then come paired rounds (--paired ROUNDS, 10 unless given; 0 for none): the four store cases
+// one after another, store by store, so that a slow spell falls on every case alike; each
+// case's median and spread, and each round's store over that round's unchanged one, in both
+// ways of starting on memory.
 #include <benchmark/benchmark.h>
 #include <malloc.h>
+#include <time.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -177,20 +182,9 @@ void BM_ParseAndExtract(benchmark::State& state) {
     }
 }
 
-void BM_StoreUnchanged(benchmark::State& state) {
-    for (auto _ : state) {
-        {
-            KLWireSource src(scene_path().c_str());
-            if (!src.Store(out_path().c_str())) {
-                state.SkipWithError("store failed");
-            }
-        }
-        between_stores(state);
-    }
-}
-
 // 10 keysets x 30 channels, each channel 2,000 keys (one every 3 frames, mixed tangents),
 // stored on 100 nodes. As apply does, the channels of one keyset share their key times.
+// Unchanged: nothing is stored, the scene is loaded and stored as it is.
 // Shared: keysets 0..7 drive TX TY TZ of nodes 0..79 and keysets 8..9 RX RY RZ of nodes 80..99,
 // so that every path is written at the applied keys.
 // MixedAxes: every node 0..99 gets TX TY and RX, translation and rotation on one node; the
@@ -199,39 +193,59 @@ void BM_StoreUnchanged(benchmark::State& state) {
 // KeyedApart: the same channels on nodes 100..199, whose other axes the file moves at its own
 // key times (a key every frame for 8 s): each path is written at the union of both key times,
 // the rotation turning about three axes.
-enum class Layout { Shared, MixedAxes, KeyedApart };
-void store_channels(benchmark::State& state, Layout layout) {
-    const bool mixedAxes = layout != Layout::Shared;
-    const int firstNode = layout == Layout::KeyedApart ? 100 : 0;
+enum class Layout { Unchanged, Shared, MixedAxes, KeyedApart };
+constexpr const char* kLayoutNames[] = {"Unchanged", "Channels", "ChannelsMixedAxes",
+                                        "ChannelsKeyedApart"};
+
+// The keys every stored channel gets.
+struct AppliedKeys {
+    AppliedKeys() {
+        for (int k = 0; k < 2000; ++k) {
+            times.push_back(CueTime::FromTicks(k * 600));
+            values.push_back(float(std::sin(k * 0.3)));
+            in.push_back(k % 3);
+            out.push_back((k + 1) % 3);
+        }
+    }
     std::vector<CueTime> times;
     std::vector<float> values;
     std::vector<int> in, out;
-    for (int k = 0; k < 2000; ++k) {
-        times.push_back(CueTime::FromTicks(k * 600));
-        values.push_back(float(std::sin(k * 0.3)));
-        in.push_back(k % 3);
-        out.push_back((k + 1) % 3);
-    }
-    for (auto _ : state) {
-        {
-            KLWireSource src(scene_path().c_str());
-            std::unique_ptr<OrDagNode> root(src.RootNode());
-            for (int i = 0; i < 300; ++i) {
-                int keyset = i / 30, node = firstNode + i / 3, axis = i % 3;
-                int channel = mixedAxes ? (axis == 2 ? 3 : axis) : (keyset < 8 ? axis : 3 + axis);
-                std::string name = "n" + std::to_string(node);
-                std::unique_ptr<OrDagNode> n(KLWire::FetchDagNode(root.get(), name.c_str()));
-                KLWire::alwaysClearChannel = 1;
-                KLWire::StoreChannel(n.get(), channel, 2000, times.data(), values.data(), in.data(),
-                                     nullptr, out.data(), nullptr);
-            }
-            if (!src.Store(out_path().c_str())) {
-                state.SkipWithError("store failed");
-            }
+};
+const AppliedKeys& applied_keys() {
+    static const AppliedKeys keys;
+    return keys;
+}
+
+// One load, the layout's channels stored, and one store; false when the store failed.
+bool store_once(Layout layout) {
+    const AppliedKeys& keys = applied_keys();
+    KLWireSource src(scene_path().c_str());
+    if (layout != Layout::Unchanged) {
+        const bool mixedAxes = layout != Layout::Shared;
+        const int firstNode = layout == Layout::KeyedApart ? 100 : 0;
+        std::unique_ptr<OrDagNode> root(src.RootNode());
+        for (int i = 0; i < 300; ++i) {
+            int keyset = i / 30, node = firstNode + i / 3, axis = i % 3;
+            int channel = mixedAxes ? (axis == 2 ? 3 : axis) : (keyset < 8 ? axis : 3 + axis);
+            std::string name = "n" + std::to_string(node);
+            std::unique_ptr<OrDagNode> n(KLWire::FetchDagNode(root.get(), name.c_str()));
+            KLWire::alwaysClearChannel = 1;
+            KLWire::StoreChannel(n.get(), channel, 2000, keys.times.data(), keys.values.data(),
+                                 keys.in.data(), nullptr, keys.out.data(), nullptr);
         }
-        between_stores(state);
     }
-    // What was stored: the first and a rotated node's channels at a few of their keys.
+    return src.Store(out_path().c_str()) != 0;
+}
+
+// What the last store of `layout` wrote: the first and a rotated node's channels at a few of
+// their keys. Empty when right, else what is wrong.
+std::string check_stored(Layout layout) {
+    if (layout == Layout::Unchanged) {
+        return {};
+    }
+    const AppliedKeys& keys = applied_keys();
+    const bool mixedAxes = layout != Layout::Shared;
+    const int firstNode = layout == Layout::KeyedApart ? 100 : 0;
     std::string error;
     auto back = SceneDocument::Load(out_path(), &error);
     const std::pair<int, int> checked[] = {{0, 0}, {0, mixedAxes ? 3 : 1}, {95, mixedAxes ? 1 : 4}};
@@ -239,25 +253,40 @@ void store_channels(benchmark::State& state, Layout layout) {
         const int node = firstNode + offset;
         const ChannelCurve* curve = back ? back->Curve(node, channel) : nullptr;
         for (int k : {0, 1, 2, 999, 1998, 1999}) {
-            double got = curve ? curve->Evaluate(times[size_t(k)].Seconds()) : 1e9;
-            if (std::fabs(got - values[size_t(k)]) > 2e-3) {
-                state.SkipWithError(("wrong value stored on node " + std::to_string(node) +
-                                     " channel " + std::to_string(channel) + " " + error)
-                                        .c_str());
-                return;
+            double got = curve ? curve->Evaluate(keys.times[size_t(k)].Seconds()) : 1e9;
+            if (std::fabs(got - keys.values[size_t(k)]) > 2e-3) {
+                return "wrong value stored on node " + std::to_string(node) + " channel " +
+                       std::to_string(channel) + " " + error;
             }
         }
     }
+    return {};
 }
 
+void store_case(benchmark::State& state, Layout layout) {
+    for (auto _ : state) {
+        if (!store_once(layout)) {
+            state.SkipWithError("store failed");
+        }
+        between_stores(state);
+    }
+    const std::string wrong = check_stored(layout);
+    if (!wrong.empty()) {
+        state.SkipWithError(wrong.c_str());
+    }
+}
+
+void BM_StoreUnchanged(benchmark::State& state) {
+    store_case(state, Layout::Unchanged);
+}
 void BM_StoreChannels(benchmark::State& state) {
-    store_channels(state, Layout::Shared);
+    store_case(state, Layout::Shared);
 }
 void BM_StoreChannelsMixedAxes(benchmark::State& state) {
-    store_channels(state, Layout::MixedAxes);
+    store_case(state, Layout::MixedAxes);
 }
 void BM_StoreChannelsKeyedApart(benchmark::State& state) {
-    store_channels(state, Layout::KeyedApart);
+    store_case(state, Layout::KeyedApart);
 }
 
 BENCHMARK(BM_Parse)->Unit(benchmark::kMillisecond)->MinTime(3);
@@ -296,6 +325,70 @@ class RatioReporter : public benchmark::ConsoleReporter {
     std::map<std::string, double> real, cpu;
     std::map<std::string, bool> fromMedian;
 };
+// The paired rounds (see main): the four store cases one after another, each round starting at
+// the next case, each store timed on its own, process CPU and wall clock (ms).
+struct CaseTimes {
+    std::vector<double> cpu, wall;
+};
+double clock_ms(clockid_t clock) {
+    timespec t{};
+    clock_gettime(clock, &t);
+    return double(t.tv_sec) * 1e3 + double(t.tv_nsec) * 1e-6;
+}
+// The median of `v` and its spread as "median (lowest-highest)".
+std::string median_spread(std::vector<double> v, const char* format) {
+    std::sort(v.begin(), v.end());
+    char text[96];
+    std::snprintf(text, sizeof text, format, v[v.size() / 2], v.front(), v.back());
+    return text;
+}
+bool paired_rounds(int rounds, bool fresh) {
+    std::vector<CaseTimes> times(4);
+    for (int c = 0; c < 4; ++c) {
+        store_once(Layout(c));  // (untimed: the process's first stores touch fresh memory)
+    }
+    for (int r = 0; r < rounds; ++r) {
+        for (int i = 0; i < 4; ++i) {
+            const int c = (r + i) % 4;
+            if (fresh) {
+                malloc_trim(0);
+            }
+            const double cpu = clock_ms(CLOCK_PROCESS_CPUTIME_ID), wall = clock_ms(CLOCK_MONOTONIC);
+            if (!store_once(Layout(c))) {
+                std::printf("Store%s: store failed\n", kLayoutNames[c]);
+                return false;
+            }
+            times[size_t(c)].cpu.push_back(clock_ms(CLOCK_PROCESS_CPUTIME_ID) - cpu);
+            times[size_t(c)].wall.push_back(clock_ms(CLOCK_MONOTONIC) - wall);
+            const std::string wrong = r + 1 == rounds ? check_stored(Layout(c)) : std::string();
+            if (!wrong.empty()) {
+                std::printf("Store%s: %s\n", kLayoutNames[c], wrong.c_str());
+                return false;
+            }
+        }
+    }
+    std::printf("\nPaired rounds (%d), each store %s: median (lowest-highest)\n", rounds,
+                fresh ? "on memory given back to the system (as a batch run starts)"
+                      : "reusing the memory the one before it freed");
+    for (int c = 0; c < 4; ++c) {
+        std::printf("  Store%-19s CPU %s  wall %s", kLayoutNames[c],
+                    median_spread(times[size_t(c)].cpu, "%6.1f ms (%.1f-%.1f)").c_str(),
+                    median_spread(times[size_t(c)].wall, "%6.1f ms (%.1f-%.1f)").c_str());
+        if (c > 0) {
+            // Each round's store over that round's unchanged one.
+            std::vector<double> cpu, wall;
+            for (int r = 0; r < rounds; ++r) {
+                cpu.push_back(times[size_t(c)].cpu[size_t(r)] / times[0].cpu[size_t(r)]);
+                wall.push_back(times[size_t(c)].wall[size_t(r)] / times[0].wall[size_t(r)]);
+            }
+            std::printf("  / Unchanged: CPU %s, wall %s (target under 1.5)",
+                        median_spread(cpu, "%.2f (%.2f-%.2f)").c_str(),
+                        median_spread(wall, "%.2f (%.2f-%.2f)").c_str());
+        }
+        std::printf("\n");
+    }
+    return true;
+}
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -304,13 +397,23 @@ int main(int argc, char** argv) {
     if (argc == 3 && std::string(argv[1]) == "--write-scene") {
         return std::rename(scene_path().c_str(), argv[2]) == 0 ? 0 : 1;
     }
-    for (int i = 1; i < argc; ++i) {
-        if (std::string(argv[i]) == "--fresh-heap") {
+    int rounds = 10;
+    for (int i = 1; i < argc;) {
+        const std::string arg = argv[i];
+        int used = 0;
+        if (arg == "--fresh-heap") {
             fresh_heap = true;
-            std::copy(argv + i + 1, argv + argc, argv + i);
-            --argc;
-            break;
+            used = 1;
+        } else if (arg == "--paired" && i + 1 < argc) {
+            rounds = std::max(0, std::atoi(argv[i + 1]));
+            used = 2;
         }
+        if (used == 0) {
+            ++i;
+            continue;
+        }
+        std::copy(argv + i + used, argv + argc, argv + i);
+        argc -= used;
     }
     benchmark::Initialize(&argc, argv);
     std::printf("scene file: %s (%.1f MB)\n", scene_path().c_str(), [] {
@@ -337,8 +440,12 @@ int main(int argc, char** argv) {
     ratio("BM_StoreChannelsMixedAxes", "BM_StoreUnchanged", 1.5);
     ratio("BM_StoreChannelsKeyedApart", "BM_StoreUnchanged", 1.5);
     ratio("BM_ParseAndExtract", "BM_Parse", 1.3);
+    bool paired = true;
+    for (bool fresh : {false, true}) {
+        paired = paired && (rounds == 0 || paired_rounds(rounds, fresh));
+    }
     std::remove(scene_path().c_str());
     std::remove(out_path().c_str());
     benchmark::Shutdown();
-    return 0;
+    return paired ? 0 : 1;
 }
