@@ -7,6 +7,7 @@
 #include "scene/ChannelCurve.h"
 #include "scene/CurveCursor.h"
 #include "scene/EulerRotation.h"
+#include "scene/HermiteSegment.h"
 #include "scene/KLChannel.h"
 #include "scene/KLSplineChannel.h"
 #include "toolkit/CueTime.h"
@@ -126,6 +127,33 @@ TEST(ChannelCurve, UnionOfKeyTimesAndFirstKeyAfter) {
     EXPECT_EQ(b.FirstKeyAfter(0.1), 1u);
     EXPECT_EQ(a.FirstKeyAfter(0.25), 3u);
     EXPECT_EQ(a.FirstKeyAfter(0.3), 4u);
+}
+
+// A segment's peak slope is the largest slope along it, and the division-free bound is never
+// under it: both reached where they are tight (a bump with flat ends peaks at its middle at
+// exactly the bound), and held on segments of every shape.
+TEST(HermiteCubic, PeakSlopeAndItsDivisionFreeBound) {
+    EXPECT_EQ(HermiteCubic(3, 3, 0, 0).PeakSlope(), 0);
+    const HermiteCubic there(0, 0, 2, 2);  // out and back: slope 2 - 12u + 12u²
+    EXPECT_NEAR(there.PeakSlope(), 2, 1e-12);
+    const HermiteCubic flatEnds(0, 1, 0, 0);  // slope 6u(1 - u): 1.5 at the middle
+    EXPECT_NEAR(flatEnds.PeakSlope(), 1.5, 1e-12);
+    EXPECT_NEAR(flatEnds.SlopeBound(), 1.5, 1e-12);
+    unsigned seed = 7;
+    auto next = [&seed] {
+        seed = seed * 1103515245u + 12345u;
+        return double(seed >> 8 & 0xFFFF) / 0x8000 - 1;  // -1 .. 1
+    };
+    for (int i = 0; i < 2000; ++i) {
+        const HermiteCubic h(next() * 4, next() * 4, next() * 8, next() * 8);
+        double most = 0;
+        for (int j = 0; j <= 200; ++j) {
+            most = std::max(most, std::fabs(h.SlopeAt(j / 200.0)));
+        }
+        ASSERT_GE(h.PeakSlope(), most - 1e-9) << i;
+        ASSERT_LE(h.PeakSlope(), most + 0.01 * (1 + most)) << i;  // the grid misses a little
+        ASSERT_GE(h.SlopeBound(), h.PeakSlope() - 1e-9) << i;
+    }
 }
 
 // The angles apply X first, then Z: R = Rz(90) * Rx(90) takes +Y to +Z and +X to +Y (columns
