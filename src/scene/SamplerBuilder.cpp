@@ -233,25 +233,45 @@ bool SamplerBuilder::BuildRotation(BuiltSampler* out, std::string* why) const {
 void SamplerBuilder::keysExact(BuiltSampler* out) const {
     const bool cubic = out->interpolation == "CUBICSPLINE";
     const auto& lead = lead_->keys();
-    const size_t n = lead.size(), stride = cubic ? 9 : 3;
+    const size_t n = lead.size();
     out->times.resize(n);
-    float* const values = out->SizeValues(n * stride);
+    float* const values = out->SizeValues(n * (cubic ? 9 : 3));
     for (size_t k = 0; k < n; ++k) {
         out->times[k] = BuiltSampler::Stored(lead[k].time);
     }
-    // Axis by axis into the interleaved values: in-tangents, values, out-tangents of each key.
-    std::vector<double> in, leave;
+    const bool going[3] = {curves_[0] != nullptr, curves_[1] != nullptr, curves_[2] != nullptr};
+    writeOwnKeys(values, 0, n, cubic, going, rest_);
+}
+
+void SamplerBuilder::writeOwnKeys(float* v, size_t from, size_t count, bool cubic,
+                                  const bool going[3], const double held[3]) const {
+    std::vector<double> in[3], leave[3];
+    const ChannelCurve::Key* key[3] = {nullptr, nullptr, nullptr};
+    float still[3];
     for (int a = 0; a < 3; ++a) {
-        const ChannelCurve* c = curves_[a];
-        if (c && cubic) {
-            c->Slopes(&in, &leave);
-        }
-        float* v = values + (cubic ? 3 : 0) + a;
-        for (size_t k = 0; k < n; ++k, v += stride) {
-            v[0] = BuiltSampler::Stored(c ? c->keys()[k].value : rest_[a]);
+        still[a] = BuiltSampler::Stored(held[a]);
+        if (going[a]) {
+            key[a] = curves_[a]->keys().data() + from;
             if (cubic) {
-                v[-3] = c ? BuiltSampler::Stored(in[k]) : 0.0f;
-                v[3] = c ? BuiltSampler::Stored(leave[k]) : 0.0f;
+                curves_[a]->Slopes(&in[a], &leave[a], from);
+                leave[a].back() = 0;
+            }
+        }
+    }
+    const size_t value = cubic ? 3 : 0, stride = cubic ? 9 : 3;
+    for (size_t k = 0; k < count; ++k, v += stride) {
+        for (int a = 0; a < 3; ++a) {
+            if (!key[a]) {
+                v[value + a] = still[a];
+                if (cubic) {
+                    v[a] = v[6 + a] = 0.0f;
+                }
+            } else if (cubic) {
+                v[a] = BuiltSampler::Stored(in[a][k]);
+                v[3 + a] = BuiltSampler::Stored(key[a][k].value);
+                v[6 + a] = BuiltSampler::Stored(leave[a][k]);
+            } else {
+                v[a] = BuiltSampler::Stored(key[a][k].value);
             }
         }
     }
@@ -303,27 +323,11 @@ void SamplerBuilder::unionCubic(BuiltSampler* out) const {
         return;
     }
     // The tail: the going axes at their own keys after the joint, the others held.
-    std::vector<double> in, leave;
+    double held[3];
     for (int a = 0; a < 3; ++a) {
-        float* w = v + a;
-        if (!going[a]) {
-            const float held =
-                BuiltSampler::Stored(curves_[a] ? curves_[a]->keys().back().value : rest_[a]);
-            for (size_t k = 0; k < count; ++k, w += 9) {
-                w[0] = w[6] = 0.0f;
-                w[3] = held;
-            }
-            continue;
-        }
-        const ChannelCurve::Key* key = curves_[a]->keys().data() + firstKey + 1;
-        curves_[a]->Slopes(&in, &leave, firstKey + 1);
-        leave.back() = 0;  // (nothing leaves the last key, as a cursor has it)
-        for (size_t k = 0; k < count; ++k, w += 9) {
-            w[0] = BuiltSampler::Stored(in[k]);
-            w[3] = BuiltSampler::Stored(key[k].value);
-            w[6] = BuiltSampler::Stored(leave[k]);
-        }
+        held[a] = curves_[a] ? curves_[a]->keys().back().value : rest_[a];
     }
+    writeOwnKeys(v, firstKey + 1, count, true, going, held);
 }
 
 const ChannelCurve* SamplerBuilder::sharedTail(size_t* firstKey, bool going[3]) const {

@@ -83,6 +83,12 @@ class SamplerBuilder {
     // after that (the joint), from which the knots are their keys; null when there is no such
     // tail.
     const ChannelCurve* sharedTail(size_t* firstKey, bool going[3]) const;
+    // Writes `count` knots at the `going` axes' own keys from key `from` on (times they share)
+    // into `v`, knot by knot: for CUBICSPLINE (`cubic`) the three axes' in-tangents, values and
+    // out-tangents side by side (the last knot leaving flat, as a cursor has it), else their
+    // values; an axis not going holds `held[a]`.
+    void writeOwnKeys(float* v, size_t from, size_t count, bool cubic, const bool going[3],
+                      const double held[3]) const;
     // About how many frames and keys sampling would look at (kMaxSampledFrames at most).
     size_t sampledAtMost() const;
     // The union key times plus the whole frames inside every span that is not plain (see
