@@ -440,6 +440,12 @@ int main(int argc, char** argv) {
     ratio("BM_StoreChannelsMixedAxes", "BM_StoreUnchanged", 1.5);
     ratio("BM_StoreChannelsKeyedApart", "BM_StoreUnchanged", 1.5);
     ratio("BM_ParseAndExtract", "BM_Parse", 1.3);
+    if (rounds > 0 && reporter.real.count("BM_StoreUnchanged")) {
+        std::printf(
+            "(the store ratios above compare cases timed in blocks of their own, which a "
+            "busy machine\n can slow unevenly; the paired rounds below time them store "
+            "by store)\n");
+    }
     bool paired = true;
     for (bool fresh : {false, true}) {
         paired = paired && (rounds == 0 || paired_rounds(rounds, fresh));
