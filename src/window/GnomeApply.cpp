@@ -126,18 +126,24 @@ void Gnome::create_apply_dialog() {
     Widget dialog = FindWidget("applyDialog");
     if (!dialog || FindWidget("top_form", dialog))
         return;
+    // The dialog keeps the size it was given (or grows to fit): shown again it would otherwise
+    // shrink to its children's least size. What it has to spare goes to the lists.
+    XtVaSetValues(dialog, XmNresizePolicy, XmRESIZE_GROW, nullptr);
     Widget top = make(xmFormWidgetClass, "top_form", dialog);
-    XtVaSetValues(top, XmNtopAttachment, XmATTACH_FORM, XmNleftAttachment, XmATTACH_FORM,
-                  XmNrightAttachment, XmATTACH_FORM, nullptr);
     lister(top, "keyListerBox", "keyListerLabel", "Select Keyset(s)", "keyLister", true,
            XmMULTIPLE_SELECT);
     lister(top, "dagListerBox", "dagListerLabel", "Select\tDagnode:", "dagLister", false,
            XmBROWSE_SELECT);
     Widget sep = make(xmSeparatorWidgetClass, "horiz_separator", dialog);
-    attach(sep, top, false, false);
     Widget bottom = make(xmFormWidgetClass, "bottom_form", dialog);
-    attach(bottom, sep, false, false);
-    XtVaSetValues(bottom, XmNbottomAttachment, XmATTACH_FORM, nullptr);
+    attach(top, nullptr, false, false);
+    XtVaSetValues(top, XmNbottomAttachment, XmATTACH_WIDGET, XmNbottomWidget, sep, nullptr);
+    XtVaSetValues(sep, XmNleftAttachment, XmATTACH_FORM, XmNrightAttachment, XmATTACH_FORM,
+                  XmNbottomAttachment, XmATTACH_WIDGET, XmNbottomWidget, bottom, XmNbottomOffset, 4,
+                  nullptr);
+    XtVaSetValues(bottom, XmNleftAttachment, XmATTACH_FORM, XmNrightAttachment, XmATTACH_FORM,
+                  XmNbottomAttachment, XmATTACH_FORM, XmNleftOffset, 4, XmNrightOffset, 4,
+                  XmNbottomOffset, 4, nullptr);
     Widget typein = make(xmFormWidgetClass, "typein_form", bottom);
     attach(typein, nullptr, false, false);
     typein_column(typein, "left_typein", true, "left_label_form", "left_label", "Source\t(Chirrup)",

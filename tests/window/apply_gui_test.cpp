@@ -18,6 +18,7 @@
 #include "model/KLKeySet.h"
 #include "toolkit/xm/KLAlert.h"
 #include "window/Gnome.h"
+#include "window/EventPump.h"
 #include "window/WindowTestUtil.h"
 #include "window/WireFileApplyManager.h"
 #include "workspace/Imp.h"
@@ -25,6 +26,17 @@
 namespace fs = std::filesystem;
 
 namespace {
+// A widget's width or height (`resource`), and its top on the screen.
+Dimension Extent(Widget w, const char* resource) {
+    Dimension extent = 0;
+    XtVaGetValues(w, resource, &extent, nullptr);
+    return extent;
+}
+int RootY(Widget w) {
+    Position x = 0, y = 0;
+    XtTranslateCoords(w, 0, 0, &x, &y);
+    return y;
+}
 
 CueTime Frames(int f) {
     return CueTime::FromTicks(f * 200);
@@ -106,6 +118,17 @@ TEST_F(ApplyDialogTest, OpeningTheApplyFileFillsTheDialog) {
     Gnome::done_cb(nullptr, nullptr, nullptr);
     EXPECT_FALSE(XtIsManaged(dialog));
     EXPECT_FALSE(theImp.applyEvent->wire);
+
+    // Shown again it keeps its size, and the height it has to spare goes to the lists: the
+    // buttons stay at the bottom.
+    const Dimension firstHeight = Extent(dialog, XmNheight), firstWidth = Extent(dialog, XmNwidth);
+    theImp.OpenApplyWire((project + "/wire/face.glb").c_str());
+    windowtest::Pump([] { return false; }, 0.3);
+    EXPECT_EQ(Extent(dialog, XmNheight), firstHeight);
+    EXPECT_EQ(Extent(dialog, XmNwidth), firstWidth);
+    Widget apply = KLXmGnome::FindWidget("apply_button");
+    EXPECT_GT(RootY(apply) + Extent(apply, XmNheight), RootY(dialog) + firstHeight - 24);
+    Gnome::done_cb(nullptr, nullptr, nullptr);
 }
 
 // The apply file is stored with its raw geometry only with VX_RAWFILE.
