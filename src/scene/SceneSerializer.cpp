@@ -1,5 +1,6 @@
 #include "scene/SceneSerializer.h"
 
+#include <sys/uio.h>
 #include <unistd.h>
 
 #include <cctype>
@@ -76,7 +77,7 @@ std::vector<size_t> buffer_lengths(const tinygltf::Model& model) {
 // is then replaced by the chunk's real length. False when the model does not allow it (the
 // caller then lets the serialiser write the whole container); the model is left as it was.
 bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool join, bool closeGaps,
-                      std::ostream& out) {
+                      SafeFile& file) {
     if (model->buffers.empty() || (!join && model->buffers.size() > 1) ||
         !SceneSerializer::CanJoinBuffers(*model) || !model->buffers[0].uri.empty()) {
         return false;
@@ -146,6 +147,7 @@ bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool j
     if (total > 0xFFFFFFFFu) {
         return false;
     }
+    std::ostream& out = file.Stream();
     out.write("glTF", 4);
     put_u32(out, 2);
     put_u32(out, uint32_t(total));
@@ -155,8 +157,15 @@ bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool j
     put_u32(out, uint32_t(binLength));
     put_u32(out, 0x004E4942);  // "BIN"
     // Spans that keep their distance from the one before (the bytes between them fewer than
-    // 16, the alignment gap) go out in one write with those bytes.
+    // 16, the alignment gap) go out as one block with those bytes; the blocks and the zeros
+    // between them are written together.
     static const char kZeros[16] = {};
+    std::vector<struct iovec> blocks;
+    auto put = [&blocks](const char* data, size_t size) {
+        if (size > 0) {
+            blocks.push_back({const_cast<char*>(data), size});
+        }
+    };
     size_t written = 0;
     for (size_t b = 0; b < model->buffers.size(); ++b) {
         const char* data = reinterpret_cast<const char*>(model->buffers[b].data.data());
@@ -168,13 +177,15 @@ bool write_glb_direct(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool j
             }
             const size_t at = base[b] + in[k].to;
             const size_t bytes = in[j - 1].from + in[j - 1].length - in[k].from;
-            out.write(kZeros, std::streamsize(at - written));
-            out.write(data + in[k].from, std::streamsize(bytes));
+            put(kZeros, at - written);
+            put(data + in[k].from, bytes);
             written = at + bytes;
             k = j;
         }
     }
-    out.write(kZeros, std::streamsize(binLength - written));
+    put(kZeros, binLength - written);
+    // (a failed write leaves the file's stream bad, which its Commit reports)
+    file.WriteGathered(blocks.data(), blocks.size());
     return true;
 }
 
@@ -186,7 +197,7 @@ bool write_safely(tinygltf::TinyGLTF* writer, tinygltf::Model* model, bool binar
         *error = "Cannot write scene file [" + path + "]: " + file.ErrorText();
         return false;
     }
-    bool written = binary && write_glb_direct(writer, model, join, closeGaps, file.Stream());
+    bool written = binary && write_glb_direct(writer, model, join, closeGaps, file);
     if (!written && closeGaps) {
         ModelCompactor(*model).CloseGaps();
     }

@@ -1,7 +1,10 @@
 #include "toolkit/FdStreamBuffer.h"
 
 #include <fcntl.h>
+#include <sys/uio.h>
 #include <unistd.h>
+
+#include <algorithm>
 
 #include <cerrno>
 
@@ -23,13 +26,51 @@ bool FdStreamBuffer::writeAll(const char* data, size_t size) {
         }
         data += n;
         size -= size_t(n);
-        written_ += size_t(n);
+        wrote(size_t(n));
     }
-    // Each few megabytes written, the disk is set to work on them while the rest is written,
-    // so that the flush at the end waits only for the last of them.
+    return true;
+}
+
+void FdStreamBuffer::wrote(size_t n) {
+    written_ += n;
     if (written_ - started_ >= kWritebackStep) {
         ::sync_file_range(fd_, off_t(started_), off_t(written_ - started_), SYNC_FILE_RANGE_WRITE);
         started_ = written_;
+    }
+}
+
+bool FdStreamBuffer::WriteGathered(const struct iovec* blocks, size_t count) {
+    if (!drain())
+        return false;
+    // A few hundred blocks at a time, each call's short write finished before the next.
+    constexpr size_t kPerCall = 256;
+    struct iovec part[kPerCall];
+    for (size_t first = 0; first < count;) {
+        size_t n = 0;
+        for (; n < kPerCall && first + n < count; ++n)
+            part[n] = blocks[first + n];
+        first += n;
+        struct iovec* at = part;
+        while (n > 0) {
+            const ssize_t done = ::writev(fd_, at, int(n));
+            if (done < 0 && errno == EINTR)
+                continue;
+            if (done <= 0) {
+                error_ = done < 0 ? errno : EIO;
+                return false;
+            }
+            wrote(size_t(done));
+            for (size_t left = size_t(done); left > 0 || (n > 0 && at->iov_len == 0);) {
+                const size_t step = std::min(left, at->iov_len);
+                at->iov_base = static_cast<char*>(at->iov_base) + step;
+                at->iov_len -= step;
+                left -= step;
+                if (at->iov_len > 0)
+                    break;
+                ++at;
+                --n;
+            }
+        }
     }
     return true;
 }

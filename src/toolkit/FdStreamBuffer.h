@@ -4,6 +4,8 @@
 #include <streambuf>
 #include <vector>
 
+struct iovec;
+
 // A stream buffer that writes into an open file descriptor (which it borrows, never closes).
 // Every write(2) is checked: the first failure is kept in Error(), and from then on the
 // buffer refuses everything, so that the stream that uses it goes bad and stays bad.
@@ -15,6 +17,9 @@ class FdStreamBuffer : public std::streambuf {
 
     // The errno of the first failed write, 0 when every write so far succeeded.
     int Error() const { return error_; }
+    // Writes what is buffered, then `count` blocks one after another, many to a system call
+    // (a scene's hundreds of buffers otherwise cost a call each); false once anything failed.
+    bool WriteGathered(const struct iovec* blocks, size_t count);
 
   protected:
     int_type overflow(int_type c) override;
@@ -25,6 +30,9 @@ class FdStreamBuffer : public std::streambuf {
     // Writes [data, data + size) in full, retrying short and interrupted writes.
     bool writeAll(const char* data, size_t size);
     bool drain();
+    // Counts `n` more bytes written and, each kWritebackStep of them, sets the disk to work on
+    // them while the rest is written, so that the flush at the end waits only for the last.
+    void wrote(size_t n);
 
     static constexpr size_t kWritebackStep = size_t(4) << 20;
 

@@ -167,6 +167,16 @@ bool SafeFile::Write(const void* data, size_t size) {
     return bool(*stream_);
 }
 
+bool SafeFile::WriteGathered(const struct iovec* blocks, size_t count) {
+    if (!IsOpen() || !*stream_)
+        return false;
+    if (!buffer_->WriteGathered(blocks, count)) {
+        stream_->setstate(std::ios::badbit);
+        return false;
+    }
+    return true;
+}
+
 std::string SafeFile::DescriptorPath() const {
     return IsOpen() ? "/proc/self/fd/" + std::to_string(fd_) : std::string();
 }

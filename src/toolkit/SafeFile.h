@@ -6,6 +6,7 @@
 #include <string>
 
 class FdStreamBuffer;
+struct iovec;
 
 // Saves a file so that the target is always either its old self or the complete new content,
 // never half-written, and so that no temporary file is left behind. Every file the program
@@ -41,6 +42,9 @@ class SafeFile {
     std::ostream& Stream() { return *stream_; }
     // Appends `size` bytes; false once anything failed.
     bool Write(const void* data, size_t size);
+    // Appends `count` blocks one after another, after what went to Stream(), in few system
+    // calls; false once anything failed.
+    bool WriteGathered(const struct iovec* blocks, size_t count);
     // For writers that take only a file name (an image library): a name that opens this
     // SafeFile's file ("/proc/self/fd/N"). Write either through it or through Stream(), not
     // both; Commit then checks and places what was written.

@@ -5,6 +5,7 @@
 #include <signal.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
+#include <sys/uio.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -116,23 +117,56 @@ TEST_P(SafeFileTest, ANameThatCannotBeWrittenSaysWhyAndOthersFilesStay) {
     EXPECT_TRUE(fs::exists(other)) << "another target's files are its own saves' business";
 }
 
+// Blocks written together (hundreds, some empty) land in order between what the stream wrote
+// before and after them.
+TEST_P(SafeFileTest, GatheredBlocksLandInOrderBetweenTheStreamsWrites) {
+    std::vector<std::string> texts;
+    std::string expected = "head ";
+    for (int i = 0; i < 600; ++i) {
+        texts.push_back(std::string(size_t(i % 7) * 300, char('a' + i % 26)));
+        expected += texts.back();
+    }
+    std::vector<struct iovec> blocks;
+    for (std::string& t : texts)
+        blocks.push_back({t.data(), t.size()});
+    SafeFile file(target_);
+    file.Stream() << "head ";
+    EXPECT_TRUE(file.WriteGathered(blocks.data(), blocks.size()));
+    file.Stream() << " tail";
+    ASSERT_TRUE(file.Commit()) << file.ErrorText();
+    EXPECT_TRUE(Slurp(target_) == expected + " tail");
+}
+
 TEST_P(SafeFileTest, AFailedWriteFailsTheCommitAndLeavesTheTargetAlone) {
     std::ofstream(target_) << "old\n";
-    // A file-size limit makes the writes fail part-way (EFBIG instead of the signal).
-    const int status = InChild([&] {
-        ::signal(SIGXFSZ, SIG_IGN);
-        struct rlimit limit = {1 << 16, 1 << 16};
-        ::setrlimit(RLIMIT_FSIZE, &limit);
-        SafeFile file(target_);
-        file.Stream() << std::string(1 << 18, 'y');
-        const bool committed = file.Commit();
-        const bool named = file.ErrorText().find("could not write all of") == 0;
-        ::_exit(committed ? 1 : named ? 0 : 2);
-    });
-    ASSERT_TRUE(WIFEXITED(status));
-    EXPECT_EQ(WEXITSTATUS(status), 0) << "1: committed anyway, 2: no reason given";
-    EXPECT_EQ(Slurp(target_), "old\n");
-    EXPECT_EQ(Listing(dir_), std::vector<std::string>{"a.track"});
+    // A file-size limit makes the writes fail part-way (EFBIG instead of the signal), through
+    // the stream and through gathered blocks (a short write, then the failure).
+    for (bool gathered : {false, true}) {
+        const int status = InChild([&] {
+            ::signal(SIGXFSZ, SIG_IGN);
+            struct rlimit limit = {1 << 16, 1 << 16};
+            ::setrlimit(RLIMIT_FSIZE, &limit);
+            SafeFile file(target_);
+            std::string bytes(1 << 18, 'y');
+            if (gathered) {
+                struct iovec blocks[4];
+                for (int i = 0; i < 4; ++i)
+                    blocks[i] = {bytes.data() + i * (1 << 16), size_t(1) << 16};
+                if (file.WriteGathered(blocks, 4))
+                    ::_exit(3);
+            } else {
+                file.Stream() << bytes;
+            }
+            const bool committed = file.Commit();
+            const bool named = file.ErrorText().find("could not write all of") == 0;
+            ::_exit(committed ? 1 : named ? 0 : 2);
+        });
+        ASSERT_TRUE(WIFEXITED(status));
+        EXPECT_EQ(WEXITSTATUS(status), 0)
+            << "1: committed anyway, 2: no reason given, 3: the blocks said they were written";
+        EXPECT_EQ(Slurp(target_), "old\n");
+        EXPECT_EQ(Listing(dir_), std::vector<std::string>{"a.track"});
+    }
 }
 
 // A save killed part-way, over an existing file and into a new one: the target is complete
