@@ -5,7 +5,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-
 #include <cerrno>
 
 FdStreamBuffer::FdStreamBuffer(int fd, size_t capacity)
