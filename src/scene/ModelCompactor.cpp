@@ -17,6 +17,22 @@ std::string sniff_mime(const std::vector<unsigned char>& b) {
     return "image/png";
 }
 
+// Keeps the elements of `v` for whose index `keep` says so, in order, moving them down in
+// place (no second array of the scene's accessors or views).
+template <class T, class Keep>
+void keep_where(std::vector<T>* v, const Keep& keep) {
+    size_t to = 0;
+    for (size_t i = 0; i < v->size(); ++i) {
+        if (keep(i)) {
+            if (to != i) {
+                (*v)[to] = std::move((*v)[i]);
+            }
+            ++to;
+        }
+    }
+    v->resize(to);
+}
+
 template <class F>
 void each_accessor_ref(tinygltf::Model& m, F f) {
     for (tinygltf::Mesh& mesh : m.meshes) {
@@ -98,14 +114,7 @@ void ModelCompactor::RemoveUnusedAccessors(const std::set<int>& candidates) {
         return;
     }
     each_accessor_ref(m_, [&](int& i) { i = i >= 0 ? remap[size_t(i)] : i; });
-    std::vector<tinygltf::Accessor> accessors;
-    accessors.reserve(size_t(next));
-    for (size_t i = 0; i < m_.accessors.size(); ++i) {
-        if (remap[i] >= 0) {
-            accessors.push_back(std::move(m_.accessors[i]));
-        }
-    }
-    m_.accessors = std::move(accessors);
+    keep_where(&m_.accessors, [&](size_t i) { return remap[i] >= 0; });
 
     // Views freed with them, unless something else still refers to them.
     each_view_ref(m_, [&](int& v) { freedViews.erase(v); });
@@ -113,16 +122,11 @@ void ModelCompactor::RemoveUnusedAccessors(const std::set<int>& candidates) {
         return;
     }
     std::vector<int> viewMap(m_.bufferViews.size());
-    std::vector<tinygltf::BufferView> views;
+    int kept = 0;
     for (size_t i = 0; i < m_.bufferViews.size(); ++i) {
-        if (freedViews.count(int(i))) {
-            viewMap[i] = -1;
-        } else {
-            viewMap[i] = int(views.size());
-            views.push_back(std::move(m_.bufferViews[i]));
-        }
+        viewMap[i] = freedViews.count(int(i)) ? -1 : kept++;
     }
-    m_.bufferViews = std::move(views);
+    keep_where(&m_.bufferViews, [&](size_t i) { return viewMap[i] >= 0; });
     each_view_ref(m_, [&](int& v) { v = v >= 0 ? viewMap[size_t(v)] : v; });
 }
 
@@ -203,18 +207,14 @@ void ModelCompactor::RemoveUnusedBuffers() {
         }
     }
     std::vector<int> remap(m_.buffers.size(), -1);
-    std::vector<tinygltf::Buffer> buffers;
+    int kept = 0;
     for (size_t i = 0; i < m_.buffers.size(); ++i) {
-        if (used[i]) {
-            remap[i] = int(buffers.size());
-            buffers.push_back(std::move(m_.buffers[i]));
-        }
+        remap[i] = used[i] ? kept++ : -1;
     }
-    if (buffers.size() == m_.buffers.size()) {
-        m_.buffers = std::move(buffers);
+    if (size_t(kept) == m_.buffers.size()) {
         return;
     }
-    m_.buffers = std::move(buffers);
+    keep_where(&m_.buffers, [&](size_t i) { return used[i] != 0; });
     for (tinygltf::BufferView& v : m_.bufferViews) {
         v.buffer = remap[size_t(v.buffer)];
     }
