@@ -40,9 +40,10 @@ bench)
     cmake --build build -j "$jobs"
     for b in build/bench/*_bench; do
         name=$(basename "$b")
-        if [[ "$name" == views_bench || "$name" == *_window_bench ]] && [ -z "${DISPLAY:-}" ]; then
-            # The views' and the window's benchmarks draw: on a display of their own when
-            # there is none.
+        if [[ "$name" == views_bench || "$name" == chart_bench || "$name" == *_window_bench ]] &&
+            [ -z "${DISPLAY:-}" ]; then
+            # The views', the chart's and the window's benchmarks draw: on a display of their
+            # own when there is none.
             scripts/xvfb-fixture start build/bench-xvfb.display >/dev/null
             DISPLAY=$(cut -d' ' -f1 build/bench-xvfb.display) "$b" || status=$?
             scripts/xvfb-fixture stop build/bench-xvfb.display
