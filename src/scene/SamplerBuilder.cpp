@@ -11,7 +11,6 @@
 #include "scene/TurnSpline.h"
 
 namespace {
-
 // The share of a tolerance that the choice of samples may use; the rest is left for the
 // rounding of what is stored as floats (a quaternion moves by about 1e-5 degrees, a value by
 // one float step) and of the player's interpolation.
@@ -348,11 +347,14 @@ const ChannelCurve* SamplerBuilder::sharedTail(size_t* firstKey, bool going[3]) 
         return nullptr;
     }
     for (int a = 0; a < 3; ++a) {
-        const std::vector<ChannelCurve::Key>& other = curves_[a] ? curves_[a]->keys() : keys;
-        if (going[a] && other.size() != keys.size()) {
+        if (!going[a] || curves_[a] == lead) {
+            continue;
+        }
+        const std::vector<ChannelCurve::Key>& other = curves_[a]->keys();
+        if (other.size() != keys.size()) {
             return nullptr;
         }
-        for (size_t k = first; going[a] && &other != &keys && k < keys.size(); ++k) {
+        for (size_t k = first; k < keys.size(); ++k) {
             if (float(other[k].time) != float(keys[k].time)) {
                 return nullptr;
             }

@@ -12,7 +12,6 @@
 namespace {
 constexpr double kPi = 3.14159265358979323846;
 constexpr double kHalfRadians = EulerRotation::kHalfRadiansPerDegree;
-
 }  // namespace
 
 TurnSpline::TurnSpline(const ChannelCurve& curve, int axis, const double angles[3], size_t firstKey)
